@@ -1,0 +1,23 @@
+/** How the library's own units set the error cell: with their name and line. */
+#ifndef ZYROVFS_CORE_ERROR_CELL_H
+#define ZYROVFS_CORE_ERROR_CELL_H
+
+#include "core/source_line.h"
+#include "zyrovfs/error.h"
+
+namespace ZYROVFS {
+
+/** Sets the cell for the calling line, or for the place that a shared helper was given. */
+inline void SetErr(__tag_vfs_err_ code, SourceLine at = SourceLine::Here()) {
+    VFSSetErrEx(code, at.file, at.line);
+}
+
+/** SetErr for the common `return Fail(code)`. */
+inline bool Fail(__tag_vfs_err_ code, SourceLine at = SourceLine::Here()) {
+    SetErr(code, at);
+    return false;
+}
+
+}  // namespace ZYROVFS
+
+#endif

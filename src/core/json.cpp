@@ -1,0 +1,167 @@
+#include "core/json.h"
+
+#include <fcntl.h>
+#include <json/reader.h>
+#include <json/writer.h>
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <charconv>
+#include <cstdio>
+#include <memory>
+
+#include "core/handle.h"
+
+namespace ZYROVFS::json {
+namespace {
+
+const Json::CharReaderBuilder& ReaderRules() {
+    static const Json::CharReaderBuilder rules = [] {
+        Json::CharReaderBuilder builder;
+        builder["failIfExtra"] = true;
+        return builder;
+    }();
+    return rules;
+}
+
+const Json::StreamWriterBuilder& WriterRules() {
+    static const Json::StreamWriterBuilder rules = [] {
+        Json::StreamWriterBuilder builder;
+        builder["indentation"] = "";
+        // Escaping would replace what is not valid UTF-8; names and passwords keep their bytes.
+        builder["emitUTF8"] = true;
+        return builder;
+    }();
+    return rules;
+}
+
+bool Parse(const char* begin, const char* end, Json::Value& value) {
+    try {
+        const std::unique_ptr<Json::CharReader> reader(ReaderRules().newCharReader());
+        if (reader->parse(begin, end, &value, nullptr)) {
+            return true;
+        }
+    } catch (const std::exception&) {
+        // Nesting beyond the reader's limit arrives as an exception: bad JSON as any other.
+    }
+    value = Json::Value();
+    errno = EINVAL;
+    return false;
+}
+
+bool ReadAll(int fd, std::string& text) {
+    char buffer[65536];
+    for (;;) {
+        const ssize_t n = read(fd, buffer, sizeof buffer);
+        if (n == 0) {
+            return true;
+        }
+        if (n > 0) {
+            text.append(buffer, static_cast<size_t>(n));
+        } else if (errno != EINTR) {
+            return false;
+        }
+    }
+}
+
+bool WriteAll(int fd, const std::string& text) {
+    size_t done = 0;
+    while (done < text.size()) {
+        const ssize_t n = write(fd, text.data() + done, text.size() - done);
+        if (n >= 0) {
+            done += static_cast<size_t>(n);
+        } else if (errno != EINTR) {
+            return false;
+        }
+    }
+    return true;
+}
+
+/** Runs a clean-up step without losing the errno that tells why it is needed. */
+void RemoveKeepingErrno(const std::string& path) {
+    const int saved = errno;
+    unlink(path.c_str());
+    errno = saved;
+}
+
+template <typename T>
+bool FromDecimal(const std::string& text, T& number) {
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+    return error == std::errc() && end == text.data() + text.size();
+}
+
+}  // namespace
+
+bool fromFile(Json::Value& value, const std::string& path) try {
+    value = Json::Value();
+    const UniqueFd fd(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
+    if (!fd) {
+        return false;
+    }
+    struct stat info {};
+    if (fstat(fd.Get(), &info) != 0) {
+        return false;
+    }
+    if (!S_ISREG(info.st_mode)) {
+        errno = S_ISDIR(info.st_mode) ? EISDIR : EINVAL;
+        return false;
+    }
+    std::string text;
+    text.reserve(static_cast<size_t>(info.st_size));
+    return ReadAll(fd.Get(), text) && Parse(text.data(), text.data() + text.size(), value);
+} catch (const std::exception&) {
+    errno = ENOMEM;
+    return false;
+}
+
+bool toFile(const Json::Value& value, const std::string& path, mode_t mode) try {
+    const std::string text = toString(value) + "\n";
+    std::string fresh = path + ".XXXXXX";
+    const int created = mkostemp(fresh.data(), O_CLOEXEC);
+    if (created < 0) {
+        return false;
+    }
+    UniqueFd fd(created);
+    if (!WriteAll(fd.Get(), text) || fchmod(fd.Get(), mode) != 0 || fsync(fd.Get()) != 0 ||
+        close(fd.Release()) != 0 || rename(fresh.c_str(), path.c_str()) != 0) {
+        RemoveKeepingErrno(fresh);
+        return false;
+    }
+    return true;
+} catch (const std::exception&) {
+    errno = ENOMEM;
+    return false;
+}
+
+bool fromString(Json::Value& value, const std::string& text) {
+    value = Json::Value();
+    return Parse(text.data(), text.data() + text.size(), value);
+}
+
+std::string toString(const Json::Value& value) {
+    return Json::writeString(WriterRules(), value);
+}
+
+bool toInt64(const Json::Value& value, int64_t& number) {
+    if (value.isString()) {
+        return FromDecimal(value.asString(), number);
+    }
+    if (!value.isInt64()) {
+        return false;
+    }
+    number = value.asInt64();
+    return true;
+}
+
+bool toUInt64(const Json::Value& value, uint64_t& number) {
+    if (value.isString()) {
+        return FromDecimal(value.asString(), number);
+    }
+    if (!value.isUInt64()) {
+        return false;
+    }
+    number = value.asUInt64();
+    return true;
+}
+
+}  // namespace ZYROVFS::json

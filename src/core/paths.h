@@ -1,0 +1,65 @@
+/** Every fixed path of the system, once. */
+#ifndef ZYROVFS_CORE_PATHS_H
+#define ZYROVFS_CORE_PATHS_H
+
+#include <string>
+
+namespace ZYROVFS::paths {
+
+/** Saved profiles and what a user has learnt to trust; survives a reboot. */
+inline constexpr const char* kConfigRoot = "/usr/zyro/etc/zyrovfs";
+/** Live connections. */
+inline constexpr const char* kConnectRoot = "/var/tmp/zyrovfs";
+inline constexpr const char* kServersFile = "servers.conf";
+inline constexpr const char* kConnectFile = "connect.conf";
+
+inline constexpr const char* kCatalogueDir = "/usr/share/gvfs/mounts";
+inline constexpr const char* kCaBundle = "/etc/ssl/certs/ca-certificates.crt";
+
+inline constexpr const char* kDbusDaemon = "/sbin/dbus-daemon";
+inline constexpr const char* kGvfsd = "/usr/lib/gvfs/gvfsd";
+inline constexpr const char* kGvfsdFuse = "/usr/lib/gvfs/gvfsd-fuse";
+inline constexpr const char* kUmount = "/bin/umount";
+inline constexpr const char* kRm = "/bin/rm";
+inline constexpr const char* kSshKeygen = "/usr/bin/ssh-keygen";
+
+inline std::string UserConfigDir(unsigned int uid) {
+    return std::string(kConfigRoot) + "/" + std::to_string(uid);
+}
+inline std::string UserConnectDir(unsigned int uid) {
+    return std::string(kConnectRoot) + "/" + std::to_string(uid);
+}
+inline std::string KnownHosts(unsigned int uid) {
+    return UserConfigDir(uid) + "/sftp/known_hosts";
+}
+inline std::string SslDir(unsigned int uid) {
+    return UserConfigDir(uid) + "/ssl";
+}
+
+/** Everything of a user that is volatile: bus, fuse tree, tasks. */
+inline std::string RuntimeDir(unsigned int uid) {
+    return "/var/tmp/user/" + std::to_string(uid);
+}
+inline std::string DbusPid(unsigned int uid) {
+    return RuntimeDir(uid) + "/dbus/dbus.pid";
+}
+inline std::string DbusAddress(unsigned int uid) {
+    return RuntimeDir(uid) + "/dbus/dbus.path";
+}
+inline std::string GvfsdPid(unsigned int uid) {
+    return RuntimeDir(uid) + "/zyrovfs/gvfsd.pid";
+}
+inline std::string GvfsdFusePid(unsigned int uid) {
+    return RuntimeDir(uid) + "/zyrovfs/gvfsd-fuse.pid";
+}
+inline std::string FuseTree(unsigned int uid) {
+    return RuntimeDir(uid) + "/gvfs";
+}
+
+inline std::string MountLock(unsigned int uid) {
+    return "/tmp/zyrovfs/lock/user/" + std::to_string(uid) + "/mnt.lock";
+}
+
+}  // namespace ZYROVFS::paths
+
+#endif

@@ -1,0 +1,63 @@
+#include "mount/fork_as_user.h"
+
+#include <grp.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+
+#include "core/log.h"
+
+namespace ZYROVFS {
+
+SigchldGuard::SigchldGuard() : restore_(false) {
+    struct sigaction action {};
+    if (sigaction(SIGCHLD, nullptr, &action) == 0 && (action.sa_flags & SA_NOCLDWAIT) != 0) {
+        action.sa_flags &= ~SA_NOCLDWAIT;
+        restore_ = sigaction(SIGCHLD, &action, nullptr) == 0;
+    }
+}
+
+SigchldGuard::~SigchldGuard() {
+    struct sigaction action {};
+    if (restore_ && sigaction(SIGCHLD, nullptr, &action) == 0) {
+        action.sa_flags |= SA_NOCLDWAIT;
+        sigaction(SIGCHLD, &action, nullptr);
+    }
+}
+
+ChildEnd WaitForChild(pid_t pid) {
+    int status = 0;
+    while (waitpid(pid, &status, 0) < 0) {
+        if (errno == ECHILD) {
+            return {ChildEnd::kNotFound, 0};
+        }
+        if (errno != EINTR) {
+            return {ChildEnd::kWaitFailed, -1};
+        }
+    }
+    if (WIFEXITED(status)) {
+        return {ChildEnd::kExited, WEXITSTATUS(status)};
+    }
+    return {ChildEnd::kSignalled, -1};
+}
+
+bool BecomeUserForGood(uid_t uid, SourceLine at) {
+    // Root's supplementary groups would open to the user what only those groups may read.
+    if (geteuid() == 0 && setgroups(0, nullptr) != 0) {
+        LOG_ERROR_AT(at, "Failed to drop groups, %m");
+        return false;
+    }
+    if (setregid(kUsersGid, kUsersGid) != 0) {
+        LOG_ERROR_AT(at, "Failed to set gid %u, %m", kUsersGid);
+        return false;
+    }
+    if (setreuid(uid, uid) != 0) {
+        LOG_ERROR_AT(at, "Failed to set uid %u, %m", uid);
+        return false;
+    }
+    return true;
+}
+
+}  // namespace ZYROVFS

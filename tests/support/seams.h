@@ -1,0 +1,46 @@
+/**
+ * What a unit test must not really do, it records: a test program defines these functions of the C
+ * library itself, so the units call them here. Sleeping only counts; log lines are kept; identity
+ * switches are recorded and go through unless a test makes them fail.
+ */
+#ifndef ZYROVFS_TESTS_SEAMS_H
+#define ZYROVFS_TESTS_SEAMS_H
+
+#include <string>
+#include <vector>
+
+namespace seams {
+
+/** Forgets all that was recorded and every planned failure. */
+void Reset();
+
+/** Seconds of each sleep() and microseconds of each usleep(), in order. */
+std::vector<unsigned> Sleeps();
+std::vector<unsigned> MicroSleeps();
+
+struct LogLine {
+    int priority;
+    std::string text;  ///< whole line, "unit.cpp:12 Failed to ..."
+};
+const std::vector<LogLine>& LogLines();
+
+/** True when some line's text, behind its "unit.cpp:12 ", equals `text`. */
+bool Logged(const std::string& text);
+/** True when some line contains `part`. */
+bool LoggedPart(const std::string& part);
+/** All lines, for the message of a failed expectation. */
+std::string LogDump();
+
+/** Identity calls in order, as "setresuid(-1, 0, -1)". */
+const std::vector<std::string>& IdentityCalls();
+/**
+ * Calls of this function ("setresuid", "setresgid", "seteuid", "setegid", "setregid", "setreuid")
+ * fail with `error` from now on, the first `after` of them excepted.
+ */
+void FailIdentity(const std::string& function, int error, int after = 0);
+/** Identity calls are recorded and answered with success, but change nothing. */
+void PretendIdentity(bool on);
+
+}  // namespace seams
+
+#endif
