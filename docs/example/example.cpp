@@ -12,8 +12,8 @@ namespace {
 
 int Failed(const char* step) {
     const auto code = ZYROVFS::GetError();
-    std::cerr << step << ": " << ZYROVFS::GetErrorName(code) << " (" << code << "): "
-              << ZYROVFS::GetErrorMeaning(code) << '\n';
+    std::cerr << step << ": " << ZYROVFS::GetErrorName(code) << " (" << code
+              << "): " << ZYROVFS::GetErrorMeaning(code) << '\n';
     return 1;
 }
 
