@@ -77,6 +77,16 @@ bool WriteAll(int fd, const std::string& text) {
     return true;
 }
 
+/**
+ * By descriptor, and before the file has its name: others may write to the directory, and what
+ * they put in the file's place must never be given away.
+ */
+void GiveAway(int fd, FileOwner owner) {
+    if (fchown(fd, owner.uid, owner.gid) != 0) {
+        errno = 0;  // not ours to give; the document counts, not its owner
+    }
+}
+
 /** Runs a clean-up step without losing the errno that tells why it is needed. */
 void RemoveKeepingErrno(const std::string& path) {
     const int saved = errno;
@@ -114,7 +124,7 @@ bool fromFile(Json::Value& value, const std::string& path) try {
     return false;
 }
 
-bool toFile(const Json::Value& value, const std::string& path, mode_t mode) try {
+bool toFile(const Json::Value& value, const std::string& path, mode_t mode, FileOwner owner) try {
     const std::string text = toString(value) + "\n";
     std::string fresh = path + ".XXXXXX";
     const int created = mkostemp(fresh.data(), O_CLOEXEC);
@@ -122,6 +132,7 @@ bool toFile(const Json::Value& value, const std::string& path, mode_t mode) try 
         return false;
     }
     UniqueFd fd(created);
+    GiveAway(fd.Get(), owner);
     if (!WriteAll(fd.Get(), text) || fchmod(fd.Get(), mode) != 0 || fsync(fd.Get()) != 0 ||
         close(fd.Release()) != 0 || rename(fresh.c_str(), path.c_str()) != 0) {
         RemoveKeepingErrno(fresh);

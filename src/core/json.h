@@ -10,6 +10,12 @@
 
 namespace ZYROVFS::json {
 
+/** Whom a written document belongs to; an id of -1 stays as it is. */
+struct FileOwner {
+    uid_t uid = static_cast<uid_t>(-1);
+    gid_t gid = static_cast<gid_t>(-1);
+};
+
 /**
  * Reads a whole document. Only a regular file is read: users may write to the directories that
  * hold profiles, so a symbolic link or a FIFO in a file's place is refused rather than followed or
@@ -20,9 +26,11 @@ bool fromFile(Json::Value& value, const std::string& path);
 /**
  * Replaces a whole document: new file beside the old one, written, flushed to disk, renamed over.
  * A crash, a kill or a full disk at any point leaves the old document. False keeps the old file
- * and leaves errno telling the cause.
+ * and leaves errno telling the cause. With an owner the new file is given to it before it takes its
+ * place; a caller that may not give files away keeps them.
  */
-bool toFile(const Json::Value& value, const std::string& path, mode_t mode = 0600);
+bool toFile(const Json::Value& value, const std::string& path, mode_t mode = 0600,
+            FileOwner owner = {});
 
 /** Parses one document and nothing behind it. False leaves `value` null. */
 bool fromString(Json::Value& value, const std::string& text);
