@@ -1,4 +1,5 @@
 #include <sys/stat.h>
+#include <zosplatform/file.h>
 
 #include "core/error_cell.h"
 #include "core/json.h"
@@ -7,7 +8,6 @@
 #include "core/paths.h"
 #include "mount/fork_as_user.h"
 #include "server/config_document.h"
-#include "zosplatform/file.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
 
@@ -72,7 +72,8 @@ bool Write(unsigned int uid, VFS_CONFIG_MODE mode, Json::Value& doc, __tag_vfs_e
     return CfgAccess(uid, mode, VFS_CONFIG_WRITE, doc) || Fail(code, at);
 }
 
-bool Append(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& id, Json::Value profile) {
+bool AppendEntry(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& id,
+                 Json::Value profile) {
     Json::Value doc;
     if (!Read(uid, mode, doc)) {
         return false;
@@ -85,7 +86,7 @@ bool Append(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& id, Json:
     return Write(uid, mode, doc, VFS_ERR_CONFIG_READ);
 }
 
-bool Delete(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& id) {
+bool RemoveEntry(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& id) {
     Json::Value doc;
     if (!Read(uid, mode, doc)) {
         return false;
@@ -94,8 +95,8 @@ bool Delete(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& id) {
     return Write(uid, mode, doc, VFS_ERR_CONFIG_READ);
 }
 
-bool Replace(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& id,
-             const Json::Value& profile) {
+bool ReplaceEntry(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& id,
+                  const Json::Value& profile) {
     Json::Value doc;
     if (!Read(uid, mode, doc)) {
         return false;
@@ -105,8 +106,8 @@ bool Replace(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& id,
 }
 
 /** Two writes without a way back: what fails in the second leaves the profile gone. */
-bool Rename(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& from, const std::string& to,
-            const Json::Value& profile) {
+bool MoveEntry(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& from,
+               const std::string& to, const Json::Value& profile) {
     if (!CfgDeleteByID(uid, mode, from.c_str())) {
         LOG_ERROR("CfgDeleteByID failed, uid=%u, mode=%u, serverID=%s, code=%u", uid, mode,
                   from.c_str(), GetError());
@@ -166,7 +167,7 @@ bool CfgAppend(unsigned int uid, VFS_CONFIG_MODE mode, const char* serverID, Jso
         return Fail(VFS_ERR_BAD_PARAM);
     }
     return NoThrow(VFS_ERR_CONFIG_READ,
-                   [&] { return Append(uid, mode, serverID, std::move(profile)); });
+                   [&] { return AppendEntry(uid, mode, serverID, std::move(profile)); });
 }
 
 bool CfgGetByKey(unsigned int uid, VFS_CONFIG_MODE mode, const char* key, const char* value,
@@ -218,7 +219,7 @@ bool CfgDeleteByID(unsigned int uid, VFS_CONFIG_MODE mode, const char* serverID)
     if (serverID == nullptr) {
         return Fail(VFS_ERR_BAD_PARAM);
     }
-    return NoThrow(VFS_ERR_CONFIG_READ, [&] { return Delete(uid, mode, serverID); });
+    return NoThrow(VFS_ERR_CONFIG_READ, [&] { return RemoveEntry(uid, mode, serverID); });
 }
 
 bool CfgSetByID(unsigned int uid, VFS_CONFIG_MODE mode, std::string serverID,
@@ -226,8 +227,8 @@ bool CfgSetByID(unsigned int uid, VFS_CONFIG_MODE mode, std::string serverID,
     return NoThrow(VFS_ERR_CONFIG_READ, [&] {
         Json::Value doc;
         return serverID == newServerID
-                   ? Replace(uid, mode, newServerID, profile)
-                   : Read(uid, mode, doc) && Rename(uid, mode, serverID, newServerID, profile);
+                   ? ReplaceEntry(uid, mode, newServerID, profile)
+                   : Read(uid, mode, doc) && MoveEntry(uid, mode, serverID, newServerID, profile);
     });
 }
 

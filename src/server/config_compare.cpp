@@ -1,8 +1,8 @@
 #include "server/config_compare.h"
 
-#include <cstring>
+#include <zosplatform/text.h>
 
-#include "zosplatform/text.h"
+#include <cstring>
 
 namespace ZYROVFS::Server {
 namespace {

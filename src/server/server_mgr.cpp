@@ -1,11 +1,12 @@
 #include "server/server_mgr.h"
 
+#include <zosplatform/process.h>
+
 #include "core/error_cell.h"
 #include "core/identity.h"
 #include "core/log.h"
 #include "core/no_throw.h"
 #include "server/server_factory.h"
-#include "zosplatform/process.h"
 
 namespace ZYROVFS::Server {
 namespace {
