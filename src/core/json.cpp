@@ -95,8 +95,7 @@ bool fromFile(Json::Value& value, const std::string& path) try {
 }
 
 bool toFile(const Json::Value& value, const std::string& path, mode_t mode, FileOwner owner) try {
-    return ReplaceFile(path, toString(value) + "
-", mode, owner);
+    return ReplaceFile(path, toString(value) + "\n", mode, owner);
 } catch (const std::exception&) {
     errno = ENOMEM;
     return false;
