@@ -13,7 +13,7 @@ RUN_PACKAGES=(
 )
 # The servers that demo and tests mount, and what the private view of the machine needs.
 SERVER_PACKAGES=(
-  vsftpd openssh-server lighttpd lighttpd-mod-webdav samba
+  vsftpd openssh-server lighttpd lighttpd-mod-webdav lighttpd-mod-openssl samba glib-networking
   iproute2 util-linux openssl procps
 )
 TEST_PACKAGES=(libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev)
