@@ -43,6 +43,13 @@ ChildEnd WaitForChild(pid_t pid) {
     return {ChildEnd::kSignalled, -1};
 }
 
+void RegainRoot() {
+    constexpr uid_t kUnchanged = static_cast<uid_t>(-1);
+    if (setresuid(kUnchanged, 0, kUnchanged) != 0) {
+        return;  // what needs root tells by itself
+    }
+}
+
 bool BecomeUserForGood(uid_t uid, SourceLine at) {
     // Root's supplementary groups would open to the user what only those groups may read.
     if (geteuid() == 0 && setgroups(0, nullptr) != 0) {
