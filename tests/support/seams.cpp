@@ -1,7 +1,10 @@
 #include "support/seams.h"
 
 #include <dlfcn.h>
+#include <fcntl.h>
 #include <gtest/gtest.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/types.h>
 #include <syslog.h>
@@ -33,10 +36,25 @@ Records& Get() {
     return records;
 }
 
+/** Where forked processes leave their lines: an unnamed file that all of them append to. */
+const int kChildLog = [] {
+    const int fd = memfd_create("log", MFD_CLOEXEC);
+    fcntl(fd, F_SETFL, O_APPEND);
+    return fd;
+}();
+const pid_t kTestProcess = getpid();
+
+void KeepChildLine(const std::string& line) {
+    if (getpid() != kTestProcess && write(kChildLog, line.data(), line.size()) < 0) {
+        abort();
+    }
+}
+
 void KeepLine(int priority, const char* format, va_list args) {
     char* text = nullptr;
     if (vasprintf(&text, format, args) >= 0) {
         Get().log.push_back({priority, text});
+        KeepChildLine(std::string(text) + "\n");
         free(text);
     }
 }
@@ -134,6 +152,9 @@ namespace seams {
 
 void Reset() {
     Get() = Records();
+    if (ftruncate(kChildLog, 0) != 0) {
+        abort();
+    }
 }
 
 std::vector<unsigned> Sleeps() {
@@ -165,6 +186,19 @@ bool LoggedPart(const std::string& part) {
         }
     }
     return false;
+}
+
+std::string ChildLogDump() {
+    struct stat info {};
+    fstat(kChildLog, &info);
+    std::string lines(static_cast<size_t>(info.st_size), '\0');
+    const ssize_t length = pread(kChildLog, lines.data(), lines.size(), 0);
+    lines.resize(length < 0 ? 0 : static_cast<size_t>(length));
+    return lines;
+}
+
+bool ChildLogged(const std::string& text) {
+    return ("\n" + ChildLogDump()).find(" " + text + "\n") != std::string::npos;
 }
 
 std::string LogDump() {

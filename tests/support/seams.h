@@ -28,6 +28,10 @@ const std::vector<LogLine>& LogLines();
 bool Logged(const std::string& text);
 /** True when some line contains `part`. */
 bool LoggedPart(const std::string& part);
+/** The same for the lines of processes that this test has forked. */
+bool ChildLogged(const std::string& text);
+/** Lines of forked processes, for the message of a failed expectation. */
+std::string ChildLogDump();
 /** All lines, for the message of a failed expectation. */
 std::string LogDump();
 
