@@ -67,4 +67,26 @@ bool BecomeUserForGood(uid_t uid, SourceLine at) {
     return true;
 }
 
+bool BecomeUserBySavedRoot(uid_t uid, SourceLine at) {
+    if (seteuid(0) != 0) {
+        LOG_ERROR_AT(at, "Failed to set uid 0, %m");
+        return false;
+    }
+    return BecomeUserForGood(uid, at);
+}
+
+bool BecomeRootForGood(SourceLine at) {
+    if (seteuid(0) == 0 && setreuid(0, 0) == 0) {
+        return true;
+    }
+    const int reason = errno;
+    uid_t real = 0;
+    uid_t effective = 0;
+    uid_t saved = 0;
+    getresuid(&real, &effective, &saved);
+    errno = reason;
+    LOG_ERROR_AT(at, "Failed to set uid %u %u %u, %m", real, effective, saved);
+    return false;
+}
+
 }  // namespace ZYROVFS

@@ -56,6 +56,13 @@ void RegainRoot();
  */
 bool BecomeUserForGood(uid_t uid, SourceLine at = SourceLine::Here());
 
+/** BecomeUserForGood from any effective uid, by way of the saved root identity. */
+bool BecomeUserBySavedRoot(uid_t uid, SourceLine at = SourceLine::Here());
+
+/** In a child, for good: root by the saved root identity. Failures are logged in the name of `at`.
+ */
+bool BecomeRootForGood(SourceLine at = SourceLine::Here());
+
 }  // namespace ZYROVFS
 
 #endif
