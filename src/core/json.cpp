@@ -7,10 +7,10 @@
 
 #include <cerrno>
 #include <charconv>
-#include <cstdio>
 #include <memory>
 
 #include "core/handle.h"
+#include "core/replace_file.h"
 
 namespace ZYROVFS::json {
 namespace {
@@ -64,36 +64,6 @@ bool ReadAll(int fd, std::string& text) {
     }
 }
 
-bool WriteAll(int fd, const std::string& text) {
-    size_t done = 0;
-    while (done < text.size()) {
-        const ssize_t n = write(fd, text.data() + done, text.size() - done);
-        if (n >= 0) {
-            done += static_cast<size_t>(n);
-        } else if (errno != EINTR) {
-            return false;
-        }
-    }
-    return true;
-}
-
-/**
- * By descriptor, and before the file has its name: others may write to the directory, and what
- * they put in the file's place must never be given away.
- */
-void GiveAway(int fd, FileOwner owner) {
-    if (fchown(fd, owner.uid, owner.gid) != 0) {
-        errno = 0;  // not ours to give; the document counts, not its owner
-    }
-}
-
-/** Runs a clean-up step without losing the errno that tells why it is needed. */
-void RemoveKeepingErrno(const std::string& path) {
-    const int saved = errno;
-    unlink(path.c_str());
-    errno = saved;
-}
-
 template <typename T>
 bool FromDecimal(const std::string& text, T& number) {
     const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
@@ -125,20 +95,7 @@ bool fromFile(Json::Value& value, const std::string& path) try {
 }
 
 bool toFile(const Json::Value& value, const std::string& path, mode_t mode, FileOwner owner) try {
-    const std::string text = toString(value) + "\n";
-    std::string fresh = path + ".XXXXXX";
-    const int created = mkostemp(fresh.data(), O_CLOEXEC);
-    if (created < 0) {
-        return false;
-    }
-    UniqueFd fd(created);
-    GiveAway(fd.Get(), owner);
-    if (!WriteAll(fd.Get(), text) || fchmod(fd.Get(), mode) != 0 || fsync(fd.Get()) != 0 ||
-        close(fd.Release()) != 0 || rename(fresh.c_str(), path.c_str()) != 0) {
-        RemoveKeepingErrno(fresh);
-        return false;
-    }
-    return true;
+    return ReplaceFile(path, toString(value) + "\n", mode, owner);
 } catch (const std::exception&) {
     errno = ENOMEM;
     return false;

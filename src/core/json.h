@@ -8,13 +8,9 @@
 #include <cstdint>
 #include <string>
 
-namespace ZYROVFS::json {
+#include "core/replace_file.h"
 
-/** Whom a written document belongs to; an id of -1 stays as it is. */
-struct FileOwner {
-    uid_t uid = static_cast<uid_t>(-1);
-    gid_t gid = static_cast<gid_t>(-1);
-};
+namespace ZYROVFS::json {
 
 /**
  * Reads a whole document. Only a regular file is read: users may write to the directories that

@@ -1,0 +1,228 @@
+#include "mount/ssl_verify.h"
+
+#include <fcntl.h>
+#include <openssl/bio.h>
+#include <openssl/evp.h>
+#include <openssl/pem.h>
+#include <openssl/ssl.h>
+#include <openssl/x509.h>
+#include <openssl/x509_vfy.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <atomic>
+#include <cerrno>
+#include <climits>
+#include <cstdlib>
+#include <cstring>
+
+#include "core/no_throw.h"
+#include "core/paths.h"
+#include "mount/cert_info.h"
+#include "mount/curl.h"
+#include "zyrovfs/utils.h"
+
+namespace ZYROVFS {
+namespace {
+
+using UniqueX509 = std::unique_ptr<X509, FreeWith<X509_free>>;
+using UniqueBio = std::unique_ptr<BIO, FreeWith<BIO_free_all>>;
+
+/**
+ * The chain flag: set by the first check against the CA bundle and never cleared. Drivers of this
+ * process install VerifyCertCtxFn long after that check, and rely on it staying in force.
+ */
+std::atomic<bool> check_chain{false};
+
+/** Far above any bundle. The folder belongs to the user, who may put anything there. */
+constexpr off_t kCertFileLimit = 16 * 1024 * 1024;
+constexpr size_t kReadPiece = 1024;
+
+struct Digest {
+    unsigned char bytes[EVP_MAX_MD_SIZE];
+    unsigned int length = 0;
+
+    bool operator==(const Digest& other) const {
+        return length != 0 && length == other.length && memcmp(bytes, other.bytes, length) == 0;
+    }
+    std::string Hex() const {
+        static const char digits[] = "0123456789ABCDEF";
+        std::string text;
+        for (unsigned int i = 0; i < length; ++i) {
+            text += digits[bytes[i] >> 4];
+            text += digits[bytes[i] & 15];
+        }
+        return text;
+    }
+};
+
+Digest Fingerprint(const X509* certificate) {
+    Digest digest;
+    if (certificate == nullptr ||
+        X509_digest(certificate, EVP_sha1(), digest.bytes, &digest.length) != 1) {
+        digest.length = 0;
+    }
+    return digest;
+}
+
+/** The default would ask for the pass phrase of an enciphered file on the terminal, and wait. */
+int NoPassPhrase(char*, int, int, void*) {
+    return -1;
+}
+
+UniqueX509 ReadPem(const char* text) {
+    if (text == nullptr) {
+        LOG_ERROR("arg is null");
+        return nullptr;
+    }
+    const UniqueBio bio(BIO_new_mem_buf(text, -1));
+    if (bio == nullptr) {
+        LOG_ERROR("Failed to BIO_new_mem_buf");
+        return nullptr;
+    }
+    UniqueX509 certificate(PEM_read_bio_X509(bio.get(), nullptr, NoPassPhrase, nullptr));
+    if (certificate == nullptr) {
+        LOG_ERROR("Failed to read bio to X509");
+    }
+    return certificate;
+}
+
+bool IsSavedCertificate(const X509* peer, const char* text) {
+    const UniqueX509 saved = ReadPem(text);
+    if (saved == nullptr) {
+        return false;
+    }
+    const Digest shown = Fingerprint(peer);
+    const Digest known = Fingerprint(saved.get());
+    if (shown == known) {
+        return true;
+    }
+    LOG_ERROR("Fingerprint verify failed, %s %s", shown.Hex().c_str(), known.Hex().c_str());
+    return false;
+}
+
+int CheckCertificate(X509_STORE_CTX* store, void* saved) noexcept try {
+    X509* peer = X509_STORE_CTX_get0_cert(store);
+    KeepCertificate(peer);
+    if (check_chain) {
+        return X509_verify_cert(store);
+    }
+    if (IsSavedCertificate(peer, static_cast<const char*>(saved))) {
+        return 1;
+    }
+    X509_STORE_CTX_set_error(store, X509_V_ERR_CERT_REJECTED);
+    return 0;
+} catch (const std::exception& e) {
+    LOG_ERROR("Unexpected failure, %s", e.what());
+    return 0;
+}
+
+/** Fills `data` up to `size` bytes or the end of the file. */
+bool ReadPieces(int fd, char* data, size_t size) {
+    size_t done = 0;
+    while (done < size) {
+        const ssize_t n = read(fd, data + done, std::min(kReadPiece, size - done));
+        if (n == 0) {
+            return true;
+        }
+        if (n > 0) {
+            done += static_cast<size_t>(n);
+        } else if (errno != EINTR) {
+            return false;
+        }
+    }
+    return true;
+}
+
+bool SetTrust(CURL* curl, const char* cert_path, char* saved) {
+    return SetCurlVerification(curl, Utils::isTrustRootCA(cert_path)) &&
+           SetCurlOption(curl, CURLOPT_SSL_CTX_FUNCTION, &Utils::VerifyCertCtxFn) &&
+           SetCurlOption(curl, CURLOPT_SSL_CTX_DATA, saved) &&
+           SetCurlOption(curl, CURLOPT_SSLVERSION, static_cast<long>(CURL_SSLVERSION_TLSv1));
+}
+
+}  // namespace
+
+bool Utils::isTrustRootCA(const char* path) {
+    struct stat info {};
+    if (path == nullptr || lstat(path, &info) != 0) {
+        return false;
+    }
+    if (S_ISREG(info.st_mode)) {
+        return strcmp(path, paths::kCaBundle) == 0;
+    }
+    char target[PATH_MAX];
+    const ssize_t length = S_ISLNK(info.st_mode) ? readlink(path, target, sizeof target) : -1;
+    return length == static_cast<ssize_t>(strlen(paths::kCaBundle)) &&
+           memcmp(target, paths::kCaBundle, static_cast<size_t>(length)) == 0;
+}
+
+char* Utils::GetCertData(const char* path) {
+    if (path == nullptr) {
+        errno = EINVAL;
+        LOG_ERROR("Failed to open [%s], %m", "");
+        return nullptr;
+    }
+    // Not blocking: a FIFO in the file's place would be waited for without end.
+    const UniqueFd fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+    if (!fd) {
+        LOG_ERROR("Failed to open [%s], %m", path);
+        return nullptr;
+    }
+    struct stat info {};
+    if (fstat(fd.Get(), &info) != 0) {
+        LOG_ERROR("Failed to fstat [%s], %m", path);
+        return nullptr;
+    }
+    const bool fits = info.st_size <= kCertFileLimit;
+    errno = fits ? 0 : EFBIG;
+    const size_t size = fits ? static_cast<size_t>(info.st_size) : 0;
+    UniqueCString data(fits ? static_cast<char*>(calloc(size + 1, 1)) : nullptr);
+    if (data == nullptr || !ReadPieces(fd.Get(), data.get(), size)) {
+        LOG_ERROR("Failed to read data, %m");
+        return nullptr;
+    }
+    return data.release();
+}
+
+CURLcode Utils::VerifyCertCtxFn(CURL*, void* ctx, void* data) noexcept {
+    if (ctx == nullptr) {
+        return CURLE_SSL_CERTPROBLEM;
+    }
+    auto* ssl = static_cast<SSL_CTX*>(ctx);
+    if (!check_chain) {
+        SSL_CTX_set_verify_depth(ssl, 1);
+    }
+    SSL_CTX_set_verify(ssl, SSL_VERIFY_PEER | SSL_VERIFY_FAIL_IF_NO_PEER_CERT, nullptr);
+    SSL_CTX_set_cert_verify_callback(ssl, CheckCertificate, data);
+    return CURLE_OK;
+}
+
+bool Utils::VerifyCert(const char* user, const char* password, const char* url,
+                       const char* certPath) {
+    if (url == nullptr || certPath == nullptr) {
+        LOG_ERROR("Wrong parameters");
+        return Fail(VFS_ERR_BAD_PARAM);
+    }
+    return NoThrow(VFS_ERR_FAILED, [&] {
+        KeepCertificate(nullptr);  // never tell the user of another server's certificate
+        curl_global_init(CURL_GLOBAL_DEFAULT);
+        UniqueCString saved;  // outlives the handle that points to it
+        const UniqueCurl curl = NewCurl();
+        if (curl == nullptr) {
+            return false;
+        }
+        if (isTrustRootCA(certPath)) {
+            check_chain = true;
+        }
+        saved.reset(GetCertData(certPath));
+        if (saved == nullptr) {
+            return Fail(VFS_ERR_FAILED);
+        }
+        return SetTrust(curl.get(), certPath, saved.get()) &&
+               SetCurlTarget(curl.get(), user, password, url) && PerformCurl(curl.get(), url);
+    });
+}
+
+}  // namespace ZYROVFS
