@@ -5,13 +5,16 @@
 
 #include <dlfcn.h>
 #include <libsoup/soup.h>
+#include <unistd.h>
 
 namespace soup_seam {
 
-/** soup_uri_new answers null from its `after`th call on; -1 never. */
+/** soup_uri_new answers null behind so many calls, -1 never. Forked children are not meant. */
 inline int fail_new_after = -1;
 /** soup_uri_to_string answers null. */
 inline bool fail_to_string = false;
+
+inline const pid_t kProcess = getpid();
 
 inline void Reset() {
     fail_new_after = -1;
@@ -28,9 +31,11 @@ F Real(F, const char* name) {
 extern "C" {
 
 SoupURI* soup_uri_new(const char* text) {
-    if (soup_seam::fail_new_after >= 0 && soup_seam::fail_new_after-- == 0) {
-        soup_seam::fail_new_after = 0;
-        return nullptr;
+    if (soup_seam::fail_new_after >= 0 && getpid() == soup_seam::kProcess) {
+        if (soup_seam::fail_new_after == 0) {
+            return nullptr;
+        }
+        --soup_seam::fail_new_after;
     }
     return soup_seam::Real(&soup_uri_new, "soup_uri_new")(text);
 }
