@@ -81,6 +81,7 @@ struct Records {
     std::map<std::string, Failure> failures;
     bool pretend = false;
     bool watch_children = false;
+    std::function<void()> on_micro_sleep;
 };
 
 Records& Get() {
@@ -172,6 +173,9 @@ unsigned sleep(unsigned seconds) {
 
 int usleep(useconds_t microseconds) {
     Keep({Entry::kMicroSleep, static_cast<int>(microseconds), ""});
+    if (Get().on_micro_sleep) {
+        Get().on_micro_sleep();
+    }
     return 0;
 }
 
@@ -267,6 +271,10 @@ std::vector<std::string> IdentityCalls() {
 
 void FailIdentity(const std::string& function, int error, int after) {
     Get().failures[function] = {error, after};
+}
+
+void OnMicroSleep(std::function<void()> hook) {
+    Get().on_micro_sleep = std::move(hook);
 }
 
 void PretendIdentity(bool on) {

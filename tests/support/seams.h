@@ -6,6 +6,7 @@
 #ifndef ZYROVFS_TESTS_SEAMS_H
 #define ZYROVFS_TESTS_SEAMS_H
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -23,6 +24,9 @@ void WatchChildren();
 /** Seconds of each sleep() and microseconds of each usleep(), in order. */
 std::vector<unsigned> Sleeps();
 std::vector<unsigned> MicroSleeps();
+
+/** Called by each usleep(), for a test in which something happens during a wait. */
+void OnMicroSleep(std::function<void()> hook);
 
 struct LogLine {
     int priority;
