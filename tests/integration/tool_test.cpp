@@ -245,8 +245,9 @@ TEST_F(Tool, AFileCanGiveAProfileAndOptionsOverruleIt) {
     EXPECT_EQ(AsJson("profile add --uid 4001 --from /tmp/profile.json --port 2121")["id"], kId);
     EXPECT_EQ(AsJson("profile show " + kId + " --uid 4001 --with-credentials")["password"],
               "s3cret");
-    EXPECT_EQ(AsJson("profile set " + kId + " --uid 4001 --from - <<<'{\"alias\": \"x\"}'")["id"],
-              kId);
+    Write("/tmp/change.json", R"({"alias": "piped"})");
+    EXPECT_EQ(AsJson("profile set " + kId + " --uid 4001 --from - </tmp/change.json")["id"], kId);
+    EXPECT_EQ(AsJson("profile show " + kId + " --uid 4001")["alias"], "piped");
 }
 
 TEST_F(Tool, WhatIsNoProfileIsRefused) {
@@ -399,7 +400,7 @@ TEST_F(Tool, ControlCharactersFromAProfileDoNotReachTheTerminal) {
 }
 
 TEST_F(Tool, ControlCharactersOfTheCommandLineAreNotEchoed) {
-    const std::string output = Zyrovfs("profile show $'ftp://\\e[2Jx' --uid 4001").output;
+    const std::string output = Zyrovfs("profile show 'ftp://\x1b[2Jx' --uid 4001").output;
     EXPECT_THAT(output, HasSubstr("\\x1b[2Jx"));
     EXPECT_TRUE(std::all_of(output.begin(), output.end(), IsHarmless)) << output;
 }
