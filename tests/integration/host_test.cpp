@@ -13,7 +13,6 @@ namespace {
 
 using machine::Must;
 using machine::Outcome;
-using machine::Run;
 using testing::AllOf;
 using testing::HasSubstr;
 using testing::Not;
@@ -22,8 +21,13 @@ const std::string kTool = BUILD_DIR "/tools/zyrovfs/zyrovfs";
 const std::string kBuild = " --build " BUILD_DIR;
 const std::string kMounts = "/usr/share/gvfs/mounts/";
 
+/** machine::Run, whose name tests have for their own. */
+Outcome Shell(const std::string& command) {
+    return machine::Run(command);
+}
+
 Outcome Host(const std::string& arguments) {
-    return Run(kTool + " host " + arguments);
+    return Shell(kTool + " host " + arguments);
 }
 Outcome Install() {
     return Host("install" + kBuild);
@@ -57,7 +61,7 @@ class HostLayer : public testing::Test {
 };
 
 TEST_F(HostLayer, RemovalBringsBackWhatThePackagesHad) {
-    const Outcome verified = Run("dpkg --verify gvfs-daemons gvfs-backends gvfs-fuse fuse3");
+    const Outcome verified = Shell("dpkg --verify gvfs-daemons gvfs-backends gvfs-fuse fuse3");
     EXPECT_THAT(verified.output, Not(HasSubstr("/usr/share/gvfs/mounts")));
     EXPECT_THAT(verified.output, Not(HasSubstr("/usr/lib/gvfs")));
     EXPECT_THAT(verified.output, Not(HasSubstr("/etc/fuse.conf")));
@@ -120,7 +124,8 @@ TEST_F(HostLayer, AHalfDoneInstallationCanBeRemoved) {
 
 TEST_F(HostLayer, AKilledInstallationCanBeRepeatedAtAnyPoint) {
     for (const char* delay : {"0.01", "0.05", "0.1", "0.2", "0.3"}) {
-        Run("timeout --signal=KILL " + std::string(delay) + " " + kTool + " host install" + kBuild);
+        Shell("timeout --signal=KILL " + std::string(delay) + " " + kTool + " host install" +
+              kBuild);
         // A dpkg-divert that it had started may still be at work.
         Must("while pgrep -x dpkg-divert >/dev/null; do sleep 0.01; done");
         ASSERT_EQ(Install().status, 0) << delay;
@@ -350,7 +355,7 @@ TEST_F(Launcher, OptionsThatFuse3ForgotAreDroppedAndTheRestIsKept) {
 
 TEST_F(Launcher, AMissingRealProgramIsSaidAndFails) {
     Must("mv /usr/libexec/gvfsd-fuse /usr/libexec/gone");
-    const Outcome outcome = Run("/usr/lib/gvfs/gvfsd-fuse /m");
+    const Outcome outcome = Shell("/usr/lib/gvfs/gvfsd-fuse /m");
     EXPECT_EQ(outcome.status, 127);
     EXPECT_THAT(outcome.output, HasSubstr("/usr/libexec/gvfsd-fuse: No such file"));
 }

@@ -15,7 +15,6 @@ namespace {
 
 using machine::Must;
 using machine::Outcome;
-using machine::Run;
 using testing::AllOf;
 using testing::HasSubstr;
 using testing::Not;
@@ -24,13 +23,18 @@ const std::string kTool = BUILD_DIR "/tools/zyrovfs/zyrovfs";
 constexpr unsigned kAmy = 4001;
 const std::string kId = "ftp://amy@nas.example:2121";
 
+/** machine::Run, whose name tests have for their own. */
+Outcome Shell(const std::string& command) {
+    return machine::Run(command);
+}
+
 Outcome Zyrovfs(const std::string& arguments) {
-    return Run(kTool + " " + arguments);
+    return Shell(kTool + " " + arguments);
 }
 
 /** Standard output alone, as JSON; null when it is none. */
 Json::Value AsJson(const std::string& arguments) {
-    const Outcome outcome = Run(kTool + " " + arguments + " --json 2>/dev/null");
+    const Outcome outcome = Shell(kTool + " " + arguments + " --json 2>/dev/null");
     Json::CharReaderBuilder builder;
     Json::CharReaderBuilder::strictMode(&builder.settings_);
     const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
@@ -61,10 +65,10 @@ class Tool : public testing::Test {
     void SetUp() override { std::filesystem::remove_all("/usr/zyro/etc/zyrovfs/4001"); }
 
     Outcome AddProfile(const std::string& more = "") {
-        return Run("printf 's3cret\\n' | " + kTool +
-                   " profile add --uid 4001 --protocol ftp --hostname nas.example --port 2121 "
-                   "--account amy --password-stdin " +
-                   more);
+        return Shell("printf 's3cret\\n' | " + kTool +
+                     " profile add --uid 4001 --protocol ftp --hostname nas.example --port 2121 "
+                     "--account amy --password-stdin " +
+                     more);
     }
 };
 
@@ -349,9 +353,9 @@ TEST_F(Tool, AnInterruptedPromptSavesNothing) {
 }
 
 TEST_F(Tool, WithoutATerminalThePromptFailsInsteadOfHanging) {
-    const Outcome outcome = Run("setsid " + kTool +
-                                " profile add --uid 4001 --protocol ftp --hostname h "
-                                "--ask-password </dev/null");
+    const Outcome outcome = Shell("setsid " + kTool +
+                                  " profile add --uid 4001 --protocol ftp --hostname h "
+                                  "--ask-password </dev/null");
     EXPECT_EQ(outcome.status, 1);
     EXPECT_THAT(outcome.output, HasSubstr("There is no terminal to ask for the password"));
 }
@@ -390,7 +394,7 @@ TEST_F(Tool, ControlCharactersFromAProfileDoNotReachTheTerminal) {
           "{\"protocol\": \"ftp\", \"hostname\": \"nas.example\", \"port\": 2121, "
           "\"account\": \"amy\", \"alias\": \"a\\u001b[2Jb\\u009bc\\u202ed\xff\\u0007\"}");
     ASSERT_EQ(Zyrovfs("profile add --uid 4001 --from /tmp/profile.json").status, 0);
-    for (const std::string& command : {"profile list", "profile list --json"}) {
+    for (const std::string command : {"profile list", "profile list --json"}) {
         const std::string output = Zyrovfs(command + " --uid 4001").output;
         EXPECT_THAT(output, HasSubstr("nas.example"));
         EXPECT_TRUE(std::all_of(output.begin(), output.end(), IsHarmless)) << output;
