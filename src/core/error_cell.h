@@ -2,6 +2,8 @@
 #ifndef ZYROVFS_CORE_ERROR_CELL_H
 #define ZYROVFS_CORE_ERROR_CELL_H
 
+#include <zosplatform/error.h>
+
 #include "core/source_line.h"
 #include "zyrovfs/error.h"
 
@@ -16,6 +18,11 @@ inline void SetErr(__tag_vfs_err_ code, SourceLine at = SourceLine::Here()) {
 inline bool Fail(__tag_vfs_err_ code, SourceLine at = SourceLine::Here()) {
     SetErr(code, at);
     return false;
+}
+
+/** Sets the platform's cell for the calling line. */
+inline void SetPlatformErr(unsigned int code, SourceLine at = SourceLine::Here()) {
+    YLIBCErrSetEx(code, at.file, at.line);
 }
 
 }  // namespace ZYROVFS

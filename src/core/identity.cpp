@@ -134,8 +134,12 @@ UserWithRootGroup::UserWithRootGroup(uid_t uid, SourceLine at)
 }
 
 UserWithRootGroup::~UserWithRootGroup() {
-    if (saved_gid_ != kUnchanged && (seteuid(0) != 0 || setegid(saved_gid_) != 0)) {
-        LOG_ERROR_AT(at_, "Faile to setegid, %m");
+    if (saved_gid_ != kUnchanged) {
+        // The group goes back even without root, which is possible while it is the real one.
+        const bool root = seteuid(0) == 0;
+        if (setegid(saved_gid_) != 0 || !root) {
+            LOG_ERROR_AT(at_, "Faile to setegid, %m");
+        }
     }
     if (saved_uid_ != kUnchanged && seteuid(saved_uid_) != 0) {
         LOG_ERROR_AT(at_, "Faile to seteuid, %m");

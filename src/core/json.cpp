@@ -94,8 +94,8 @@ bool fromFile(Json::Value& value, const std::string& path) try {
     return false;
 }
 
-bool toFile(const Json::Value& value, const std::string& path, mode_t mode) try {
-    return ReplaceFile(path, toString(value) + "\n", mode);
+bool toFile(const Json::Value& value, const std::string& path, mode_t mode, FileOwner owner) try {
+    return ReplaceFile(path, toString(value) + "\n", mode, owner);
 } catch (const std::exception&) {
     errno = ENOMEM;
     return false;

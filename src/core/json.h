@@ -8,6 +8,8 @@
 #include <cstdint>
 #include <string>
 
+#include "core/replace_file.h"
+
 namespace ZYROVFS::json {
 
 /**
@@ -20,9 +22,11 @@ bool fromFile(Json::Value& value, const std::string& path);
 /**
  * Replaces a whole document: new file beside the old one, written, flushed to disk, renamed over.
  * A crash, a kill or a full disk at any point leaves the old document. False keeps the old file
- * and leaves errno telling the cause.
+ * and leaves errno telling the cause. With an owner the new file is given to it before it takes its
+ * place; a caller that may not give files away keeps them.
  */
-bool toFile(const Json::Value& value, const std::string& path, mode_t mode = 0600);
+bool toFile(const Json::Value& value, const std::string& path, mode_t mode = 0600,
+            FileOwner owner = {});
 
 /** Parses one document and nothing behind it. False leaves `value` null. */
 bool fromString(Json::Value& value, const std::string& text);

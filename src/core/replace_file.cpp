@@ -27,6 +27,16 @@ bool WriteAll(int fd, const std::string& text) {
     return true;
 }
 
+/**
+ * By descriptor, and before the file has its name: others may write to the directory, and what
+ * they put in the file's place must never be given away.
+ */
+void GiveAway(int fd, FileOwner owner) {
+    if (fchown(fd, owner.uid, owner.gid) != 0) {
+        errno = 0;  // not ours to give; the file counts, not its owner
+    }
+}
+
 /** Runs a clean-up step without losing the errno that tells why it is needed. */
 void RemoveKeepingErrno(const std::string& path) {
     const int saved = errno;
@@ -36,13 +46,15 @@ void RemoveKeepingErrno(const std::string& path) {
 
 }  // namespace
 
-bool ReplaceFile(const std::string& path, const std::string& text, mode_t mode) noexcept try {
+bool ReplaceFile(const std::string& path, const std::string& text, mode_t mode,
+                 FileOwner owner) noexcept try {
     std::string fresh = path + ".XXXXXX";
     const int created = mkostemp(fresh.data(), O_CLOEXEC);
     if (created < 0) {
         return false;
     }
     UniqueFd fd(created);
+    GiveAway(fd.Get(), owner);
     if (!WriteAll(fd.Get(), text) || fchmod(fd.Get(), mode) != 0 || fsync(fd.Get()) != 0 ||
         close(fd.Release()) != 0 || rename(fresh.c_str(), path.c_str()) != 0) {
         RemoveKeepingErrno(fresh);

@@ -43,6 +43,13 @@ ChildEnd WaitForChild(pid_t pid) {
     return {ChildEnd::kSignalled, -1};
 }
 
+void RegainRoot() {
+    constexpr uid_t kUnchanged = static_cast<uid_t>(-1);
+    if (setresuid(kUnchanged, 0, kUnchanged) != 0) {
+        return;  // what needs root tells by itself
+    }
+}
+
 bool BecomeUserForGood(uid_t uid, SourceLine at) {
     // Root's supplementary groups would open to the user what only those groups may read.
     if (geteuid() == 0 && setgroups(0, nullptr) != 0) {
@@ -58,6 +65,28 @@ bool BecomeUserForGood(uid_t uid, SourceLine at) {
         return false;
     }
     return true;
+}
+
+bool BecomeUserBySavedRoot(uid_t uid, SourceLine at) {
+    if (seteuid(0) != 0) {
+        LOG_ERROR_AT(at, "Failed to set uid 0, %m");
+        return false;
+    }
+    return BecomeUserForGood(uid, at);
+}
+
+bool BecomeRootForGood(SourceLine at) {
+    if (seteuid(0) == 0 && setreuid(0, 0) == 0) {
+        return true;
+    }
+    const int reason = errno;
+    uid_t real = 0;
+    uid_t effective = 0;
+    uid_t saved = 0;
+    getresuid(&real, &effective, &saved);
+    errno = reason;
+    LOG_ERROR_AT(at, "Failed to set uid %u %u %u, %m", real, effective, saved);
+    return false;
 }
 
 }  // namespace ZYROVFS

@@ -45,10 +45,23 @@ struct ChildEnd {
 ChildEnd WaitForChild(pid_t pid);
 
 /**
+ * In a child, for its last steps as root before BecomeUserForGood. A process that has no root to
+ * go back to, such as a backend, stays what it is: its groups may be right already.
+ */
+void RegainRoot();
+
+/**
  * In a child, for good: real, effective and saved ids become gid 100 and `uid`, and the groups of
  * root go. The effective uid must be 0 by then. Failures are logged in the name of `at`.
  */
 bool BecomeUserForGood(uid_t uid, SourceLine at = SourceLine::Here());
+
+/** BecomeUserForGood from any effective uid, by way of the saved root identity. */
+bool BecomeUserBySavedRoot(uid_t uid, SourceLine at = SourceLine::Here());
+
+/** In a child, for good: root by the saved root identity. Failures are logged in the name of `at`.
+ */
+bool BecomeRootForGood(SourceLine at = SourceLine::Here());
 
 }  // namespace ZYROVFS
 

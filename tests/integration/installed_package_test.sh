@@ -48,6 +48,11 @@ cmake --build by-cmake >/dev/null
 expect "0 profiles" "$(by-cmake/caller)"
 echo "by the CMake package: ok"
 
+sed -n '/^```cpp$/,/^```$/p' "$source/docs/callers-guide.md" | sed '1d;$d' |
+  diff - "$source/docs/example/example.cpp" >&2 || {
+  echo "the guide shows another program than docs/example" >&2
+  exit 1
+}
 cmake -S "$source/docs/example" -B example -DCMAKE_PREFIX_PATH="$work/prefix" >/dev/null
 cmake --build example >/dev/null
 "$source/tests/support/servers/remote" start secret

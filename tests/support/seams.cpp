@@ -2,14 +2,17 @@
 
 #include <dlfcn.h>
 #include <gtest/gtest.h>
+#include <sys/mman.h>
 #include <sys/syscall.h>
 #include <sys/types.h>
 #include <syslog.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <cstdarg>
 #include <cstdio>
+#include <cstring>
 #include <map>
 
 namespace {
@@ -19,13 +22,66 @@ struct Failure {
     int after;
 };
 
+struct Entry {
+    enum Kind { kSleep, kMicroSleep, kLog, kIdentity } kind;
+    int number;  ///< time, or priority of a line
+    std::string text;
+};
+
+/** Records of this process and its children, in memory that fork does not copy. */
+class Journal {
+  public:
+    static Journal& Get() {
+        static Journal* journal = new (mmap(nullptr, sizeof(Journal), PROT_READ | PROT_WRITE,
+                                            MAP_SHARED | MAP_ANONYMOUS, -1, 0)) Journal;
+        return *journal;
+    }
+
+    void Clear() {
+        for (Line& line : lines_) {
+            line.complete = false;
+        }
+        used_ = 0;
+    }
+
+    void Add(const Entry& entry) {
+        const size_t at = used_.fetch_add(1);
+        if (at < kLines) {
+            lines_[at].kind = entry.kind;
+            lines_[at].number = entry.number;
+            strncpy(lines_[at].text, entry.text.c_str(), sizeof lines_[at].text - 1);
+            lines_[at].complete = true;
+        }
+    }
+
+    std::vector<Entry> Entries() const {
+        std::vector<Entry> entries;
+        for (size_t i = 0; i < std::min<size_t>(used_, kLines); ++i) {
+            if (lines_[i].complete) {
+                entries.push_back({lines_[i].kind, lines_[i].number, lines_[i].text});
+            }
+        }
+        return entries;
+    }
+
+  private:
+    static constexpr size_t kLines = 8192;
+    struct Line {
+        Entry::Kind kind;
+        int number;
+        char text[240];
+        std::atomic<bool> complete;
+    };
+    std::atomic<size_t> used_;
+    Line lines_[kLines];
+};
+
 struct Records {
-    std::vector<unsigned> sleeps;
-    std::vector<unsigned> micro_sleeps;
-    std::vector<seams::LogLine> log;
-    std::vector<std::string> identity;
+    std::vector<Entry> entries;
     std::map<std::string, Failure> failures;
     bool pretend = false;
+    bool watch_children = false;
+    std::function<void()> on_micro_sleep;
 };
 
 Records& Get() {
@@ -33,10 +89,35 @@ Records& Get() {
     return records;
 }
 
+void Keep(Entry entry) {
+    if (Get().watch_children) {
+        Journal::Get().Add(entry);
+    } else {
+        Get().entries.push_back(std::move(entry));
+    }
+}
+
+/** All entries of one kind, each turned into what the caller wants of it. */
+template <typename Convert>
+auto Collect(Entry::Kind kind, Convert convert) {
+    std::vector<decltype(convert(Entry()))> found;
+    std::vector<Entry> entries = Get().entries;
+    if (Get().watch_children) {
+        const std::vector<Entry> shared = Journal::Get().Entries();
+        entries.insert(entries.end(), shared.begin(), shared.end());
+    }
+    for (const Entry& entry : entries) {
+        if (entry.kind == kind) {
+            found.push_back(convert(entry));
+        }
+    }
+    return found;
+}
+
 void KeepLine(int priority, const char* format, va_list args) {
     char* text = nullptr;
     if (vasprintf(&text, format, args) >= 0) {
-        Get().log.push_back({priority, text});
+        Keep({Entry::kLog, priority, text});
         free(text);
     }
 }
@@ -44,7 +125,7 @@ void KeepLine(int priority, const char* format, va_list args) {
 /** Records one identity call; true when the real one is still to be made. */
 bool Record(const char* function, const std::string& arguments, int& result) {
     Records& records = Get();
-    records.identity.push_back(std::string(function) + "(" + arguments + ")");
+    Keep({Entry::kIdentity, 0, std::string(function) + "(" + arguments + ")"});
     const auto failure = records.failures.find(function);
     if (failure != records.failures.end() && failure->second.after-- <= 0) {
         errno = failure->second.error;
@@ -86,12 +167,15 @@ const bool kInstalled = [] {
 extern "C" {
 
 unsigned sleep(unsigned seconds) {
-    Get().sleeps.push_back(seconds);
+    Keep({Entry::kSleep, static_cast<int>(seconds), ""});
     return 0;
 }
 
 int usleep(useconds_t microseconds) {
-    Get().micro_sleeps.push_back(microseconds);
+    Keep({Entry::kMicroSleep, static_cast<int>(microseconds), ""});
+    if (Get().on_micro_sleep) {
+        Get().on_micro_sleep();
+    }
     return 0;
 }
 
@@ -136,15 +220,21 @@ void Reset() {
     Get() = Records();
 }
 
-std::vector<unsigned> Sleeps() {
-    return Get().sleeps;
-}
-std::vector<unsigned> MicroSleeps() {
-    return Get().micro_sleeps;
+void WatchChildren() {
+    Journal::Get().Clear();
+    Get().watch_children = true;
 }
 
-const std::vector<LogLine>& LogLines() {
-    return Get().log;
+std::vector<unsigned> Sleeps() {
+    return Collect(Entry::kSleep, [](const Entry& e) { return static_cast<unsigned>(e.number); });
+}
+std::vector<unsigned> MicroSleeps() {
+    return Collect(Entry::kMicroSleep,
+                   [](const Entry& e) { return static_cast<unsigned>(e.number); });
+}
+
+std::vector<LogLine> LogLines() {
+    return Collect(Entry::kLog, [](const Entry& e) { return LogLine{e.number, e.text}; });
 }
 
 bool Logged(const std::string& text) {
@@ -175,12 +265,16 @@ std::string LogDump() {
     return dump;
 }
 
-const std::vector<std::string>& IdentityCalls() {
-    return Get().identity;
+std::vector<std::string> IdentityCalls() {
+    return Collect(Entry::kIdentity, [](const Entry& e) { return e.text; });
 }
 
 void FailIdentity(const std::string& function, int error, int after) {
     Get().failures[function] = {error, after};
+}
+
+void OnMicroSleep(std::function<void()> hook) {
+    Get().on_micro_sleep = std::move(hook);
 }
 
 void PretendIdentity(bool on) {

@@ -6,6 +6,7 @@
 #ifndef ZYROVFS_TESTS_SEAMS_H
 #define ZYROVFS_TESTS_SEAMS_H
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -14,15 +15,24 @@ namespace seams {
 /** Forgets all that was recorded and every planned failure. */
 void Reset();
 
+/**
+ * From now on the records below also hold what forked children do, in the order of time. Until the
+ * next Reset.
+ */
+void WatchChildren();
+
 /** Seconds of each sleep() and microseconds of each usleep(), in order. */
 std::vector<unsigned> Sleeps();
 std::vector<unsigned> MicroSleeps();
+
+/** Called by each usleep(), for a test in which something happens during a wait. */
+void OnMicroSleep(std::function<void()> hook);
 
 struct LogLine {
     int priority;
     std::string text;  ///< whole line, "unit.cpp:12 Failed to ..."
 };
-const std::vector<LogLine>& LogLines();
+std::vector<LogLine> LogLines();
 
 /** True when some line's text, behind its "unit.cpp:12 ", equals `text`. */
 bool Logged(const std::string& text);
@@ -32,7 +42,7 @@ bool LoggedPart(const std::string& part);
 std::string LogDump();
 
 /** Identity calls in order, as "setresuid(-1, 0, -1)". */
-const std::vector<std::string>& IdentityCalls();
+std::vector<std::string> IdentityCalls();
 /**
  * Calls of this function ("setresuid", "setresgid", "seteuid", "setegid", "setregid", "setreuid")
  * fail with `error` from now on, the first `after` of them excepted.

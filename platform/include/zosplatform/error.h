@@ -24,6 +24,7 @@ enum {
     ZOS_ERR_SYSTEM = 0x3c00,
     ZOS_ERR_BAD_CIPHER_TEXT = 0x3e00,
     ZOS_ERR_BAD_FORMAT = 0x8200,
+    ZOS_ERR_NOT_A_FOLDER = 0xa100,
 };
 
 /** `file` must be a literal: the pointer is kept. */

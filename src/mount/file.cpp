@@ -1,0 +1,161 @@
+#include <fcntl.h>
+#include <gio/gio.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+
+#include "core/handle.h"
+#include "core/log.h"
+#include "mount/mkdir.h"
+#include "zyrovfs/utils.h"
+
+namespace ZYROVFS::Utils {
+namespace {
+
+struct flock WholeFileForWriting() {
+    struct flock range {};
+    range.l_type = F_WRLCK;
+    range.l_whence = SEEK_SET;
+    return range;
+}
+
+bool Rewrite(int fd, const char* path, const std::string& line) {
+    if (ftruncate(fd, 0) != 0) {
+        LOG_ERROR("Could not truncate PID file [%s], %m", path);
+        return false;
+    }
+    if (write(fd, line.data(), line.size()) != static_cast<ssize_t>(line.size())) {
+        LOG_ERROR("Writing to file [%s], %m", path);
+        return false;
+    }
+    return true;
+}
+
+/** A FIFO or a device in the file's place is refused: neither waited for nor read without end. */
+UniqueFile OpenRegular(const char* path) {
+    UniqueFd fd(open(path, O_RDONLY | O_NONBLOCK | O_CLOEXEC));
+    struct stat info {};
+    if (!fd || fstat(fd.Get(), &info) != 0) {
+        return nullptr;
+    }
+    if (!S_ISREG(info.st_mode)) {
+        errno = S_ISDIR(info.st_mode) ? EISDIR : EINVAL;
+        return nullptr;
+    }
+    UniqueFile stream(fdopen(fd.Get(), "r"));
+    if (stream != nullptr) {
+        fd.Release();
+    }
+    return stream;
+}
+
+template <typename T>
+using UniqueObject = std::unique_ptr<T, FreeWith<g_object_unref>>;
+
+UniqueObject<GFileInfo> Query(GFile* file, const char* path, const char* attributes) {
+    GError* error = nullptr;
+    UniqueObject<GFileInfo> info(
+        g_file_query_info(file, attributes, G_FILE_QUERY_INFO_NONE, nullptr, &error));
+    if (info == nullptr) {
+        LOG_ERROR("Failed to get %s of %s, %s", attributes, path, error->message);
+        g_error_free(error);
+    }
+    return info;
+}
+
+std::string TextOf(GFileInfo* info, const char* attribute) {
+    const char* text = g_file_info_get_attribute_string(info, attribute);
+    return text == nullptr ? "" : text;
+}
+
+/** Decimal hundreds, although a mode is octal: callers compare with 700, 600, 500, 400. */
+unsigned ModeByAccess(GFileInfo* info) {
+    unsigned access = 0;
+    access += g_file_info_get_attribute_boolean(info, "access::can-read") ? 4 : 0;
+    access += g_file_info_get_attribute_boolean(info, "access::can-write") ? 2 : 0;
+    access += g_file_info_get_attribute_boolean(info, "access::can-execute") ? 1 : 0;
+    return access * 100;
+}
+
+}  // namespace
+
+bool CreateFile(const char* path, const char* text) {
+    if (path == nullptr || text == nullptr) {
+        LOG_ERROR("Wrong parameters");
+        return false;
+    }
+    if (!CreateParentFolder(path)) {
+        return false;
+    }
+    // The folders belong to users: a link that one of them planted must not lead root elsewhere.
+    const UniqueFd fd(open(path, O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
+    if (!fd) {
+        LOG_ERROR("Can't open file %s, %m", path);
+        return false;
+    }
+    struct flock range = WholeFileForWriting();
+    if (fcntl(fd.Get(), F_SETLK, &range) != 0) {
+        if (errno == EACCES || errno == EAGAIN) {
+            return true;  // another writer is at it, and what it writes is as good as ours
+        }
+        LOG_ERROR("Unable to lock file [%s], %m", path);
+        return false;
+    }
+    return Rewrite(fd.Get(), path, std::string(text) + "\n");
+}
+
+bool CreatePidFile(const char* path, int pid) {
+    return CreateFile(path, std::to_string(static_cast<unsigned>(pid)).c_str());
+}
+
+bool GetFileLine(const char* path, std::string& out) {
+    if (path == nullptr) {
+        LOG_ERROR("Wrong parameters");
+        return false;
+    }
+    const UniqueFile stream = OpenRegular(path);
+    if (stream == nullptr) {
+        if (errno != ENOENT) {
+            LOG_ERROR("Can't open file %s, %m", path);
+        }
+        return false;
+    }
+    char* buffer = nullptr;
+    size_t capacity = 0;
+    ssize_t length = getline(&buffer, &capacity, stream.get());
+    const UniqueCString line(buffer);
+    if (length > 0 && buffer[length - 1] == '\n') {
+        --length;
+    }
+    if (length <= 0) {
+        return false;
+    }
+    out.assign(buffer, static_cast<size_t>(length));
+    return true;
+}
+
+int GetFileInfo(const char* path, std::string& owner, std::string& group, unsigned int& mode) {
+    if (path == nullptr) {
+        LOG_ERROR("Wrong parameters");
+        return 0;
+    }
+    const UniqueObject<GFile> file(g_file_new_for_commandline_arg(path));
+    const auto info = Query(file.get(), path,
+                            "owner::user,owner::group,access::can-read,access::can-write,"
+                            "access::can-execute");
+    if (info == nullptr) {
+        return 0;
+    }
+    owner = TextOf(info.get(), "owner::user");
+    group = TextOf(info.get(), "owner::group");
+    const auto unix_info = Query(file.get(), path, "unix::mode");
+    const bool has_mode =
+        unix_info != nullptr && g_file_info_has_attribute(unix_info.get(), "unix::mode");
+    mode = has_mode ? g_file_info_get_attribute_uint32(unix_info.get(), "unix::mode")
+                    : ModeByAccess(info.get());
+    return 0;
+}
+
+}  // namespace ZYROVFS::Utils

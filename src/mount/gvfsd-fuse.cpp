@@ -1,0 +1,197 @@
+#include <fcntl.h>
+#include <glib.h>
+#include <unistd.h>
+#include <zosplatform/process.h>
+
+#include <cerrno>
+#include <climits>
+#include <cstdio>
+#include <cstdlib>
+
+#include "core/error_cell.h"
+#include "core/handle.h"
+#include "core/log.h"
+#include "core/no_throw.h"
+#include "core/paths.h"
+#include "mount/daemon.h"
+#include "mount/fork_as_user.h"
+#include "zyrovfs/global.h"
+#include "zyrovfs/utils.h"
+#include "zyrovfs/vfs.h"
+
+namespace ZYROVFS {
+namespace {
+
+using UniqueError = std::unique_ptr<GError, FreeWith<g_error_free>>;
+
+/** How a launch ended; travels as the helper's exit status. */
+enum LaunchResult { kLaunched = 0, kLaunchFailed = 1, kStaleMountPoint = 2 };
+
+/** A fuse daemon that died leaves a mount point on which every access fails. */
+int PrepareMountPoint(const std::string& path) {
+    if (!Utils::CreateFolder(path.c_str(), nullptr, true, -1, -1, 0777)) {
+        LOG_ERROR("Failed to mkdir %s, %m", path.c_str());
+        return kStaleMountPoint;
+    }
+    if (access(path.c_str(), F_OK) != 0) {
+        LOG_ERROR("Failed to access %s, %m", path.c_str());
+        return kStaleMountPoint;
+    }
+    return kLaunched;
+}
+
+int SpawnFuse(const std::string& mount_point, GPid& pid) {
+    const char* const argv[] = {paths::kGvfsdFuse,
+                                mount_point.c_str(),
+                                "-f",
+                                "-o",
+                                "big_writes",
+                                "-o",
+                                "direct_io",
+                                "-o",
+                                "allow_other",
+                                nullptr};
+    const auto flags =
+        static_cast<GSpawnFlags>(G_SPAWN_STDOUT_TO_DEV_NULL | G_SPAWN_STDERR_TO_DEV_NULL);
+    GError* error = nullptr;
+    g_spawn_async(nullptr, const_cast<char**>(argv), nullptr, flags, nullptr, nullptr, &pid,
+                  &error);
+    const UniqueError failure(error);
+    if (failure != nullptr) {
+        LOG_ERROR("Error launching gvfsd-fuse: %s", failure->message);
+        return kLaunchFailed;
+    }
+    return kLaunched;
+}
+
+/** The helper's work: as the user, since the mount must be the user's. */
+int LaunchAsUser(uid_t uid) {
+    if (!BecomeUserBySavedRoot(uid)) {
+        return kLaunchFailed;
+    }
+    const std::string mount_point = paths::FuseTree(uid);
+    GPid pid = 0;
+    int result = PrepareMountPoint(mount_point);
+    if (result == kLaunched) {
+        result = SpawnFuse(mount_point, pid);
+    }
+    if (result == kLaunched) {
+        sleep(3);
+        // Not by stdio: the buffer may hold what the caller has not yet written.
+        return dprintf(STDOUT_FILENO, "%u", static_cast<unsigned>(pid)) > 0 ? kLaunched
+                                                                            : kLaunchFailed;
+    }
+    return result;
+}
+
+[[noreturn]] void RunHelper(int report, uid_t uid) {
+    dup2(report, STDOUT_FILENO);
+    // The fuse daemon outlives the caller and its terminal.
+    setsid();
+    const int result = LaunchAsUser(uid);
+    if (result != kLaunched) {
+        LOG_ERROR("Failed to run gvfsd-fuse, uid=%u, %d", uid, result);
+    }
+    _exit(result);
+}
+
+std::string ReadToEnd(int fd) {
+    std::string text;
+    char buffer[128];
+    for (;;) {
+        const ssize_t n = read(fd, buffer, sizeof buffer - 1);
+        if (n > 0) {
+            text.append(buffer, static_cast<size_t>(n));
+        } else if (n == 0 || errno != EINTR) {
+            return text;
+        }
+    }
+}
+
+int RunFuse(uid_t uid, int& pid) {
+    const SigchldGuard collect;
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) != 0) {
+        LOG_ERROR("Failed to create pipe, %m");
+        return kLaunchFailed;
+    }
+    const UniqueFd answer(ends[0]);
+    UniqueFd report(ends[1]);
+    const pid_t helper = fork();
+    if (helper == 0) {
+        RunHelper(report.Get(), uid);
+    }
+    if (helper < 0) {
+        LOG_ERROR("Failed to fork, %m");
+        return kLaunchFailed;
+    }
+    report.Reset();
+    const std::string text = ReadToEnd(answer.Get());
+    const int result = WaitForChild(helper).Result();
+    const long long number = strtoll(text.c_str(), nullptr, 10);
+    pid = number > 0 && number <= INT_MAX ? static_cast<int>(number) : 0;
+    // A helper that somebody else collected has said by the pid whether it did its work.
+    return result == kLaunched && pid == 0 ? static_cast<int>(kLaunchFailed) : result;
+}
+
+[[noreturn]] void UnmountAsRoot(const std::string& path) {
+    if (!BecomeRootForGood()) {
+        _exit(1);
+    }
+    if (YLIBCExec(paths::kUmount, path.c_str(), nullptr) != 0) {
+        LOG_ERROR("Failed to umount %s", path.c_str());
+    }
+    _exit(0);
+}
+
+/** Takes the stale mount away. Whether it worked shows in the next launch. */
+void RepairMountPoint(uid_t uid) {
+    const SigchldGuard collect;
+    const std::string path = paths::FuseTree(uid);
+    const pid_t child = YLIBCProcFork();
+    if (child == 0) {
+        UnmountAsRoot(path);
+    }
+    if (child < 0) {
+        LOG_ERROR("Failed to fork, %m");
+        return;
+    }
+    WaitForChild(child);
+}
+
+bool Launch(uid_t uid) {
+    int pid = 0;
+    int result = RunFuse(uid, pid);
+    if (result == kStaleMountPoint) {
+        RepairMountPoint(uid);
+        result = RunFuse(uid, pid);
+    }
+    if (result != kLaunched) {
+        LOG_ERROR("Failed to run gvfsd-fuse, uid=%u", uid);
+        return false;
+    }
+    if (!WritePid(kGvfsdFuseDaemon, uid, pid)) {
+        return false;
+    }
+    // What the launch left in the cells is no failure of the caller's operation.
+    SetErr(VFS_ERR_NONE);
+    SetPlatformErr(ZOS_ERR_NONE);
+    return true;
+}
+
+}  // namespace
+
+bool GVFSD_FUSE::IsAlive(int pid) {
+    return IsDaemonAlive(kGvfsdFuseDaemon, pid);
+}
+
+bool GVFSD_FUSE::CheckDaemonDied() {
+    return NoThrow(VFS_ERR_FAILED, [] { return ZYROVFS::CheckDaemonDied(kGvfsdFuseDaemon); });
+}
+
+bool GVFSD_FUSE::Init() {
+    const MountLockRelease release;
+    return NoThrow(VFS_ERR_FAILED, [] { return StartIfDead(kGvfsdFuseDaemon, Launch); });
+}
+
+}  // namespace ZYROVFS

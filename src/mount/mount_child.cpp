@@ -1,0 +1,134 @@
+#include "mount/mount_child.h"
+
+#include <libsoup/soup.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <clocale>
+#include <csignal>
+#include <memory>
+#include <new>
+
+#include "core/error_cell.h"
+#include "core/handle.h"
+#include "core/json.h"
+#include "core/log.h"
+#include "mount/fork_as_user.h"
+#include "mount/vfs_question.h"
+#include "mount/vfs_result.h"
+#include "zyrovfs/utils.h"
+
+namespace ZYROVFS {
+namespace {
+
+using UniqueSoupUri = std::unique_ptr<SoupURI, FreeWith<soup_uri_free>>;
+using UniqueGText = std::unique_ptr<char, FreeWith<g_free>>;
+
+/**
+ * The loop's context is the child's own. The default one may belong to another thread of the
+ * parent, which does not exist here and would never give it back, or be full of its sources.
+ */
+GMainLoop* NewLoop() {
+    GMainContext* context = g_main_context_new();
+    g_main_context_push_thread_default(context);
+    GMainLoop* loop = g_main_loop_new(context, FALSE);
+    g_main_context_unref(context);
+    return loop;
+}
+
+void MountLocation(VFS& session) {
+    std::unique_ptr<VFSMountOperaion> mount(new (std::nothrow) VFSMountOperaion);
+    if (mount == nullptr) {
+        LOG_ERROR("No memory");
+        return FailIfNoneSet();
+    }
+    setlocale(LC_ALL, "");
+    mount->session = &session;
+    GFile* file =
+        NewLocation(session.GetFullURI(), session.GetUser(), "", VFS_ERR_HOST_UNREACHABLE);
+    if (file == nullptr) {
+        return;
+    }
+    GMountOperation* operation = NewOperation(*mount, file);
+    g_signal_connect(operation, "ask-question", G_CALLBACK(AskQuestion), mount.get());
+    SetErr(VFS_ERR_NONE);
+    g_file_mount_enclosing_volume(file, G_MOUNT_MOUNT_NONE, operation, nullptr, MountFinished,
+                                  mount.get());
+    g_main_loop_run(mount->loop);
+    g_object_unref(operation);
+}
+
+/** The identity that a user has to confirm, or the place of the mount inside the location. */
+std::string ReportText(const VFS& session) {
+    if (GetError() != VFS_ERR_NONE && !IdentityText().empty()) {
+        return IdentityText();
+    }
+    Json::Value report(Json::objectValue);
+    report["uri_path"] = session.GetPath();
+    return json::toString(report);
+}
+
+/** One write: the parent reads once, and may have closed its end before a long text is through. */
+void WriteReport(int pipe, const std::string& text) {
+    signal(SIGPIPE, SIG_IGN);
+    while (write(pipe, text.data(), text.size()) < 0 && errno == EINTR) {
+    }
+    close(pipe);
+}
+
+}  // namespace
+
+void FailIfNoneSet(SourceLine at) {
+    if (GetError() == VFS_ERR_NONE) {
+        SetErr(VFS_ERR_FAILED, at);
+    }
+}
+
+GFile* NewLocation(const std::string& uri, const std::string& user, const std::string& path,
+                   __tag_vfs_err_ bad_uri, SourceLine at) {
+    const UniqueSoupUri parsed(soup_uri_new(uri.c_str()));
+    if (parsed == nullptr) {
+        LOG_ERROR_AT(at, "Wrong uri, %s", uri.c_str());
+        SetErr(bad_uri, at);
+        return nullptr;
+    }
+    if (!user.empty()) {
+        soup_uri_set_user(parsed.get(), user.c_str());
+    }
+    if (!path.empty()) {
+        soup_uri_set_path(parsed.get(), (path[0] == '/' ? path : "/" + path).c_str());
+    }
+    const UniqueGText text(soup_uri_to_string(parsed.get(), FALSE));
+    const std::string location = Utils::DecodeURI(text.get());
+    GFile* file = g_file_new_for_commandline_arg(location.c_str());
+    if (file == nullptr) {
+        SetErr(VFS_ERR_INVALID_SERVER, at);
+        LOG_ERROR_AT(at, "Wrong input %s, %s", location.c_str(), uri.c_str());
+    }
+    return file;
+}
+
+GMountOperation* NewOperation(VFSMountOperaion& mount, GFile* file) {
+    mount.file = file;
+    mount.loop = NewLoop();
+    GMountOperation* operation = g_mount_operation_new();
+    g_signal_connect(operation, "ask-password", G_CALLBACK(AskPassword), &mount);
+    return operation;
+}
+
+void RunMountChild(VFS& session, uid_t actor, int report) noexcept {
+    RegainRoot();
+    if (BecomeUserForGood(actor)) {
+        MountLocation(session);
+    } else {
+        FailIfNoneSet();
+    }
+    const std::string text = ReportText(session);
+    if (GetError() != VFS_ERR_NONE) {
+        LOG_ERROR("Fail to mount, error = %d", GetError());
+    }
+    WriteReport(report, text);
+    _exit(GetError());
+}
+
+}  // namespace ZYROVFS

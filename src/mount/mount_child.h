@@ -1,0 +1,45 @@
+/**
+ * What a mount or unmount does in its forked child. The child shares nothing with the parent's
+ * main loop, runs no destructor and no exit handler of the parent's, and never returns.
+ */
+#ifndef ZYROVFS_MOUNT_MOUNT_CHILD_H
+#define ZYROVFS_MOUNT_MOUNT_CHILD_H
+
+#include <sys/types.h>
+
+#include <string>
+
+#include "core/source_line.h"
+#include "mount/vfs_private.h"
+#include "zyrovfs/error.h"
+
+namespace ZYROVFS {
+
+/**
+ * Mounts as `actor`, writes the report to the pipe end `report` and ends with the failure code as
+ * exit status.
+ */
+[[noreturn]] void RunMountChild(VFS& session, uid_t actor, int report) noexcept;
+
+/** Ends the connection's transfers as root, then unmounts as `actor`; exit status as above. */
+[[noreturn]] void RunUnmountChild(VFS& session, uid_t actor) noexcept;
+
+/**
+ * The location of `uri` with `user` (and `path`, unless empty) put in, as GIO takes it. Null after
+ * setting `bad_uri` for a URI that cannot be parsed, or VFS_ERR_INVALID_SERVER.
+ */
+GFile* NewLocation(const std::string& uri, const std::string& user, const std::string& path,
+                   __tag_vfs_err_ bad_uri, SourceLine at = SourceLine::Here());
+
+/**
+ * Readies `mount` for an asynchronous call on `file`, of which it becomes the owner: gives it a
+ * loop and hands out the operation that asks the session for passwords.
+ */
+GMountOperation* NewOperation(VFSMountOperaion& mount, GFile* file);
+
+/** A step that failed without a word must not end as success. */
+void FailIfNoneSet(SourceLine at = SourceLine::Here());
+
+}  // namespace ZYROVFS
+
+#endif

@@ -1,0 +1,134 @@
+#include <unistd.h>
+#include <zosplatform/process.h>
+
+#include <clocale>
+#include <cstdlib>
+#include <memory>
+#include <new>
+#include <string>
+
+#include "core/error_cell.h"
+#include "core/handle.h"
+#include "core/log.h"
+#include "core/no_throw.h"
+#include "mount/fork_as_user.h"
+#include "mount/mount_child.h"
+#include "mount/vfs_result.h"
+#include "zyrovfs/global.h"
+#include "zyrovfs/utils.h"
+
+namespace ZYROVFS {
+namespace {
+
+using UniqueError = std::unique_ptr<GError, FreeWith<g_error_free>>;
+
+/** Transfers of the connection keep its mount busy. They may run under any identity of the user. */
+void KillTransfers(const std::string& uri) {
+    const char* user = getenv("ZYROVFS_UID");
+    if (uri.empty() || user == nullptr) {
+        return;
+    }
+    const auto uid = static_cast<unsigned int>(strtoul(user, nullptr, 10));
+    if (!Utils::KillProcByUID(uri.c_str(), uid)) {
+        LOG_ERROR("Failed to kill vfs procs, uid=%16s", user);
+    }
+}
+
+GFile* MountedLocation(const VFS& session) {
+    const std::string full_path = session.GetFullPath();
+    if (full_path.empty()) {
+        return NewLocation(session.GetURI(), session.GetUser(), session.GetPath(),
+                           VFS_ERR_BAD_PARAM);
+    }
+    GFile* file = g_file_new_for_commandline_arg(full_path.c_str());
+    if (file == nullptr) {
+        SetErr(VFS_ERR_INVALID_SERVER);
+        LOG_ERROR("Wrong input %s, %s", full_path.c_str(), session.GetURI().c_str());
+    }
+    return file;
+}
+
+/** Null for a location that is not mounted, which is what an unmount wants. */
+GMount* FindMount(GFile* file, const std::string& uri) {
+    GError* raw = nullptr;
+    GMount* found = g_file_find_enclosing_mount(file, nullptr, &raw);
+    const UniqueError error(raw);
+    if (found == nullptr) {
+        LOG_ERROR("Unable to unmount location uri %s, [%d], %s", uri.c_str(),
+                  error == nullptr ? 0 : error->code,
+                  error == nullptr ? "not mounted" : error->message);
+        SetErr(VFS_ERR_NONE);
+    }
+    return found;
+}
+
+void UnmountLocation(VFS& session) {
+    std::unique_ptr<VFSMountOperaion> mount(new (std::nothrow) VFSMountOperaion);
+    if (mount == nullptr) {
+        LOG_ERROR("No memory");
+        return FailIfNoneSet();
+    }
+    setlocale(LC_ALL, "");
+    mount->session = &session;
+    GFile* file = MountedLocation(session);
+    if (file == nullptr) {
+        return;
+    }
+    GMountOperation* operation = NewOperation(*mount, file);
+    if (GMount* found = FindMount(file, session.GetURI())) {
+        // A refused unmount sets no code and so counts as done, whatever the cell held before.
+        SetErr(VFS_ERR_NONE);
+        g_mount_unmount_with_operation(found, G_MOUNT_UNMOUNT_NONE, operation, nullptr,
+                                       UnmountFinished, mount.get());
+        g_main_loop_run(mount->loop);
+        g_object_unref(found);
+    }
+    g_object_unref(operation);
+}
+
+bool UnmountLocked(VFS& session) {
+    const SigchldGuard collect;
+    const uid_t actor = GetActorUID();
+    const pid_t pid = YLIBCProcFork();
+    if (pid < 0) {
+        return false;
+    }
+    if (pid == 0) {
+        RunUnmountChild(session, actor);
+    }
+    const int status = WaitForChild(pid).Result();
+    if (status > 0) {
+        SetErr(static_cast<__tag_vfs_err_>(status));
+    }
+    return status == 0;
+}
+
+}  // namespace
+
+void RunUnmountChild(VFS& session, uid_t actor) noexcept {
+    RegainRoot();
+    KillTransfers(session.GetURI());
+    if (BecomeUserForGood(actor)) {
+        UnmountLocation(session);
+    } else {
+        FailIfNoneSet();
+    }
+    if (GetError() != VFS_ERR_NONE) {
+        LOG_ERROR("Fail to unmount, error = %d", GetError());
+    }
+    _exit(GetError());
+}
+
+bool VFS::UnMount() {
+    return NoThrow(VFS_ERR_FAILED, [this] {
+        // A lock that cannot be had gives back one level, as it does on every other way out.
+        const ScopeExit unlock([] { Utils::UnLockMnt(); });
+        if (!Utils::LockMnt(true)) {
+            LOG_ERROR("Fail to lock unmmount");
+            return false;
+        }
+        return UnmountLocked(*this);
+    });
+}
+
+}  // namespace ZYROVFS

@@ -1,0 +1,48 @@
+#include "server/server_factory.h"
+
+#include <new>
+
+#include "core/log.h"
+#include "server/server_sharing.h"
+#include "server/server_vfs.h"
+
+namespace ZYROVFS::Server {
+namespace {
+
+template <typename Type>
+std::unique_ptr<ServerBase> Make() {
+    return std::unique_ptr<ServerBase>(new (std::nothrow) Type);
+}
+
+std::unique_ptr<ServerBase> NotBuilt() {
+    LOG_ERROR("Clouds are not part of this build");
+    return nullptr;
+}
+
+struct Row {
+    const char* protocol;
+    std::unique_ptr<ServerBase> (*make)();
+};
+
+constexpr Row kTypes[] = {
+    {"google", NotBuilt},
+    {"dropbox", NotBuilt},
+    {"onedrive", NotBuilt},
+    {"box", NotBuilt},
+    {"sharing", Make<SharingServer>},
+};
+
+}  // namespace
+
+std::unique_ptr<ServerBase> NewServer(const std::string& protocol) {
+    for (const Row& row : kTypes) {
+        if (protocol == row.protocol) {
+            return row.make();
+        }
+    }
+    return Make<VFSServer>();
+}
+
+ServerFactory server_factory = NewServer;
+
+}  // namespace ZYROVFS::Server
