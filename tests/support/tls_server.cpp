@@ -142,6 +142,10 @@ bool ReadRequest(Stream& stream, Request& request) {
         if (!stream.ReadInto(text)) {
             return false;
         }
+        if (text[0] < ' ') {  // a handshake at a plain port
+            stream.Write("HTTP/1.1 400 Bad Request\r\n\r\n");
+            return false;
+        }
     }
     ParseHead(text.substr(0, end), request);
     if (request.headers.count("expect") != 0) {
