@@ -131,7 +131,7 @@ TEST(ToolConnection, ConnectingWhatIsNotRecordedFails) {
 }
 
 TEST(ToolConnection, APathThatCannotBeFoundFails) {
-    for (const char* uri : {"ftp://remo@127.0.0.1:9", "nonsense:", "''"}) {
+    for (const char* uri : {"ftp://remo@127.0.0.1:9", "nonsense://", "'://'"}) {
         const Outcome outcome = Zyrovfs(std::string("path ") + uri + " --uid 4001");
         EXPECT_EQ(outcome.status, 1) << uri;
         EXPECT_THAT(outcome.output, StartsWith("zyrovfs: ")) << uri;

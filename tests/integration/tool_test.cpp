@@ -100,6 +100,8 @@ TEST_F(Tool, WrongUseEndsWithStatus2AndSaysSo) {
         "connection add ftp://h --uid 4001 --hostname h",
         "connection connect --uid 4001",
         "path --uid 4001",
+        "path hello.txt --uid 4001",
+        "path '' --uid 4001",
         "user clean",
         "host",
         "host install --build",

@@ -45,6 +45,8 @@ void AddPathCommand(CLI::App& app, Session& session) {
     CLI::App* command = AddUserCommand(
         app, session, "path", "Print the local path of a remote location, connected if need be",
         [=, &session](unsigned int uid) { return ShowPath(uid, *uri, session.json); });
+    CheckUse(*command, "a URI has the form protocol://account@host:port/path",
+             [uri] { return uri->find("://") != std::string::npos; });
     command->add_option("URI", *uri, "Id of a connection, and a path behind it")->required();
 }
 
