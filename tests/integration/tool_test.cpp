@@ -102,6 +102,8 @@ TEST_F(Tool, WrongUseEndsWithStatus2AndSaysSo) {
         "path --uid 4001",
         "path hello.txt --uid 4001",
         "path '' --uid 4001",
+        "path :// --uid 4001",
+        "path ./a://b --uid 4001",
         "user clean",
         "host",
         "host install --build",
