@@ -418,6 +418,12 @@ TEST_F(Tool, OrdinaryTextOfAnyLanguageIsLeftAsItIs) {
     EXPECT_THAT(Zyrovfs("profile list --uid 4001").output, HasSubstr("Büro 东京"));
 }
 
+TEST_F(Tool, AResultThatCannotBeWrittenIsAFailure) {
+    const Outcome outcome = Zyrovfs("profile list --uid 4001 --json 2>&1 >/dev/full");
+    EXPECT_EQ(outcome.status, 1);
+    EXPECT_EQ(outcome.output, "zyrovfs: Writing the result failed.\n");
+}
+
 TEST_F(Tool, AListingThatCannotBeReadFails) {
     ASSERT_EQ(AddProfile().status, 0);
     Write("/usr/zyro/etc/zyrovfs/4001/servers.conf", "{ broken");

@@ -1,8 +1,13 @@
+#include <cstdio>
+#include <iostream>
+
 #include "command.h"
 #include "report.h"
 
-int main(int argc, char** argv) {
-    using namespace tool;
+namespace tool {
+namespace {
+
+int Main(int argc, char** argv) {
     CLI::App app("Remote storage of one user: profiles, connections, and the host they live on.",
                  "zyrovfs");
     app.require_subcommand(1);
@@ -20,8 +25,23 @@ int main(int argc, char** argv) {
         return app.exit(error) == 0 ? kSuccess : kBadUsage;
     }
     try {
-        return session.action();
+        const int status = session.action();
+        // A script must not take a cut result, as on a full disk, for a whole one.
+        return std::cout.flush() ? status : ReportProblem("Writing the result failed.", false);
     } catch (const std::exception& error) {
+        // Such as JSON that is nested too deeply to be read.
         return ReportProblem(error.what(), session.json);
+    }
+}
+
+}  // namespace
+}  // namespace tool
+
+int main(int argc, char** argv) {
+    try {
+        return tool::Main(argc, argv);
+    } catch (const std::exception& error) {
+        std::fprintf(stderr, "zyrovfs: %s\n", error.what());
+        return tool::kFailure;
     }
 }

@@ -83,9 +83,9 @@ void FillIn(Json::Value& profile) {
 }
 
 bool ShallAsk(const ProfileOptions& options, const Json::Value& profile) {
-    const bool has_account = profile.isMember("account") && profile["account"] != "";
-    return has_account && !options.password.Given() && !profile.isMember("password") &&
-           isatty(STDIN_FILENO) == 1;
+    const Json::Value& account = profile["account"];
+    return account.isString() && !account.asString().empty() && !options.password.Given() &&
+           !profile.isMember("password") && isatty(STDIN_FILENO) == 1;
 }
 
 }  // namespace

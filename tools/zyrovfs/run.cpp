@@ -40,6 +40,7 @@ int Wait(pid_t pid) {
 
 int Spawn(pid_t& pid, const std::vector<std::string>& command, int output) {
     std::vector<char*> argv;
+    argv.reserve(command.size() + 1);
     for (const std::string& argument : command) {
         argv.push_back(const_cast<char*>(argument.c_str()));
     }
