@@ -14,6 +14,7 @@
 #include <cstdio>
 #include <cstring>
 #include <map>
+#include <utility>
 
 namespace {
 
@@ -78,6 +79,8 @@ class Journal {
 
 struct Records {
     std::vector<Entry> entries;
+    std::function<void(size_t)> on_micro_sleep;
+    size_t micro_sleeps = 0;
     std::map<std::string, Failure> failures;
     bool pretend = false;
     bool watch_children = false;
@@ -172,6 +175,10 @@ unsigned sleep(unsigned seconds) {
 
 int usleep(useconds_t microseconds) {
     Keep({Entry::kMicroSleep, static_cast<int>(microseconds), ""});
+    const size_t count = ++Get().micro_sleeps;
+    if (Get().on_micro_sleep) {
+        Get().on_micro_sleep(count);
+    }
     return 0;
 }
 
@@ -227,6 +234,10 @@ std::vector<unsigned> Sleeps() {
 std::vector<unsigned> MicroSleeps() {
     return Collect(Entry::kMicroSleep,
                    [](const Entry& e) { return static_cast<unsigned>(e.number); });
+}
+
+void OnMicroSleep(std::function<void(size_t)> step) {
+    Get().on_micro_sleep = std::move(step);
 }
 
 std::vector<LogLine> LogLines() {

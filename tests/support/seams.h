@@ -6,6 +6,7 @@
 #ifndef ZYROVFS_TESTS_SEAMS_H
 #define ZYROVFS_TESTS_SEAMS_H
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -23,6 +24,8 @@ void WatchChildren();
 /** Seconds of each sleep() and microseconds of each usleep(), in order. */
 std::vector<unsigned> Sleeps();
 std::vector<unsigned> MicroSleeps();
+/** Runs at each usleep() with the number of pauses so far: what happens while somebody waits. */
+void OnMicroSleep(std::function<void(size_t)> step);
 
 struct LogLine {
     int priority;
