@@ -175,7 +175,7 @@ bool Launch(uid_t uid) {
     }
     // What the launch left in the cells is no failure of the caller's operation.
     SetErr(VFS_ERR_NONE);
-    YLIBCErrSetEx(ZOS_ERR_NONE, SourceLine::Here().file, SourceLine::Here().line);
+    SetPlatformErr(ZOS_ERR_NONE);
     return true;
 }
 

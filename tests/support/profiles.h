@@ -3,6 +3,7 @@
 #define ZYROVFS_TESTS_PROFILES_H
 
 #include <gtest/gtest.h>
+#include <json/writer.h>
 
 #include <filesystem>
 #include <fstream>

@@ -14,7 +14,6 @@
 #include <cstdio>
 #include <cstring>
 #include <map>
-#include <utility>
 
 namespace {
 
@@ -79,11 +78,10 @@ class Journal {
 
 struct Records {
     std::vector<Entry> entries;
-    std::function<void(size_t)> on_micro_sleep;
-    size_t micro_sleeps = 0;
     std::map<std::string, Failure> failures;
     bool pretend = false;
     bool watch_children = false;
+    std::function<void()> on_micro_sleep;
 };
 
 Records& Get() {
@@ -127,8 +125,10 @@ void KeepLine(int priority, const char* format, va_list args) {
 /** Records one identity call; true when the real one is still to be made. */
 bool Record(const char* function, const std::string& arguments, int& result) {
     Records& records = Get();
-    Keep({Entry::kIdentity, 0, std::string(function) + "(" + arguments + ")"});
-    const auto failure = records.failures.find(function);
+    const std::string call = std::string(function) + "(" + arguments + ")";
+    Keep({Entry::kIdentity, 0, call});
+    const auto exact = records.failures.find(call);
+    const auto failure = exact != records.failures.end() ? exact : records.failures.find(function);
     if (failure != records.failures.end() && failure->second.after-- <= 0) {
         errno = failure->second.error;
         result = -1;
@@ -175,9 +175,8 @@ unsigned sleep(unsigned seconds) {
 
 int usleep(useconds_t microseconds) {
     Keep({Entry::kMicroSleep, static_cast<int>(microseconds), ""});
-    const size_t count = ++Get().micro_sleeps;
     if (Get().on_micro_sleep) {
-        Get().on_micro_sleep(count);
+        Get().on_micro_sleep();
     }
     return 0;
 }
@@ -236,10 +235,6 @@ std::vector<unsigned> MicroSleeps() {
                    [](const Entry& e) { return static_cast<unsigned>(e.number); });
 }
 
-void OnMicroSleep(std::function<void(size_t)> step) {
-    Get().on_micro_sleep = std::move(step);
-}
-
 std::vector<LogLine> LogLines() {
     return Collect(Entry::kLog, [](const Entry& e) { return LogLine{e.number, e.text}; });
 }
@@ -278,6 +273,10 @@ std::vector<std::string> IdentityCalls() {
 
 void FailIdentity(const std::string& function, int error, int after) {
     Get().failures[function] = {error, after};
+}
+
+void OnMicroSleep(std::function<void()> hook) {
+    Get().on_micro_sleep = std::move(hook);
 }
 
 void PretendIdentity(bool on) {

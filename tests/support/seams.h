@@ -24,8 +24,9 @@ void WatchChildren();
 /** Seconds of each sleep() and microseconds of each usleep(), in order. */
 std::vector<unsigned> Sleeps();
 std::vector<unsigned> MicroSleeps();
-/** Runs at each usleep() with the number of pauses so far: what happens while somebody waits. */
-void OnMicroSleep(std::function<void(size_t)> step);
+
+/** Called by each usleep(), for a test in which something happens during a wait. */
+void OnMicroSleep(std::function<void()> hook);
 
 struct LogLine {
     int priority;
@@ -43,8 +44,9 @@ std::string LogDump();
 /** Identity calls in order, as "setresuid(-1, 0, -1)". */
 std::vector<std::string> IdentityCalls();
 /**
- * Calls of this function ("setresuid", "setresgid", "seteuid", "setegid", "setregid", "setreuid")
- * fail with `error` from now on, the first `after` of them excepted.
+ * Calls of this function ("setresuid", "setresgid", "seteuid", "setegid", "setregid", "setreuid"),
+ * or this very call ("setreuid(0, 0)"), fail with `error` from now on, the first `after` of them
+ * excepted.
  */
 void FailIdentity(const std::string& function, int error, int after = 0);
 /** Identity calls are recorded and answered with success, but change nothing. */

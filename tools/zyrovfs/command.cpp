@@ -1,6 +1,11 @@
 #include "command.h"
 
+#include <unistd.h>
+#include <zosplatform/user.h>
+
 #include <utility>
+
+#include "report.h"
 
 namespace tool {
 
@@ -16,6 +21,53 @@ CLI::App* AddCommand(CLI::App& group, Session& session, const std::string& name,
     command->add_flag("--json", session.json, "Print JSON");
     command->callback([&session, action = std::move(action)] { session.action = action; });
     return command;
+}
+
+CLI::App* AddUserCommand(CLI::App& group, Session& session, const std::string& name,
+                         const std::string& description, std::function<int(unsigned int)> action) {
+    CLI::App* command = AddCommand(group, session, name, description, nullptr);
+    AddUserOptions(*command, session);
+    command->callback([&session, action = std::move(action)] {
+        if (!session.uid && session.user.empty()) {
+            throw CLI::RequiredError("--uid or --user");
+        }
+        session.action = [&session, action] {
+            unsigned int uid = 0;
+            return NeedRoot(session) && ResolveUser(session, uid) ? action(uid) : kFailure;
+        };
+    });
+    return command;
+}
+
+void AddUserOptions(CLI::App& command, Session& session) {
+    CLI::Option* uid = command.add_option("--uid", session.uid, "Act for the user with this id");
+    uid->type_name("UID");
+    command.add_option("--user", session.user, "Act for the user of this name")
+        ->type_name("NAME")
+        ->excludes(uid);
+}
+
+bool ResolveUser(const Session& session, unsigned int& uid) {
+    if (session.uid) {
+        uid = *session.uid;
+        return true;
+    }
+    PZYROUSER user = nullptr;
+    if (ZYROUserGet(session.user.c_str(), &user) < 0) {
+        ReportProblem("There is no user " + session.user + ".", session.json);
+        return false;
+    }
+    uid = user->uid;
+    ZYROUserFree(user);
+    return true;
+}
+
+bool NeedRoot(const Session& session) {
+    if (geteuid() == 0) {
+        return true;
+    }
+    ReportProblem("Only root can act for a user.", session.json);
+    return false;
 }
 
 }  // namespace tool

@@ -4,14 +4,15 @@
 
 #include <CLI/CLI.hpp>
 #include <functional>
+#include <optional>
 #include <string>
 
 namespace tool {
 
 /** What the command line chose. */
 struct Session {
-    std::string uid;   ///< --uid
-    std::string user;  ///< --user
+    std::optional<unsigned int> uid;  ///< --uid
+    std::string user;                 ///< --user
     bool json = false;
     std::function<int()> action;  ///< the chosen command; answers an exit status
 };
@@ -23,6 +24,24 @@ CLI::App* AddGroup(CLI::App& parent, const std::string& name, const std::string&
 CLI::App* AddCommand(CLI::App& group, Session& session, const std::string& name,
                      const std::string& description, std::function<int()> action);
 
+/** A command of root that acts for the user of --uid or --user; `action` is given the uid. */
+CLI::App* AddUserCommand(CLI::App& group, Session& session, const std::string& name,
+                         const std::string& description, std::function<int(unsigned int)> action);
+
+/** --uid and --user. */
+void AddUserOptions(CLI::App& command, Session& session);
+
+/** The uid of --uid or --user; false, with the failure reported, when there is no such user. */
+bool ResolveUser(const Session& session, unsigned int& uid);
+
+/** False, with the failure reported, for anyone but root. */
+bool NeedRoot(const Session& session);
+
+void AddProtocolCommands(CLI::App& app, Session& session);
+void AddProfileCommands(CLI::App& app, Session& session);
+void AddConnectionCommands(CLI::App& app, Session& session);
+void AddPathCommand(CLI::App& app, Session& session);
+void AddUserCommands(CLI::App& app, Session& session);
 void AddHostCommands(CLI::App& app, Session& session);
 
 }  // namespace tool

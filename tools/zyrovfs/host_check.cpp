@@ -42,18 +42,32 @@ void CheckPackages(std::vector<std::string>& missing) {
     }
 }
 
+std::string Join(const std::vector<std::string>& words) {
+    std::string text;
+    for (const std::string& word : words) {
+        text += (text.empty() ? "" : " ") + word;
+    }
+    return text;
+}
+
 void CheckFiles(const HostSources& sources, std::vector<std::string>& missing) {
     std::string problem;
+    std::vector<std::string> absent;
     for (const HostFile& file : HostFiles(sources, problem)) {
         if (!IsInPlace(file)) {
-            missing.push_back(file.path + " is not the one of the host layer.");
+            absent.push_back(file.path);
         }
     }
     if (!problem.empty()) {
         missing.push_back(problem);
     }
-    for (const std::string& path : NamelessMounts()) {
-        missing.push_back(path + " names no protocol and shows as an empty entry.");
+    if (!absent.empty()) {
+        missing.push_back("These are not the files of the host layer: " + Join(absent));
+    }
+    const std::vector<std::string> nameless = NamelessMounts();
+    if (!nameless.empty()) {
+        missing.push_back("These name no protocol and show as empty entries of the catalogue: " +
+                          Join(nameless));
     }
 }
 

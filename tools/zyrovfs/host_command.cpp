@@ -42,7 +42,11 @@ int Remove(bool json) {
 }
 
 int Check(const std::string& build, bool json) {
-    return Report(CheckHost(HostSources::Of(build)), "This host is ready.", json);
+    const int status = Report(CheckHost(HostSources::Of(build)), "This host is ready.", json);
+    if (status != kSuccess && !json) {
+        Say("`zyrovfs host install` sets right what does not come with a package.");
+    }
+    return status;
 }
 
 }  // namespace

@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <climits>
 #include <cstring>
 #include <sstream>
 
@@ -94,6 +95,13 @@ bool NamesProtocol(const std::string& path) {
     return false;
 }
 
+std::string ProgramFolder() {
+    char path[PATH_MAX];
+    const ssize_t length = readlink("/proc/self/exe", path, sizeof path);
+    const std::string text(path, length > 0 ? static_cast<size_t>(length) : 0);
+    return text.substr(0, text.find_last_of('/'));
+}
+
 bool IsRoot(std::vector<std::string>& problems) {
     Note(geteuid() == 0, "Only root can change the host.", problems);
     return problems.empty();
@@ -103,7 +111,8 @@ bool IsRoot(std::vector<std::string>& problems) {
 
 HostSources HostSources::Of(const std::string& build) {
     if (build.empty()) {
-        return {ZYROVFS_LAUNCHER, ZYROVFS_MOUNTS};
+        const std::string here = ProgramFolder();
+        return {here + "/" ZYROVFS_LAUNCHER, here + "/" ZYROVFS_MOUNTS};
     }
     return {build + "/platform/host/gvfsd-fuse-launcher", build + "/platform/host/mounts"};
 }

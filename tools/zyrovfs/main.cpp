@@ -8,6 +8,11 @@ int main(int argc, char** argv) {
     app.require_subcommand(1);
     app.set_version_flag("--version", "zyrovfs " ZYROVFS_VERSION);
     Session session;
+    AddProtocolCommands(app, session);
+    AddProfileCommands(app, session);
+    AddConnectionCommands(app, session);
+    AddPathCommand(app, session);
+    AddUserCommands(app, session);
     AddHostCommands(app, session);
     try {
         app.parse(argc, argv);

@@ -3,6 +3,7 @@
 #include <json/writer.h>
 #include <zyrovfs/error.h>
 
+#include <ctime>
 #include <iostream>
 
 #include "text.h"
@@ -18,14 +19,30 @@ bool CanBeAccepted(__tag_vfs_err_ code) {
            code == VFS_ERR_CERT_UNTRUSTED;
 }
 
-void PrintDetail(const Json::Value& detail) {
-    if (!detail.isObject()) {
-        return;
+std::string Date(const Json::Value& seconds) {
+    const auto time = static_cast<time_t>(seconds.asInt64());
+    tm parts{};
+    char text[64] = "";
+    if (localtime_r(&time, &parts) != nullptr) {
+        strftime(text, sizeof text, "%Y-%m-%d %H:%M:%S %Z", &parts);
     }
-    for (const std::string& key : detail.getMemberNames()) {
-        if (detail[key].isConvertibleTo(Json::stringValue)) {
-            std::cerr << "  " << Printable(key) << ": " << Printable(detail[key].asString())
-                      << "\n";
+    return text;
+}
+
+/** What the server showed: the known members in this order. */
+void PrintDetail(const Json::Value& detail) {
+    constexpr struct {
+        const char* key;
+        const char* label;
+    } kRows[] = {
+        {"host", "Host"},        {"fingerprint", "Fingerprint"}, {"subject", "Issued to"},
+        {"issuer", "Issued by"}, {"availDate", "Valid from"},    {"expDate", "Valid until"}};
+    for (const auto& row : kRows) {
+        const Json::Value& value = detail[row.key];
+        if (value.isInt64()) {
+            std::cerr << "  " << row.label << ": " << Date(value) << "\n";
+        } else if (value.isString()) {
+            std::cerr << "  " << row.label << ": " << Printable(value.asString()) << "\n";
         }
     }
 }
@@ -67,8 +84,13 @@ int ReportFailure(const std::string& what, bool json) {
         return PrintErrorObject(error);
     }
     std::cerr << "zyrovfs: " << Printable(what) << " failed: " << GetErrorName(code) << " ("
-              << static_cast<int>(code) << "): " << GetErrorMeaning(code) << "\n";
-    PrintDetail(detail);
+              << static_cast<int>(code) << "): "
+              << (code == VFS_ERR_NONE ? "No cause was given; the system log may tell."
+                                       : GetErrorMeaning(code))
+              << "\n";
+    if (detail.isObject()) {
+        PrintDetail(detail);
+    }
     if (CanBeAccepted(code)) {
         std::cerr << "If this is the right server, repeat the command with --accept.\n";
     }

@@ -140,8 +140,8 @@ TEST_F(MountLock, ReleasedHalfWayIsTakenAtTheNextAttempt) {
     MakeFile();
     OtherProcess holder([] { return HoldFile(LOCK_EX); });
     ASSERT_TRUE(holder.ok());
-    seams::OnMicroSleep([&holder](size_t count) {
-        if (count == 1100) {
+    seams::OnMicroSleep([&holder, pauses = 0]() mutable {
+        if (++pauses == 1100) {
             holder.End();
         }
     });
@@ -155,8 +155,8 @@ TEST_F(MountLock, ReleasedInTheLastPauseIsStillTaken) {
     MakeFile();
     OtherProcess holder([] { return HoldFile(LOCK_EX); });
     ASSERT_TRUE(holder.ok());
-    seams::OnMicroSleep([&holder](size_t count) {
-        if (count == 2200) {
+    seams::OnMicroSleep([&holder, pauses = 0]() mutable {
+        if (++pauses == 2200) {
             holder.End();
         }
     });

@@ -1,0 +1,15 @@
+/** Running a program to its end. */
+#ifndef ZOSPLATFORM_SRC_EXEC_H
+#define ZOSPLATFORM_SRC_EXEC_H
+
+namespace zos __attribute__((visibility("hidden"))) {
+
+    /** What a program may still write to: its standard error, or nothing. */
+    enum class Output { kErrors, kNone };
+
+    /** As YLIBCExecv. */
+    int Run(const char* path, const char* const argv[], Output output);
+
+}  // namespace )
+
+#endif

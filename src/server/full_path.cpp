@@ -1,0 +1,215 @@
+#include <fcntl.h>
+#include <gio/gio.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <memory>
+
+#include "core/handle.h"
+#include "core/identity.h"
+#include "core/log.h"
+#include "core/no_throw.h"
+#include "mount/fork_as_user.h"
+#include "zyrovfs/global.h"
+#include "zyrovfs/server.h"
+#include "zyrovfs/utils.h"
+
+namespace ZYROVFS::Utils {
+namespace {
+
+using UniqueFile = std::unique_ptr<GFile, FreeWith<g_object_unref>>;
+using UniqueGString = std::unique_ptr<char, FreeWith<g_free>>;
+
+/** The parent takes an answer in pieces of this size and keeps the last one. */
+constexpr size_t kPiece = 8201;
+
+/**
+ * Set while a connection is made on demand, in this process and in the children that it forks
+ * meanwhile. Making a connection looks its path up again; without this mark a location to which
+ * GIO gives no path would be connected on demand in ever deeper children.
+ */
+bool connecting_on_demand = false;
+
+bool Connect(std::string& id) {
+    if (connecting_on_demand) {
+        return false;
+    }
+    connecting_on_demand = true;
+    const ScopeExit done([] { connecting_on_demand = false; });
+    Json::Value out;
+    return Server::Add(GetActorUID(), Server::VFS_CONFIG_CONNECT, id, Json::Value(), false, out);
+}
+
+/** The connection's local path, if it is recorded with one. */
+bool RecordedPath(const std::string& id, std::string& path) {
+    Json::Value record;
+    if (!Server::CfgGetByID(GetActorUID(), Server::VFS_CONFIG_CONNECT, id.c_str(), record) ||
+        !record.isMember("path")) {
+        return false;
+    }
+    path = record["path"].asString();
+    return true;
+}
+
+bool WriteAll(int fd, const std::string& text) {
+    size_t done = 0;
+    while (done < text.size()) {
+        const ssize_t n = write(fd, text.data() + done, text.size() - done);
+        if (n >= 0) {
+            done += static_cast<size_t>(n);
+        } else if (errno != EINTR) {
+            return false;
+        }
+    }
+    return true;
+}
+
+/** What is left of an answer that came in several pieces: the last one. */
+std::string ReadLastPiece(int fd) {
+    char buffer[kPiece];
+    size_t last = 0;
+    for (;;) {
+        const ssize_t n = read(fd, buffer, sizeof buffer);
+        if (n > 0) {
+            last = static_cast<size_t>(n);
+        } else if (n == 0 || errno != EINTR) {
+            return std::string(buffer, strnlen(buffer, last));
+        }
+    }
+}
+
+void SplitAnswer(const std::string& answer, std::string& uriOut, std::string& fullOut) {
+    const size_t newline = answer.find('\n');
+    fullOut = answer.substr(0, newline);
+    if (newline != std::string::npos) {
+        uriOut = answer.substr(newline + 1);
+    }
+}
+
+std::string ToCodepage(const char* path, const char* codepage) {
+    std::string remote = path == nullptr ? "" : path;
+    if (codepage != nullptr && *codepage != '\0' && strcmp(codepage, "UTF-8") != 0) {
+        const std::string utf8 = remote;
+        ConvString(remote, utf8.c_str(), "UTF-8", codepage);
+    }
+    return remote;
+}
+
+/**
+ * The child. It writes its answer past the C library's buffer, which may hold output of the parent,
+ * and ends without the parent's exit handlers. A lookup that finds nothing answers with nothing.
+ */
+[[noreturn]] void LookUpAndExit(int pipe_end, unsigned int uid, const std::string& id,
+                                const std::string& remote) {
+    if (pipe_end != STDOUT_FILENO && dup2(pipe_end, STDOUT_FILENO) < 0) {
+        _exit(1);
+    }
+    const EffectiveUid root(0);
+    if (!BecomeUserForGood(uid)) {
+        _exit(1);
+    }
+    NoThrow(VFS_ERR_FAILED, [&] {
+        const std::string uri = remote.empty() ? id : id + "/" + remote;
+        std::string full;
+        if (!GetFullPath(uri.c_str(), full)) {
+            LOG_ERROR("Failed to get full path, %s", uri.c_str());
+            return false;
+        }
+        return WriteAll(STDOUT_FILENO, remote.empty() ? full : full + "\n" + remote);
+    });
+    _exit(0);
+}
+
+}  // namespace
+
+bool GetPasswordByConfig(const char* uri, std::string& out) {
+    return NoThrow(VFS_ERR_BAD_PARAM, [&] {
+        std::string base;
+        std::string rest;
+        if (!GetURIParts(uri, base, rest)) {
+            LOG_ERROR("Failed to get base uri, %s", uri == nullptr ? "(null)" : uri);
+            return false;
+        }
+        Json::Value record;
+        if (!Server::CfgGetByID(GetActorUID(), Server::VFS_CONFIG_CONNECT, base.c_str(), record)) {
+            LOG_ERROR("Wrong parameters, %s, %s, %u", uri, base.c_str(), GetActorUID());
+            return false;
+        }
+        out = record.get("password", "").asString();
+        return true;
+    });
+}
+
+bool GetFullPathByConfig(const char* uri, std::string& base, std::string& rest, std::string& full) {
+    return NoThrow(VFS_ERR_BAD_PARAM, [&] {
+        if (!GetURIParts(uri, base, rest)) {
+            return false;
+        }
+        std::string path;
+        if (!RecordedPath(base, path)) {
+            if (!Connect(base)) {
+                LOG_ERROR("Failed to add connection from server ID: %s", base.c_str());
+                return false;
+            }
+            if (!RecordedPath(base, path)) {
+                LOG_ERROR("Wrong parameters, %s, %s, %u", uri, base.c_str(), GetActorUID());
+                return false;
+            }
+        }
+        full = path + rest;
+        return true;
+    });
+}
+
+bool GetFullPathByConfig(const char* uri, std::string& full) {
+    std::string base;
+    std::string rest;
+    return GetFullPathByConfig(uri, base, rest, full);
+}
+
+bool GetFullPath(const char* uri, std::string& full) {
+    if (uri == nullptr) {
+        LOG_ERROR("Wrong parameters");
+        return false;
+    }
+    const UniqueFile file(g_file_new_for_commandline_arg(uri));
+    const UniqueGString path(file ? g_file_get_path(file.get()) : nullptr);
+    if (!path) {
+        return GetFullPathByConfig(uri, full);
+    }
+    full = path.get();
+    return true;
+}
+
+bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const char* codepage,
+                 std::string& uriOut, std::string& fullOut) {
+    if (serverId == nullptr) {
+        LOG_ERROR("Wrong parameters");
+        return false;
+    }
+    const SigchldGuard collectable;
+    const std::string remote = ToCodepage(path, codepage);
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) != 0) {
+        LOG_ERROR("Failed to create pipe");
+        return false;
+    }
+    UniqueFd in(ends[0]);
+    UniqueFd out(ends[1]);
+    const pid_t child = fork();
+    if (child == 0) {
+        in.Reset();
+        LookUpAndExit(out.Get(), uid, serverId, remote);
+    }
+    out.Reset();
+    if (child < 0) {
+        return false;
+    }
+    const std::string answer = ReadLastPiece(in.Get());
+    const int status = WaitForChild(child).Result();
+    SplitAnswer(answer, uriOut, fullOut);
+    return status == 0;
+}
+
+}  // namespace ZYROVFS::Utils

@@ -1,0 +1,116 @@
+#include <dirent.h>
+#include <zosplatform/file.h>
+#include <zosplatform/process.h>
+
+#include <cerrno>
+#include <memory>
+
+#include "core/handle.h"
+#include "core/log.h"
+#include "core/no_throw.h"
+#include "core/paths.h"
+#include "zyrovfs/global.h"
+#include "zyrovfs/server.h"
+#include "zyrovfs/utils.h"
+#include "zyrovfs/vfs.h"
+
+namespace ZYROVFS::Server {
+namespace {
+
+using UniqueDir = std::unique_ptr<DIR, FreeWith<closedir>>;
+
+bool IsAnyDaemonDead() {
+    return DBUS::CheckDaemonDied() || GVFSD::CheckDaemonDied() || GVFSD_FUSE::CheckDaemonDied();
+}
+
+bool AreAllDaemonsDead() {
+    return DBUS::CheckDaemonDied() && GVFSD::CheckDaemonDied() && GVFSD_FUSE::CheckDaemonDied();
+}
+
+void UnmountAll(unsigned int uid) {
+    Json::Value doc;
+    if (!CfgAccess(uid, VFS_CONFIG_CONNECT, VFS_CONFIG_READ, doc)) {
+        LOG_ERROR("Failed to list server config of user(%u), code=%u", uid, GetError());
+        return;
+    }
+    for (const std::string& id : doc["servers"].getMemberNames()) {
+        VFS session;
+        if (!session.Init(nullptr, nullptr, id.c_str(), nullptr, nullptr,
+                          Json::Value(Json::objectValue), false) ||
+            !session.UnMount()) {
+            LOG_ERROR("Failed to unmount vfs server, uid=%u, serverID=%s", uid, id.c_str());
+        }
+    }
+}
+
+void RemoveTree(const std::string& path) {
+    const char* const argv[] = {paths::kRm, "-rf", path.c_str(), nullptr};
+    if (YLIBCExecv(paths::kRm, argv) != 0) {
+        LOG_ERROR("Failed to rm -rf %s, errno=%X", path.c_str(), errno);
+    }
+}
+
+/** Looks through what the fuse tree shows. Nothing found there keeps the directory: a tree without
+ * daemons holds no remote files. */
+void ScanFuseTree(const std::string& path) {
+    if (!YLIBCFileExist(path.c_str())) {
+        return;
+    }
+    const UniqueDir dir(opendir(path.c_str()));
+    if (!dir) {
+        LOG_ERROR("Failed to opendir, path=%s", path.c_str());
+        return;
+    }
+    while (readdir(dir.get()) != nullptr) {
+    }
+}
+
+void RemoveFiles(unsigned int uid, bool removeProfiles, bool removeRuntime) {
+    if (!Utils::LockMnt(true)) {
+        LOG_ERROR("Fail to lock mnt");
+        return;
+    }
+    const ScopeExit unlock([] { Utils::UnLockMnt(); });
+    if (removeProfiles) {
+        RemoveTree(paths::UserConfigDir(uid));
+    }
+    RemoveTree(paths::UserConnectDir(uid));
+    if (removeRuntime && AreAllDaemonsDead()) {
+        ScanFuseTree(paths::FuseTree(uid));
+        RemoveTree(paths::RuntimeDir(uid));
+    }
+}
+
+void CleanUp(unsigned int uid, bool removeProfiles, bool removeRuntime) {
+    InitGlobal(uid, true);
+    if (!IsAnyDaemonDead()) {
+        // A damaged list of connections must not keep the files in place.
+        NoThrow(VFS_ERR_CONFIG_READ, [&] {
+            UnmountAll(uid);
+            return true;
+        });
+    }
+    RemoveFiles(uid, removeProfiles, removeRuntime);
+}
+
+}  // namespace
+
+bool DeleteUser(Json::Value& uids, bool removeProfiles, bool removeRuntime) {
+    NoThrow(VFS_ERR_BAD_PARAM, [&] {
+        if (!uids.isArray()) {
+            LOG_ERROR("Wrong JSON value, user ids are no array");
+            return false;
+        }
+        for (const Json::Value& uid : uids) {
+            if (uid.isUInt()) {
+                CleanUp(uid.asUInt(), removeProfiles, removeRuntime);
+            } else {
+                LOG_ERROR("Wrong JSON value, a user id is no number");
+            }
+        }
+        return true;
+    });
+    return true;
+}
+
+}  // namespace ZYROVFS::Server

@@ -1,0 +1,42 @@
+/** Options that describe a profile, shared by the commands that make or change one. */
+#ifndef ZYROVFS_TOOLS_PROFILE_OPTIONS_H
+#define ZYROVFS_TOOLS_PROFILE_OPTIONS_H
+
+#include <json/value.h>
+#include <CLI/CLI.hpp>
+
+#include <string>
+
+#include "password.h"
+
+namespace tool {
+
+struct ProfileOptions {
+    Json::Value given = Json::objectValue;  ///< what options named, by the profile's keys
+    std::string from;                       ///< file with a profile as JSON
+    PasswordOptions password;
+
+    bool Empty() const { return given.empty() && from.empty() && !password.Given(); }
+};
+
+/**
+ * The options of a profile's keys, --from and those of the password. Saved profiles take their
+ * remote path from the live connection, so that option is for connections alone.
+ */
+void AddProfileOptions(CLI::App& command, ProfileOptions& options, bool for_connection);
+
+/** The changes that the options ask for. False with a sentence. */
+bool ReadChanges(const ProfileOptions& options, Json::Value& changes, std::string& problem);
+
+/**
+ * A whole new profile: what the options say, the password asked for when there is an account and
+ * someone at the terminal, and the plain values for what was left out. False with a sentence.
+ */
+bool ReadProfile(const ProfileOptions& options, Json::Value& profile, std::string& problem);
+
+/** Takes passwords and tokens out of a profile that is to be shown. */
+void DropCredentials(Json::Value& profile);
+
+}  // namespace tool
+
+#endif
