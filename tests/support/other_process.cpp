@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include <csignal>
+#include <ctime>
 
 namespace support {
 
@@ -42,6 +43,25 @@ void OtherProcess::End() {
         waitpid(pid_, nullptr, 0);
         pid_ = -1;
     }
+}
+
+bool OtherProcess::Runs() const {
+    siginfo_t info{};
+    return waitid(P_PID, static_cast<id_t>(pid_), &info, WEXITED | WNOHANG | WNOWAIT) == 0 &&
+           info.si_pid == 0;
+}
+
+int OtherProcess::EndedBy() {
+    for (int i = 0; i < 2000; ++i) {
+        int status = 0;
+        if (waitpid(pid_, &status, WNOHANG) == pid_) {
+            pid_ = -1;
+            return WIFSIGNALED(status) ? WTERMSIG(status) : 0;
+        }
+        const timespec pause{0, 1000000};
+        nanosleep(&pause, nullptr);
+    }
+    return 0;
 }
 
 int ExitOf(const std::function<int()>& body) {

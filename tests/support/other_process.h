@@ -23,6 +23,9 @@ class OtherProcess {
     pid_t pid() const { return pid_; }
     /** Ends it and collects it; harmless when it has ended. */
     void End();
+    bool Runs() const;
+    /** Waits for it to end by itself: the signal that ended it, 0 when none did. */
+    int EndedBy();
 
   private:
     pid_t pid_ = -1;
