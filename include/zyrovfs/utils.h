@@ -66,7 +66,7 @@ ZYROVFS_API bool CreateFolder(const char* path, char** stop, bool replaceNonDir,
                               unsigned int gid, unsigned int mode);
 
 /** Writes one line to a file (mode 0600), its folders made. True without writing when another
- * process holds the file locked. */
+ * process holds the file locked; a symbolic link in the file's place is refused. */
 ZYROVFS_API bool CreateFile(const char* path, const char* text);
 
 /** CreateFile with the decimal pid. */

@@ -16,7 +16,7 @@ namespace ZYROVFS::json {
 namespace {
 
 // Far beyond any document of ours, far below what would exhaust the memory of the box.
-constexpr off_t kLargestDocument = 64 << 20;
+constexpr size_t kLargestDocument = 64 << 20;
 
 const Json::CharReaderBuilder& ReaderRules() {
     static const Json::CharReaderBuilder rules = [] {
@@ -96,7 +96,7 @@ bool fromFile(Json::Value& value, const std::string& path) try {
         errno = S_ISDIR(info.st_mode) ? EISDIR : EINVAL;
         return false;
     }
-    if (info.st_size > kLargestDocument) {
+    if (static_cast<size_t>(info.st_size) > kLargestDocument) {
         errno = EFBIG;
         return false;
     }
@@ -109,7 +109,14 @@ bool fromFile(Json::Value& value, const std::string& path) try {
 }
 
 bool toFile(const Json::Value& value, const std::string& path, mode_t mode, FileOwner owner) try {
-    return ReplaceFile(path, toString(value) + "\n", mode, owner);
+    const std::string text = toString(value) + "\n";
+    if (text.size() > kLargestDocument) {
+        errno = EFBIG;
+        return false;
+    }
+    // What cannot be read back (nested too deeply, an infinite number) must not replace what can.
+    Json::Value check;
+    return fromString(check, text) && ReplaceFile(path, text, mode, owner);
 } catch (const std::exception&) {
     errno = ENOMEM;
     return false;

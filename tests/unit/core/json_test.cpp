@@ -376,6 +376,36 @@ TEST_F(JsonFile, LinkOrFifoInTheFilesPlaceIsReplacedNotFollowed) {
     EXPECT_TRUE(fs::is_regular_file(fs::symlink_status(kFile)));
 }
 
+TEST_F(JsonFile, ValueThatCouldNotBeReadBackIsNotWritten) {
+    ASSERT_TRUE(toFile(Document(), kFile));
+    Json::Value deep;
+    for (int level = 0; level < 1500; ++level) {
+        Json::Value outer(Json::arrayValue);
+        outer.append(std::move(deep));
+        deep = std::move(outer);
+    }
+    EXPECT_FALSE(toFile(deep, kFile));
+    EXPECT_EQ(errno, EINVAL);
+    EXPECT_FALSE(toFile(Json::Value(std::string(65 << 20, 'x')), kFile));
+    EXPECT_EQ(errno, EFBIG);
+    Json::Value value;
+    EXPECT_TRUE(fromFile(value, kFile));
+    EXPECT_EQ(value, Document());
+    EXPECT_EQ(NamesInTop(), 1U);
+}
+
+TEST_F(JsonFile, InfiniteNumberNeverSpoilsADocument) {
+    ASSERT_TRUE(toFile(Document(), kFile));
+    for (const double number : {HUGE_VAL, -HUGE_VAL, std::nan("")}) {
+        Json::Value in = Document(2);
+        in["number"] = number;
+        const bool written = toFile(in, kFile);
+        Json::Value out;
+        EXPECT_TRUE(fromFile(out, kFile)) << number;
+        EXPECT_EQ(out["sftp://amy@h"]["number"].asInt(), written ? 2 : 1) << number;
+    }
+}
+
 TEST_F(JsonFile, PathsThatNameNoFileAreRefused) {
     EXPECT_FALSE(toFile(Document(), ""));
     EXPECT_FALSE(toFile(Document(), kTop + "/none/connect.conf"));
