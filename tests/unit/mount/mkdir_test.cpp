@@ -18,8 +18,10 @@
 
 namespace {
 
-/** What the next mkdir of the code under test does in place of the system call, if set. */
+/** What mkdir of the code under test does in place of the system call, if set. */
 std::function<int(const char*)> instead_of_mkdir;
+/** The same for chown: its errno. */
+int chown_fails_with = 0;
 
 }  // namespace
 
@@ -30,6 +32,16 @@ extern "C" int mkdir(const char* path, mode_t mode) noexcept {
     using Real = int (*)(const char*, mode_t);
     static const auto real = reinterpret_cast<Real>(dlsym(RTLD_NEXT, "mkdir"));
     return real(path, mode);
+}
+
+extern "C" int chown(const char* path, uid_t uid, gid_t gid) noexcept {
+    if (chown_fails_with != 0) {
+        errno = chown_fails_with;
+        return -1;
+    }
+    using Real = int (*)(const char*, uid_t, gid_t);
+    static const auto real = reinterpret_cast<Real>(dlsym(RTLD_NEXT, "chown"));
+    return real(path, uid, gid);
 }
 
 namespace ZYROVFS::Utils {
@@ -63,6 +75,7 @@ class Folders : public testing::Test {
     }
     void TearDown() override {
         instead_of_mkdir = nullptr;
+        chown_fails_with = 0;
         umask(022);
     }
     /** MkdirP with nothing special asked for. */
@@ -289,6 +302,15 @@ TEST_F(CreateFolderTest, FailureTellsThePlatformErrorAndErrno) {
     const std::string begin = "Failed to mkdir " + kTop + "/file [0x0800 mkdir.cpp:";
     EXPECT_TRUE(seams::LoggedPart(begin)) << seams::LogDump();
     EXPECT_TRUE(seams::LoggedPart("], File exists")) << seams::LogDump();
+}
+
+TEST_F(CreateFolderTest, SystemFailureThatSaysItIsThereCountsAsSuccess) {
+    chown_fails_with = EEXIST;
+    EXPECT_EQ(MkdirP((kTop + "/a").c_str(), nullptr, 0, 1001, 100, 0777), -1);
+    EXPECT_EQ(YLIBCErrGet(), 0x3c00U);
+    EXPECT_TRUE(CreateFolder((kTop + "/b").c_str(), nullptr, false, 1001, 100, 0777));
+    chown_fails_with = EPERM;
+    EXPECT_FALSE(CreateFolder((kTop + "/c").c_str(), nullptr, false, 1001, 100, 0777));
 }
 
 TEST_F(CreateFolderTest, NullPathIsAFailure) {
