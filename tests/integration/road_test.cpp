@@ -98,6 +98,15 @@ class Road : public testing::TestWithParam<Location> {
             Server::Add(uid, Server::VFS_CONFIG_CONNECT, id_, Json::Value(), false, connection_))
             << Cause();
         path_ = connection_["path"].asString();
+        ASSERT_TRUE(IsReadable());
+    }
+
+    /** For a moment after a remount the tree's client still asks the backend that is gone. */
+    bool IsReadable() const {
+        return Eventually([this] {
+            return RunAs("amy", "cat '" + path_ + "/hello.txt'").output ==
+                   "hello from the remote side\n";
+        });
     }
 
     void TearDown() override {
@@ -155,11 +164,7 @@ TEST_P(Road, ChangedPasswordMountsAnew) {
     std::string id = id_;
     ASSERT_TRUE(Server::Set(kAmy, Server::VFS_CONFIG_CONNECT, id, change, false)) << Cause();
     EXPECT_EQ(id, id_);
-    // The client module of the tree forgets the backend that is gone at its first failure.
-    EXPECT_TRUE(Eventually([this] {
-        return RunAs("amy", "cat '" + path_ + "/hello.txt'").output ==
-               "hello from the remote side\n";
-    }));
+    EXPECT_TRUE(IsReadable());
 
     Json::Value profile;
     ASSERT_TRUE(Server::Get(kAmy, Server::VFS_CONFIG_CONNECT, id.c_str(), true, false, profile));
