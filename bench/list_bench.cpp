@@ -10,15 +10,15 @@ void ListProfiles(benchmark::State& state) {
     bench::Fill(static_cast<int>(count));
     for (auto _ : state) {
         Json::Value out;
-        if (!ZYROVFS::Server::List(bench::kUid, ZYROVFS::Server::VFS_CONFIG_SERVER, nullptr, "alias",
-                                   true, 0, 0, out) ||
+        if (!ZYROVFS::Server::List(bench::kUid, ZYROVFS::Server::VFS_CONFIG_SERVER, nullptr,
+                                   "alias", true, 0, 0, out) ||
             out["total"].asInt64() != count) {
             state.SkipWithError("not listed");
         }
     }
-    state.counters["per_entry"] = benchmark::Counter(
-        static_cast<double>(count) * static_cast<double>(state.iterations()),
-        benchmark::Counter::kIsRate | benchmark::Counter::kInvert);
+    state.counters["per_entry"] =
+        benchmark::Counter(static_cast<double>(count) * static_cast<double>(state.iterations()),
+                           benchmark::Counter::kIsRate | benchmark::Counter::kInvert);
 }
 
 }  // namespace

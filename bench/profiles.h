@@ -13,7 +13,9 @@ namespace bench {
 
 inline constexpr unsigned kUid = 4001;
 
-inline std::string Id(int number) { return "ftp://amy@nas" + std::to_string(number) + ".example"; }
+inline std::string Id(int number) {
+    return "ftp://amy@nas" + std::to_string(number) + ".example";
+}
 
 inline std::string Enciphered(const std::string& password) {
     char buffer[4096];

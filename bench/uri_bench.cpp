@@ -1,4 +1,5 @@
-// URI work, which every operation on a connection does a few times, against one bare parse and print.
+// URI work, which every operation on a connection does a few times, against one bare parse and
+// print.
 #include <benchmark/benchmark.h>
 #include <libsoup/soup.h>
 

@@ -129,8 +129,8 @@ bool MountLocked(VFS& session) {
 bool MountSession(VFS& session) {
     const std::string uri = session.GetFullURI();
     if (Contains(uri, "davs://") &&
-        !Utils::SSLVerifyPeer(session.GetUser().c_str(), session.GetPass().c_str(),
-                              session.GetURI().c_str(), session.GetForce())) {
+        !Utils::SSLVerifyPeer(session.GetUser().c_str(), session.GetPass().c_str(), uri.c_str(),
+                              session.GetForce())) {
         LOG_ERROR("Failed to verify peer ssl CA");
         return false;
     }

@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <openssl/bio.h>
+#include <openssl/err.h>
 #include <openssl/evp.h>
 #include <openssl/pem.h>
 #include <openssl/ssl.h>
@@ -102,7 +103,18 @@ bool IsSavedCertificate(const X509* peer, const char* text) {
     return false;
 }
 
+/** libcurl names a failed handshake after the oldest error of OpenSSL's queue: what goes wrong
+ * while a name or a saved file is read must not stand there before the refusal itself. */
+class ErrorsOfItsOwn {
+  public:
+    ErrorsOfItsOwn() { ERR_set_mark(); }
+    ErrorsOfItsOwn(const ErrorsOfItsOwn&) = delete;
+    ErrorsOfItsOwn& operator=(const ErrorsOfItsOwn&) = delete;
+    ~ErrorsOfItsOwn() { ERR_pop_to_mark(); }
+};
+
 int CheckCertificate(X509_STORE_CTX* store, void* saved) noexcept try {
+    const ErrorsOfItsOwn errors;
     X509* peer = X509_STORE_CTX_get0_cert(store);
     KeepCertificate(peer);
     if (check_chain) {
@@ -116,6 +128,15 @@ int CheckCertificate(X509_STORE_CTX* store, void* saved) noexcept try {
 } catch (const std::exception& e) {
     LOG_ERROR("Unexpected failure, %s", e.what());
     return 0;
+}
+
+/** libcurl leaves the store empty where its own check is off; a chain needs roots to end in. */
+void LoadRoots(SSL_CTX* ssl) {
+    X509_STORE* store = SSL_CTX_get_cert_store(ssl);
+    if (sk_X509_OBJECT_num(X509_STORE_get0_objects(store)) == 0 &&
+        X509_STORE_load_file(store, paths::kCaBundle) != 1) {
+        LOG_ERROR("Failed to load %s", paths::kCaBundle);
+    }
 }
 
 /** Fills `data` up to `size` bytes or the end of the file. */
@@ -191,7 +212,9 @@ CURLcode Utils::VerifyCertCtxFn(CURL*, void* ctx, void* data) noexcept {
         return CURLE_SSL_CERTPROBLEM;
     }
     auto* ssl = static_cast<SSL_CTX*>(ctx);
-    if (!check_chain) {
+    if (check_chain) {
+        LoadRoots(ssl);
+    } else {
         SSL_CTX_set_verify_depth(ssl, 1);
     }
     SSL_CTX_set_verify(ssl, SSL_VERIFY_PEER | SSL_VERIFY_FAIL_IF_NO_PEER_CERT, nullptr);

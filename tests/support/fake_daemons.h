@@ -15,6 +15,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <chrono>
 #include <csignal>
 #include <cstdlib>
@@ -43,8 +44,11 @@ inline std::string Read(const std::string& path) {
     return text.str();
 }
 
+/** Writes a file; folders that are missing are open to all, as the library makes them. */
 inline void Write(const std::string& path, const std::string& text) {
+    const mode_t mask = umask(0);
     std::filesystem::create_directories(std::filesystem::path(path).parent_path());
+    umask(mask);
     std::ofstream(path) << text;
 }
 

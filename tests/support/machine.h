@@ -68,6 +68,20 @@ inline std::string Read(const std::string& path) {
     return text.str();
 }
 
+/**
+ * Waits until a condition holds, for at most ten seconds: the fuse tree learns of mounts, and
+ * writes back what was closed, a moment after the call that caused it.
+ */
+inline bool Eventually(const std::function<bool()>& condition) {
+    for (int i = 0; i < 200; ++i) {
+        if (condition()) {
+            return true;
+        }
+        usleep(50000);
+    }
+    return false;
+}
+
 /** Runs a body in a child process, as a CGI program of its own would; its result is the status. */
 inline int InProcess(const std::function<int()>& body) {
     fflush(nullptr);

@@ -125,8 +125,10 @@ void KeepLine(int priority, const char* format, va_list args) {
 /** Records one identity call; true when the real one is still to be made. */
 bool Record(const char* function, const std::string& arguments, int& result) {
     Records& records = Get();
-    Keep({Entry::kIdentity, 0, std::string(function) + "(" + arguments + ")"});
-    const auto failure = records.failures.find(function);
+    const std::string call = std::string(function) + "(" + arguments + ")";
+    Keep({Entry::kIdentity, 0, call});
+    const auto exact = records.failures.find(call);
+    const auto failure = exact != records.failures.end() ? exact : records.failures.find(function);
     if (failure != records.failures.end() && failure->second.after-- <= 0) {
         errno = failure->second.error;
         result = -1;

@@ -44,8 +44,9 @@ std::string LogDump();
 /** Identity calls in order, as "setresuid(-1, 0, -1)". */
 std::vector<std::string> IdentityCalls();
 /**
- * Calls of this function ("setresuid", "setresgid", "seteuid", "setegid", "setregid", "setreuid")
- * fail with `error` from now on, the first `after` of them excepted.
+ * Calls of this function ("setresuid", "setresgid", "seteuid", "setegid", "setregid", "setreuid"),
+ * or this very call ("setreuid(0, 0)"), fail with `error` from now on, the first `after` of them
+ * excepted.
  */
 void FailIdentity(const std::string& function, int error, int after = 0);
 /** Identity calls are recorded and answered with success, but change nothing. */

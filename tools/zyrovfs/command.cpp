@@ -47,6 +47,14 @@ void AddUserOptions(CLI::App& command, Session& session) {
         ->excludes(uid);
 }
 
+void CheckUse(CLI::App& command, const std::string& hint, std::function<bool()> fits) {
+    command.parse_complete_callback([&command, hint, fits = std::move(fits)] {
+        if (!fits()) {
+            throw CLI::ValidationError(command.get_name(), hint);
+        }
+    });
+}
+
 bool ResolveUser(const Session& session, unsigned int& uid) {
     if (session.uid) {
         uid = *session.uid;

@@ -31,6 +31,9 @@ CLI::App* AddUserCommand(CLI::App& group, Session& session, const std::string& n
 /** --uid and --user. */
 void AddUserOptions(CLI::App& command, Session& session);
 
+/** Options that do not fit together are bad usage, with `hint`. */
+void CheckUse(CLI::App& command, const std::string& hint, std::function<bool()> fits);
+
 /** The uid of --uid or --user; false, with the failure reported, when there is no such user. */
 bool ResolveUser(const Session& session, unsigned int& uid);
 

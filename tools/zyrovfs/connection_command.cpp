@@ -41,13 +41,10 @@ void AddAddCommand(CLI::App& group, Session& session) {
     add->add_option("ID", options->id, "Id of a saved profile");
     AddProfileOptions(*add, options->profile, true);
     AddAcceptOption(*add, options->accept);
-    // Runs while the line is parsed, so that a wrong one counts as bad usage.
-    add->parse_complete_callback([options] {
-        if (options->id.empty() == options->profile.Empty()) {
-            throw CLI::ValidationError("connection add",
-                                       "give the id of a saved profile, or describe a server");
-        }
-    });
+    CheckUse(
+        *add, "give the id of a saved profile, or --protocol and --hostname, or --from", [options] {
+            return options->id.empty() ? options->profile.Describes() : options->profile.Empty();
+        });
 }
 
 void AddConnectCommands(CLI::App& group, Session& session) {

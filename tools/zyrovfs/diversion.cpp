@@ -6,6 +6,7 @@
 #include <cstring>
 #include <sstream>
 
+#include "file.h"
 #include "run.h"
 
 namespace tool {
@@ -55,6 +56,7 @@ bool Divert(const std::string& path, std::string& problem) {
 }
 
 bool Undivert(const std::string& path, std::string& problem) {
+    RemoveLeftover(path);
     if (unlink(path.c_str()) < 0 && errno != ENOENT) {
         problem = "Removing " + path + " failed: " + std::strerror(errno);
         return false;

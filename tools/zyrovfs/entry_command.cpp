@@ -151,6 +151,7 @@ void AddSetCommand(CLI::App& group, Session& session, const EntryKind& kind) {
     command->add_option("ID", options->id, "Id, as `list` shows it")->required();
     const bool for_connection = kind.mode == Server::VFS_CONFIG_CONNECT;
     AddProfileOptions(*command, options->profile, for_connection);
+    CheckUse(*command, "say what to change", [options] { return !options->profile.Empty(); });
     if (for_connection) {
         AddAcceptOption(*command, options->accept);
     }

@@ -79,6 +79,10 @@ bool ReplaceLink(const std::string& path, const std::string& target) {
     return rename(fresh.c_str(), path.c_str()) == 0 || Fail(fresh);
 }
 
+void RemoveLeftover(const std::string& path) {
+    unlink(NewName(path).c_str());
+}
+
 std::vector<std::string> ListFolder(const std::string& path, const std::string& suffix) {
     std::vector<std::string> names;
     DIR* folder = opendir(path.c_str());

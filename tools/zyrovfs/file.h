@@ -18,6 +18,9 @@ bool ReplaceFile(const std::string& path, const std::string& content, mode_t mod
 /** The same for a symbolic link. */
 bool ReplaceLink(const std::string& path, const std::string& target);
 
+/** Removes what a ReplaceFile or ReplaceLink that was killed left beside `path`. */
+void RemoveLeftover(const std::string& path);
+
 /** Names in a folder that end in `suffix`, sorted; none when it cannot be read. */
 std::vector<std::string> ListFolder(const std::string& path, const std::string& suffix);
 

@@ -1,6 +1,7 @@
 #include "password.h"
 
 #include <fcntl.h>
+#include <poll.h>
 #include <termios.h>
 #include <unistd.h>
 
@@ -17,20 +18,28 @@ namespace {
 
 volatile sig_atomic_t caught_signal = 0;
 
-/** Ends a read() on the terminal, so that the echo comes back before the signal has its way. */
+/**
+ * Keeps signals that would end the program for Wait, so that the echo comes back before they have
+ * their way.
+ */
 class SignalCatcher {
   public:
     SignalCatcher() {
         struct sigaction action {};
         action.sa_handler = [](int signal) { caught_signal = signal; };
         caught_signal = 0;
+        sigset_t held;
+        sigemptyset(&held);
         for (size_t i = 0; i < std::size(kSignals); ++i) {
             sigaction(kSignals[i], &action, &before_[i]);
+            sigaddset(&held, kSignals[i]);
         }
+        sigprocmask(SIG_BLOCK, &held, &mask_);
     }
     SignalCatcher(const SignalCatcher&) = delete;
     SignalCatcher& operator=(const SignalCatcher&) = delete;
     ~SignalCatcher() {
+        sigprocmask(SIG_SETMASK, &mask_, nullptr);
         for (size_t i = 0; i < std::size(kSignals); ++i) {
             sigaction(kSignals[i], &before_[i], nullptr);
         }
@@ -39,9 +48,16 @@ class SignalCatcher {
         }
     }
 
+    /** Until there is something to read; false when a signal came first. */
+    bool Wait(int fd) const {
+        pollfd poll_fd = {fd, POLLIN, 0};
+        return ppoll(&poll_fd, 1, nullptr, &mask_) == 1;
+    }
+
   private:
     static constexpr int kSignals[] = {SIGINT, SIGTERM, SIGQUIT, SIGHUP};
     struct sigaction before_[std::size(kSignals)];
+    sigset_t mask_;
 };
 
 /** A terminal that does not show what is typed. */
@@ -72,9 +88,9 @@ class Terminal {
         }
     }
     /** Up to a newline; false at the end of input or on a signal. */
-    bool ReadLine(std::string& line) {
+    bool ReadLine(const SignalCatcher& signals, std::string& line) {
         char c = 0;
-        while (read(fd_, &c, 1) == 1) {
+        while (signals.Wait(fd_) && read(fd_, &c, 1) == 1) {
             if (c == '\n') {
                 return true;
             }
@@ -90,14 +106,14 @@ class Terminal {
 };
 
 bool Ask(std::string& password, std::string& problem) {
-    const SignalCatcher catcher;
+    const SignalCatcher signals;
     Terminal terminal;
     if (!terminal) {
         problem = "There is no terminal to ask for the password; use --password-file.";
         return false;
     }
     terminal.Write("Password: ");
-    const bool read = terminal.ReadLine(password);
+    const bool read = terminal.ReadLine(signals, password);
     terminal.Write("\n");
     if (!read) {
         problem = "No password was given.";

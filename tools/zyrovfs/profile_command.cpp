@@ -22,6 +22,8 @@ void AddProfileCommands(CLI::App& app, Session& session) {
         *group, session, "add", "Save a profile; nothing is connected",
         [=, &session](unsigned int uid) { return Add(uid, *options, session.json); });
     AddProfileOptions(*add, options->profile, false);
+    CheckUse(*add, "give --protocol and --hostname, or --from",
+             [options] { return options->profile.Describes(); });
     AddEntryCommands(*group, session, kProfile);
 }
 

@@ -16,6 +16,11 @@ struct ProfileOptions {
     std::string from;                       ///< file with a profile as JSON
     PasswordOptions password;
 
+    /** Enough for a new profile: a protocol and a place, or a file. */
+    bool Describes() const {
+        return !from.empty() || (given.isMember("protocol") &&
+                                 (given.isMember("hostname") || given.isMember("email")));
+    }
     bool Empty() const { return given.empty() && from.empty() && !password.Given(); }
 };
 
