@@ -153,7 +153,8 @@ ZYROVFS_API bool GetFullPath(const char* uri, std::string& full);
 /**
  * The same for a path below a connection, asked in a child process that is the user. `uriOut`
  * becomes the remote path in the connection's code page, if there is one. A path with a newline in
- * it comes back torn between the two outputs.
+ * it comes back torn between the two outputs. False only when the child could not be run to its
+ * end: a location without a local path gives true and an empty `fullOut`.
  */
 ZYROVFS_API bool GetFullPath(unsigned int uid, const char* serverId, const char* path,
                              const char* codepage, std::string& uriOut, std::string& fullOut);
