@@ -100,6 +100,10 @@ TEST_F(Tool, WrongUseEndsWithStatus2AndSaysSo) {
         "connection add ftp://h --uid 4001 --hostname h",
         "connection connect --uid 4001",
         "path --uid 4001",
+        "path hello.txt --uid 4001",
+        "path '' --uid 4001",
+        "path :// --uid 4001",
+        "path ./a://b --uid 4001",
         "user clean",
         "host",
         "host install --build",
@@ -389,10 +393,10 @@ bool IsHarmless(char c) {
 }
 
 TEST_F(Tool, ControlCharactersFromAProfileDoNotReachTheTerminal) {
-    // An escape sequence, a C1 control, a mark that turns the direction, and a stray byte.
+    // An escape sequence, a C1 control, a mark that turns the direction, and a bell.
     Write("/tmp/profile.json",
           "{\"protocol\": \"ftp\", \"hostname\": \"nas.example\", \"port\": 2121, "
-          "\"account\": \"amy\", \"alias\": \"a\\u001b[2Jb\\u009bc\\u202ed\xff\\u0007\"}");
+          "\"account\": \"amy\", \"alias\": \"a\\u001b[2Jb\\u009bc\\u202ed\\u0007\"}");
     ASSERT_EQ(Zyrovfs("profile add --uid 4001 --from /tmp/profile.json").status, 0);
     for (const std::string command : {"profile list", "profile list --json"}) {
         const std::string output = Zyrovfs(command + " --uid 4001").output;
@@ -400,12 +404,12 @@ TEST_F(Tool, ControlCharactersFromAProfileDoNotReachTheTerminal) {
         EXPECT_TRUE(std::all_of(output.begin(), output.end(), IsHarmless)) << output;
     }
     EXPECT_THAT(Zyrovfs("profile list --uid 4001").output,
-                HasSubstr("a\\x1b[2Jb\\u{009b}c\\u{202e}d\\xff\\x07"));
+                HasSubstr("a\\x1b[2Jb\\u{009b}c\\u{202e}d\\x07"));
 }
 
 TEST_F(Tool, ControlCharactersOfTheCommandLineAreNotEchoed) {
-    const std::string output = Zyrovfs("profile show 'ftp://\x1b[2Jx' --uid 4001").output;
-    EXPECT_THAT(output, HasSubstr("\\x1b[2Jx"));
+    const std::string output = Zyrovfs("profile show 'ftp://\x1b[2Jx\xff' --uid 4001").output;
+    EXPECT_THAT(output, HasSubstr("\\x1b[2Jx\\xff"));
     EXPECT_TRUE(std::all_of(output.begin(), output.end(), IsHarmless)) << output;
 }
 

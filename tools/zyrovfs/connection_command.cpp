@@ -39,7 +39,7 @@ void AddAddCommand(CLI::App& group, Session& session) {
         group, session, "add", "Connect a saved profile by its id, or a server described here",
         [=, &session](unsigned int uid) { return Add(uid, *options, session.json); });
     add->add_option("ID", options->id, "Id of a saved profile");
-    AddProfileOptions(*add, options->profile, true);
+    AddProfileOptions(*add, options->profile, true, true);
     AddAcceptOption(*add, options->accept);
     CheckUse(
         *add, "give the id of a saved profile, or --protocol and --hostname, or --from", [options] {

@@ -101,17 +101,14 @@ int Set(const EntryKind& kind, unsigned int uid, const EntryOptions& options, bo
 }
 
 int Delete(const EntryKind& kind, unsigned int uid, const std::string& id, bool json) {
-    ResetError();
+    // Deleting what is not there succeeds; a person wants to know all the same.
+    Json::Value before;
+    const bool existed = Server::CfgGetByID(uid, kind.mode, id.c_str(), before);
     if (!Server::Delete(uid, kind.mode, id.c_str())) {
         return ReportFailure(std::string(kind.word) + " delete " + id, json);
     }
-    // Deleting what is not there succeeds, and the cell tells.
-    const bool existed = GetError() != VFS_ERR_CONFIG_NOT_FOUND;
-    return ReportEntry(id,
-                       existed
-                           ? "Deleted " + Printable(id) + "."
-                           : std::string("There was no ") + kind.word + " " + Printable(id) + ".",
-                       json);
+    const std::string absent = std::string("There was no ") + kind.word + " ";
+    return ReportEntry(id, (existed ? "Deleted " : absent) + Printable(id) + ".", json);
 }
 
 void AddListCommand(CLI::App& group, Session& session, const EntryKind& kind) {
@@ -150,7 +147,7 @@ void AddSetCommand(CLI::App& group, Session& session, const EntryKind& kind) {
         [=, &session, &kind](unsigned int uid) { return Set(kind, uid, *options, session.json); });
     command->add_option("ID", options->id, "Id, as `list` shows it")->required();
     const bool for_connection = kind.mode == Server::VFS_CONFIG_CONNECT;
-    AddProfileOptions(*command, options->profile, for_connection);
+    AddProfileOptions(*command, options->profile, for_connection, false);
     CheckUse(*command, "say what to change", [options] { return !options->profile.Empty(); });
     if (for_connection) {
         AddAcceptOption(*command, options->accept);

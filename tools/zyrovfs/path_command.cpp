@@ -14,6 +14,15 @@ namespace {
 
 using namespace ZYROVFS;
 
+/** Anything else GIO would take for the name of a local file. */
+bool IsUri(const std::string& text) {
+    const size_t colon = text.find("://");
+    return colon != std::string::npos && colon > 0 &&
+           text.find_first_not_of(
+               "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ"
+               "0123456789+-.") == colon;
+}
+
 int ShowPath(unsigned int uid, const std::string& uri, bool json) {
     ResetError();
     std::string remote;
@@ -45,6 +54,8 @@ void AddPathCommand(CLI::App& app, Session& session) {
     CLI::App* command = AddUserCommand(
         app, session, "path", "Print the local path of a remote location, connected if need be",
         [=, &session](unsigned int uid) { return ShowPath(uid, *uri, session.json); });
+    CheckUse(*command, "a URI has the form protocol://account@host:port/path",
+             [uri] { return IsUri(*uri); });
     command->add_option("URI", *uri, "Id of a connection, and a path behind it")->required();
 }
 

@@ -21,7 +21,7 @@ void AddProfileCommands(CLI::App& app, Session& session) {
     CLI::App* add = AddUserCommand(
         *group, session, "add", "Save a profile; nothing is connected",
         [=, &session](unsigned int uid) { return Add(uid, *options, session.json); });
-    AddProfileOptions(*add, options->profile, false);
+    AddProfileOptions(*add, options->profile, false, true);
     CheckUse(*add, "give --protocol and --hostname, or --from",
              [options] { return options->profile.Describes(); });
     AddEntryCommands(*group, session, kProfile);

@@ -17,29 +17,30 @@ struct Row {
     const char* key;
     const char* type;
     const char* help;
+    const char* fallback = "";  ///< what a new profile gets without the option
 };
 
 constexpr Row kTexts[] = {
     {"--protocol", "protocol", "NAME", "Protocol; `zyrovfs protocol list` shows them"},
     {"--hostname", "hostname", "HOST", "Host name or address"},
-    {"--alias", "alias", "TEXT", "Name for people; the host name if left out"},
-    {"--account", "account", "NAME", "Account on the server; anonymous if left out"},
-    {"--codepage", "codepage", "NAME", "Character set of remote names; UTF-8 if left out"},
+    {"--alias", "alias", "TEXT", "Name for people", "; the host name if left out"},
+    {"--account", "account", "NAME", "Account on the server", "; anonymous if left out"},
+    {"--codepage", "codepage", "NAME", "Character set of remote names", "; UTF-8 if left out"},
     {"--email", "email", "ADDRESS", "Account of a shared link"},
 };
 constexpr Row kPath = {"--path", "uri_path", "PATH", "Remote folder to connect, such as a share"};
 constexpr Row kNumbers[] = {
-    {"--port", "port", "NUMBER", "Port; the protocol's own if left out"},
+    {"--port", "port", "NUMBER", "Port, 0 for the protocol's own", "; 0 if left out"},
     {"--max-connection", "max_connection", "NUMBER", "Most parallel connections, 0 for any number"},
 };
 
 template <typename Value>
-void AddKey(CLI::App& command, ProfileOptions& options, const Row& row) {
+void AddKey(CLI::App& command, ProfileOptions& options, const Row& row, bool is_new) {
     const std::string key = row.key;
     command
         .add_option_function<Value>(
             row.option, [&options, key](const Value& value) { options.given[key] = value; },
-            row.help)
+            std::string(row.help) + (is_new ? row.fallback : ""))
         ->type_name(row.type);
 }
 
@@ -89,15 +90,16 @@ bool ShallAsk(const ProfileOptions& options, const Json::Value& profile) {
 
 }  // namespace
 
-void AddProfileOptions(CLI::App& command, ProfileOptions& options, bool for_connection) {
+void AddProfileOptions(CLI::App& command, ProfileOptions& options, bool for_connection,
+                       bool is_new) {
     for (const Row& row : kTexts) {
-        AddKey<std::string>(command, options, row);
+        AddKey<std::string>(command, options, row, is_new);
     }
     for (const Row& row : kNumbers) {
-        AddKey<unsigned int>(command, options, row);
+        AddKey<unsigned int>(command, options, row, is_new);
     }
     if (for_connection) {
-        AddKey<std::string>(command, options, kPath);
+        AddKey<std::string>(command, options, kPath, is_new);
     }
     command.add_option("--from", options.from, "Read keys from a JSON file, - for standard input")
         ->type_name("FILE");

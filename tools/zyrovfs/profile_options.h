@@ -28,7 +28,8 @@ struct ProfileOptions {
  * The options of a profile's keys, --from and those of the password. Saved profiles take their
  * remote path from the live connection, so that option is for connections alone.
  */
-void AddProfileOptions(CLI::App& command, ProfileOptions& options, bool for_connection);
+void AddProfileOptions(CLI::App& command, ProfileOptions& options, bool for_connection,
+                       bool is_new);
 
 /** The changes that the options ask for. False with a sentence. */
 bool ReadChanges(const ProfileOptions& options, Json::Value& changes, std::string& problem);

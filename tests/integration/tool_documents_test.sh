@@ -1,0 +1,74 @@
+#!/usr/bin/env bash
+# Man page and completion know every command and option that the tool has, and the completion finds
+# saved ids.
+#   tool_documents_test.sh BUILD_DIR SOURCE_DIR
+set -euo pipefail
+build=$1 source=$2
+PATH=$build/tools/zyrovfs:$PATH
+code=0
+
+complain() {
+  echo "$*" >&2
+  code=1
+}
+
+# Subcommands that the help of a command lists.
+commands_of() { zyrovfs "$@" --help | sed -n '/^Subcommands:/,$s/^  \([a-z][a-z]*\) .*/\1/p'; }
+options_of() { zyrovfs "$@" --help | grep -oE '^  (-h,)?--[a-z-]+' | sed 's/^ *\(-h,\)\{0,1\}//'; }
+
+# What the completion offers for the last of these words.
+complete_words() {
+  COMP_WORDS=("$@")
+  COMP_CWORD=$((${#COMP_WORDS[@]} - 1))
+  COMPREPLY=()
+  _zyrovfs || true
+  printf '%s\n' "${COMPREPLY[@]}"
+}
+
+expect() { # EXPECTED WORD... : exactly these are offered, in any order
+  local expected=$1 offered
+  shift
+  offered=$(complete_words "$@" | sort | xargs)
+  [ "$offered" = "$expected" ] || complain "after '$*': offered '$offered', expected '$expected'"
+}
+
+. "$source/packaging/zyrovfs.bash-completion"
+page=$(man -l "$source/packaging/zyrovfs.1" 2>/dev/null | col -b | tr '‐−' '--') ||
+  page=$(sed 's/\\-/-/g' "$source/packaging/zyrovfs.1")
+[ -z "$(man --warnings -l "$source/packaging/zyrovfs.1" 2>&1 >/dev/null)" ] ||
+  complain "the man page has warnings"
+
+# check_command WORD...: its options stand in the page and are offered.
+check_command() {
+  local option
+  for option in $(options_of "$@"); do
+    grep -q -e "$option" <<<"$page" || complain "the man page lacks $option of '$*'"
+  done
+  expect "$(options_of "$@" | sort | xargs)" zyrovfs "$@" --
+}
+
+count=0
+expect "$(commands_of | sort | xargs)" zyrovfs ""
+for group in $(commands_of); do
+  commands=$(commands_of "$group" | sort | xargs)
+  [ -z "$commands" ] || expect "$commands" zyrovfs "$group" ""
+  for command in ${commands:-""}; do
+    count=$((count + 1))
+    grep -q -e "$command" <<<"$page" || complain "the man page lacks '$group $command'"
+    check_command "$group" $command
+  done
+done
+[ $count = 18 ] || complain "found $count commands, not 18"
+
+useradd --uid 4001 --gid 100 amy
+id=ftp://nas.example:2121
+zyrovfs profile add --user amy --protocol ftp --hostname nas.example --port 2121 >/dev/null
+expect "$id" zyrovfs profile show --user amy ""
+expect "$id" zyrovfs connection add --uid 4001 f
+expect "" zyrovfs profile show --user amy x
+expect "" zyrovfs profile show ""
+expect "" zyrovfs connection delete --uid 4001 ""
+expect "amy" zyrovfs profile list --user amy
+expect "dav davs" zyrovfs profile list --protocol da
+[ $code != 0 ] || echo "man page and completion: ok"
+exit $code
