@@ -20,13 +20,13 @@
 
 namespace ZYROVFS::Server {
 
-/** Which of a user's two files an operation works on. */
-enum VFS_CONFIG_MODE {
+/** Which of a user's two files an operation works on. Any other number fails. */
+enum VFS_CONFIG_MODE : unsigned int {
     VFS_CONFIG_SERVER = 0,   ///< saved profiles: servers.conf under /usr/zyro/etc/zyrovfs/UID
     VFS_CONFIG_CONNECT = 1,  ///< live connections: connect.conf under /var/tmp/zyrovfs/UID
 };
 
-enum VFS_CONFIG_ACTION {
+enum VFS_CONFIG_ACTION : unsigned int {
     VFS_CONFIG_READ = 0,
     VFS_CONFIG_WRITE = 1,
 };

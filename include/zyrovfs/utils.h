@@ -40,8 +40,11 @@ ZYROVFS_API bool IsProcAlive(int pid, const char* name, unsigned int uid);
 ZYROVFS_API bool KillProc(int pid, const char* name, unsigned int uid, bool wait);
 
 /**
- * Ends the background tasks of a user that move files of the connection `uri`. True also when some
- * could not be ended. VFS_ERR_BAD_PARAM for a null argument, VFS_ERR_FAILED.
+ * Ends the background tasks of a user that move files of the connection `uri`: those whose
+ * property "data" has "is_vfs" true and an object "vfs_uri" with the member `uri`. "pid" tells the
+ * process, "proc_name" (may be left out) the program that it must still be. Waits up to 3 seconds
+ * for each. True also when some could not be ended. VFS_ERR_BAD_PARAM for a null argument,
+ * VFS_ERR_FAILED.
  */
 ZYROVFS_API bool KillProcByUsername(const char* uri, const char* user);
 ZYROVFS_API bool KillProcByUID(const char* uri, unsigned int uid);
@@ -52,7 +55,8 @@ ZYROVFS_API bool KillProcByUID(const char* uri, unsigned int uid);
  * Makes every missing folder of `path`. `replaceNonDir` removes what stands in the way and is no
  * folder. `uid` and `gid` own what is made (both -1: left alone; one -1: the effective id). `mode`
  * -1 means 0777 under the umask, any other mode is taken as it is. `stop`, if given, points into
- * `path` behind the last folder reached. 0, or -1 with errno and the platform error telling why.
+ * `path` at the end of the last component that the walk came to: the last one on success, the one
+ * in question on failure. 0, or -1 with errno and the platform error telling why.
  */
 ZYROVFS_API int MkdirP(const char* path, char** stop, int replaceNonDir, unsigned int uid,
                        unsigned int gid, unsigned int mode);
@@ -62,7 +66,7 @@ ZYROVFS_API bool CreateFolder(const char* path, char** stop, bool replaceNonDir,
                               unsigned int gid, unsigned int mode);
 
 /** Writes one line to a file (mode 0600), its folders made. True without writing when another
- * process holds the file locked. */
+ * process holds the file locked; a symbolic link in the file's place is refused. */
 ZYROVFS_API bool CreateFile(const char* path, const char* text);
 
 /** CreateFile with the decimal pid. */
@@ -149,7 +153,8 @@ ZYROVFS_API bool GetFullPath(const char* uri, std::string& full);
 /**
  * The same for a path below a connection, asked in a child process that is the user. `uriOut`
  * becomes the remote path in the connection's code page, if there is one. A path with a newline in
- * it comes back torn between the two outputs.
+ * it comes back torn between the two outputs. False only when the child could not be run to its
+ * end: a location without a local path gives true and an empty `fullOut`.
  */
 ZYROVFS_API bool GetFullPath(unsigned int uid, const char* serverId, const char* path,
                              const char* codepage, std::string& uriOut, std::string& fullOut);

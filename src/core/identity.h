@@ -34,7 +34,7 @@ class __ {
 
 }  // namespace _________
 
-/** `IF_RUN_AS(uid, 0) { ... } else { the switch failed }`; an id of -1 stays as it is. */
+/** `IF_RUN_AS(uid, 0) { ... } else { the switch failed }`; an id of -1 is not set. */
 #define IF_RUN_AS(uid, gid)                                                               \
     if (const ::_________::__ zyrovfs_run_as{(uid), (gid), ::ZYROVFS::SourceLine::Here(), \
                                              "IF_RUN_AS"};                                \

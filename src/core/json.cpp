@@ -15,10 +15,15 @@
 namespace ZYROVFS::json {
 namespace {
 
+// Far beyond any document of ours, far below what would exhaust the memory of the box.
+constexpr size_t kLargestDocument = 64 << 20;
+
 const Json::CharReaderBuilder& ReaderRules() {
     static const Json::CharReaderBuilder rules = [] {
         Json::CharReaderBuilder builder;
         builder["failIfExtra"] = true;
+        // Written into one line, a comment would swallow what stands behind it.
+        builder["collectComments"] = false;
         return builder;
     }();
     return rules;
@@ -66,8 +71,13 @@ bool ReadAll(int fd, std::string& text) {
 
 template <typename T>
 bool FromDecimal(const std::string& text, T& number) {
-    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-    return error == std::errc() && end == text.data() + text.size();
+    T parsed{};
+    const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), parsed);
+    if (error != std::errc() || end != text.data() + text.size()) {
+        return false;
+    }
+    number = parsed;
+    return true;
 }
 
 }  // namespace
@@ -86,6 +96,10 @@ bool fromFile(Json::Value& value, const std::string& path) try {
         errno = S_ISDIR(info.st_mode) ? EISDIR : EINVAL;
         return false;
     }
+    if (static_cast<size_t>(info.st_size) > kLargestDocument) {
+        errno = EFBIG;
+        return false;
+    }
     std::string text;
     text.reserve(static_cast<size_t>(info.st_size));
     return ReadAll(fd.Get(), text) && Parse(text.data(), text.data() + text.size(), value);
@@ -95,7 +109,14 @@ bool fromFile(Json::Value& value, const std::string& path) try {
 }
 
 bool toFile(const Json::Value& value, const std::string& path, mode_t mode, FileOwner owner) try {
-    return ReplaceFile(path, toString(value) + "\n", mode, owner);
+    const std::string text = toString(value) + "\n";
+    if (text.size() > kLargestDocument) {
+        errno = EFBIG;
+        return false;
+    }
+    // What cannot be read back (nested too deeply, an infinite number) must not replace what can.
+    Json::Value check;
+    return fromString(check, text) && ReplaceFile(path, text, mode, owner);
 } catch (const std::exception&) {
     errno = ENOMEM;
     return false;

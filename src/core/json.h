@@ -22,8 +22,9 @@ bool fromFile(Json::Value& value, const std::string& path);
 /**
  * Replaces a whole document: new file beside the old one, written, flushed to disk, renamed over.
  * A crash, a kill or a full disk at any point leaves the old document. False keeps the old file
- * and leaves errno telling the cause. With an owner the new file is given to it before it takes its
- * place; a caller that may not give files away keeps them.
+ * and leaves errno telling the cause; EINVAL and EFBIG are for a value that fromFile would refuse.
+ * With an owner the new file is given to it before it takes its place; a caller that may not give
+ * files away keeps them.
  */
 bool toFile(const Json::Value& value, const std::string& path, mode_t mode = 0600,
             FileOwner owner = {});

@@ -30,6 +30,16 @@ bool ReadFraction(const char*& p, long& microseconds) {
     return p != first;
 }
 
+/** One or two digits. */
+bool ReadNumber(const char*& p, int& number) {
+    number = 0;
+    const char* const first = p;
+    for (; IsDigit(*p) && p - first < 2; ++p) {
+        number = number * 10 + (*p - '0');
+    }
+    return p != first;
+}
+
 /** Reads "Z", "+01:30" or "+0130", and nothing may follow. `shift` is what leads to UTC. */
 bool ReadZone(const char* p, const char* end, long& shift) {
     shift = 0;
@@ -39,17 +49,17 @@ bool ReadZone(const char* p, const char* end, long& shift) {
     if (*p != '+' && *p != '-') {
         return false;
     }
+    const int direction = *p++ == '-' ? 1 : -1;
     int hours = 0;
     int minutes = 0;
-    int length = 0;
-    if (sscanf(p + 1, "%02d:%02d%n", &hours, &minutes, &length) != 2 &&
-        sscanf(p + 1, "%02d%02d%n", &hours, &minutes, &length) != 2) {
+    if (!ReadNumber(p, hours)) {
         return false;
     }
-    if (hours < 0 || hours >= 24 || minutes < 0 || minutes >= 60 || p + 1 + length != end) {
+    p += *p == ':' ? 1 : 0;
+    if (!ReadNumber(p, minutes) || hours >= 24 || minutes >= 60 || p != end) {
         return false;
     }
-    shift = (hours * 60L + minutes) * (*p == '-' ? 60 : -60);
+    shift = direction * (hours * 3600L + minutes * 60L);
     return true;
 }
 

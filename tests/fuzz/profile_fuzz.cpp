@@ -48,11 +48,10 @@ void Look(VFS_CONFIG_MODE mode) {
     Json::Value out;
     CfgGetByKey(kUser, mode, "protocol", "ftp", out);
     CfgIsFull(kUser, mode, "ftp");
-    for (const char* sort : {"port", "alias"}) {
-        if (List(kUser, mode, nullptr, sort, false, 1, 5, out)) {
-            Check(out["total"].isIntegral());
-            Check(out[mode == VFS_CONFIG_CONNECT ? "connections" : "profiles"].isArray());
-        }
+    if (List(kUser, mode, nullptr, mode == VFS_CONFIG_CONNECT ? "port" : "alias", false, 1, 5,
+             out)) {
+        Check(out["total"].isIntegral());
+        Check(out[mode == VFS_CONFIG_CONNECT ? "connections" : "profiles"].isArray());
     }
 }
 

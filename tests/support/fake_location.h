@@ -1,21 +1,17 @@
 /**
- * Remote locations without bus or daemon: URIs of some schemes become files of this process that
- * mount and tell their local path as a test says. Forked children have them too. What was asked of
- * them is kept, whoever asked.
+ * Remote locations by rules: URIs of the standard schemes mount and tell their local path as a test
+ * says, and keep what was asked of them, by whichever process.
  */
 #ifndef ZYROVFS_TESTS_FAKE_LOCATION_H
 #define ZYROVFS_TESTS_FAKE_LOCATION_H
 
-#include <gio/gio.h>
-#include <sys/mman.h>
-#include <unistd.h>
-
 #include <csignal>
 #include <cstdlib>
 #include <functional>
-#include <map>
 #include <string>
 #include <vector>
+
+#include "support/scripted_location.h"
 
 namespace fake_location {
 
@@ -32,6 +28,7 @@ struct Rules {
 
 inline Rules rules;
 
+/** A file without a name: children that have become somebody else still write to it. */
 inline int JournalFd() {
     static const int fd = memfd_create("locations", MFD_CLOEXEC);
     return fd;
@@ -58,103 +55,41 @@ inline std::vector<std::string> Calls() {
     return lines;
 }
 
-struct Location {
-    GObject parent;
-    char* uri;
-};
-struct LocationClass {
-    GObjectClass parent;
-};
-
-inline char* GetPath(GFile* file) {
-    const char* uri = reinterpret_cast<Location*>(file)->uri;
+inline std::string TellPath(const char* uri) {
     Note(std::string("path ") + uri);
     if (rules.deadly != 0) {
         raise(rules.deadly);
     }
-    const std::string path = rules.path ? rules.path(uri) : "";
-    return path.empty() ? nullptr : g_strdup(path.c_str());
+    return rules.path ? rules.path(uri) : "";
 }
 
-inline char* GetUri(GFile* file) {
-    return g_strdup(reinterpret_cast<Location*>(file)->uri);
-}
-
-inline void Mount(GFile* file, GMountMountFlags, GMountOperation* operation, GCancellable* cancel,
-                  GAsyncReadyCallback done, gpointer data) {
-    const char* uri = reinterpret_cast<Location*>(file)->uri;
-    Note(std::string("mount ") + uri);
-    GTask* task = g_task_new(file, cancel, done, data);
+inline void PlayMount(GMountOperation* operation) {
+    const std::string uri = scripted::TheSeen().uri;
+    Note("mount " + uri);
     if (!rules.mount_path.empty()) {
-        g_signal_emit_by_name(operation, "ask-password", "mount_path", rules.mount_path.c_str(), "",
-                              G_ASK_PASSWORD_NEED_USERNAME);
+        scripted::AskPassword(operation, "mount_path", 0, rules.mount_path.c_str());
     }
     const int error = rules.mount ? rules.mount(uri) : -1;
-    if (error < 0) {
-        g_task_return_boolean(task, TRUE);
-    } else {
-        g_task_return_new_error(task, G_IO_ERROR, error, "as the test wants");
+    scripted::TheScript().mount_end =
+        error < 0 ? scripted::End() : scripted::Failure(error, "as the test wants");
+}
+
+inline void TakeSchemes() {
+    setenv("GIO_USE_VFS", "local", 1);
+    for (const char* scheme : {"ftp", "sftp", "dav", "cifs", "sharing"}) {
+        scripted::Register(scheme);
     }
-    g_object_unref(task);
 }
 
-inline gboolean FinishMount(GFile*, GAsyncResult* result, GError** error) {
-    return g_task_propagate_boolean(G_TASK(result), error);
-}
-
-inline GMount* FindMount(GFile* file, GCancellable*, GError** error) {
-    Note(std::string("find ") + reinterpret_cast<Location*>(file)->uri);
-    g_set_error_literal(error, G_IO_ERROR, G_IO_ERROR_NOT_FOUND, "nothing is mounted here");
-    return nullptr;
-}
-
-inline void InitInterface(gpointer iface, gpointer) {
-    auto* file = static_cast<GFileIface*>(iface);
-    file->get_path = GetPath;
-    file->get_uri = GetUri;
-    file->mount_enclosing_volume = Mount;
-    file->mount_enclosing_volume_finish = FinishMount;
-    file->find_enclosing_mount = FindMount;
-}
-
-inline void Finalize(GObject* object) {
-    g_free(reinterpret_cast<Location*>(object)->uri);
-    static_cast<GObjectClass*>(g_type_class_peek(G_TYPE_OBJECT))->finalize(object);
-}
-
-inline void InitClass(gpointer klass, gpointer) {
-    static_cast<GObjectClass*>(klass)->finalize = Finalize;
-}
-
-inline GType Type() {
-    static const GType type = [] {
-        const GType created =
-            g_type_register_static_simple(G_TYPE_OBJECT, "FakeLocation", sizeof(LocationClass),
-                                          InitClass, sizeof(Location), nullptr, G_TYPE_FLAG_NONE);
-        const GInterfaceInfo info{InitInterface, nullptr, nullptr};
-        g_type_add_interface_static(created, G_TYPE_FILE, &info);
-        return created;
-    }();
-    return type;
-}
-
-inline GFile* New(GVfs*, const char* uri, gpointer) {
-    auto* location = reinterpret_cast<Location*>(g_object_new(Type(), nullptr));
-    location->uri = g_strdup(uri);
-    return reinterpret_cast<GFile*>(location);
-}
-
-/** Forgets calls and rules, and takes the schemes over if that has not been done. */
+/** Forgets calls and rules. The first time, the schemes are taken over. */
 inline void Reset() {
-    static const bool taken = [] {
-        setenv("GIO_USE_VFS", "local", 1);
-        GVfs* vfs = g_vfs_get_default();
-        for (const char* scheme : {"ftp", "sftp", "dav", "cifs", "sharing"}) {
-            g_vfs_register_uri_scheme(vfs, scheme, New, nullptr, nullptr, New, nullptr, nullptr);
-        }
-        return true;
-    }();
+    static const bool taken = (TakeSchemes(), true);
     rules = taken ? Rules() : rules;
+    scripted::Reset();
+    scripted::TheScript().mounted = false;
+    scripted::TheScript().on_find = [](const char* uri) { Note(std::string("find ") + uri); };
+    scripted::TheScript().on_path = TellPath;
+    scripted::TheScript().on_mount = PlayMount;
     if (ftruncate(JournalFd(), 0) != 0) {
         abort();
     }

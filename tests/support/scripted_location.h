@@ -31,7 +31,9 @@ inline End Failure(int code, const char* message = "no", GQuark domain = G_IO_ER
 struct Script {
     std::function<void(GMountOperation*)> on_mount;  ///< may ask
     End mount_end;
-    bool mounted = true;  ///< whether find_enclosing_mount finds it
+    bool mounted = true;                                  ///< whether find_enclosing_mount finds it
+    std::function<void(const char* uri)> on_find;         ///< its mount is looked for
+    std::function<std::string(const char* uri)> on_path;  ///< local path, "" for none
     std::function<void(GMountOperation*)> on_unmount;
     End unmount_end;
 };
@@ -209,11 +211,19 @@ inline void StartMount(GFile* file, GMountMountFlags, GMountOperation* operation
 
 inline GMount* FindMount(GFile* file, GCancellable*, GError** error) {
     Keep(TheSeen().uri, UriOf(file));
+    if (TheScript().on_find) {
+        TheScript().on_find(UriOf(file));
+    }
     if (TheScript().mounted) {
         return NewMount();
     }
     g_set_error_literal(error, G_IO_ERROR, G_IO_ERROR_NOT_MOUNTED, "The location is not mounted");
     return nullptr;
+}
+
+inline char* LocalPath(GFile* file) {
+    const std::string path = TheScript().on_path ? TheScript().on_path(UriOf(file)) : "";
+    return path.empty() ? nullptr : g_strdup(path.c_str());
 }
 
 inline GFile* NewFile(GVfs*, const char* uri, gpointer);
@@ -227,6 +237,7 @@ inline GType FileType() {
             [](gpointer table, gpointer) {
                 auto* face = static_cast<GFileIface*>(table);
                 face->dup = [](GFile* file) { return NewFile(nullptr, UriOf(file), nullptr); };
+                face->get_path = LocalPath;
                 face->get_uri = [](GFile* file) { return g_strdup(UriOf(file)); };
                 face->mount_enclosing_volume = StartMount;
                 face->mount_enclosing_volume_finish = [](GFile*, GAsyncResult* r, GError** e) {

@@ -2,45 +2,18 @@
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <openssl/ssl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <fstream>
 
 #include "core/error_cell.h"
 #include "core/handle.h"
-#include "core/paths.h"
-#include "support/fresh_process.h"
 #include "support/seams.h"
-#include "support/shortened_waits.h"
-#include "support/tls_server.h"
-#include "zyrovfs/utils.h"
+#include "unit/mount/ssl_fixture.h"
 
 namespace ZYROVFS {
 namespace {
 
-using fresh::Answer;
 using testing::HasSubstr;
 using testing::Not;
-
-const tls::Identity& Authority() {
-    static const tls::Identity authority = tls::MakeAuthority("Test CA");
-    return authority;
-}
-
-/** The CA bundle of this private host knows the test authority and nobody else. */
-void TrustAuthority() {
-    std::ofstream(paths::kCaBundle) << Authority().certificate;
-}
-
-std::string WriteFile(const std::string& name, const std::string& text) {
-    const std::string path = testing::TempDir() + name;
-    unlink(path.c_str());
-    std::ofstream(path, std::ios::binary) << text;
-    return path;
-}
 
 tls::CertSpec Named(const std::string& dns, long starts = -3600, long ends = 86400) {
     tls::CertSpec spec;
@@ -48,12 +21,6 @@ tls::CertSpec Named(const std::string& dns, long starts = -3600, long ends = 864
     spec.starts = starts;
     spec.ends = ends;
     return spec;
-}
-
-/** VerifyCert in a process that has not asked before. */
-Answer Verify(const std::string& url, const std::string& file, const char* user = nullptr,
-              const char* password = nullptr) {
-    return fresh::Ask([&] { return Utils::VerifyCert(user, password, url.c_str(), file.c_str()); });
 }
 
 // --- what counts as the bundle ----------------------------------------------------------------
@@ -187,7 +154,7 @@ TEST_F(SavedCopy, IsAcceptedByItsFingerprint) {
     EXPECT_TRUE(answer.ok) << answer;
 }
 
-TEST_F(SavedCopy, AndAnotherOneAreTellableInOneProcess) {
+TEST_F(SavedCopy, IsToldFromAnotherCertificateInOneProcess) {
     // In the test's own process, so that leaks are seen.
     const tls::Identity identity = tls::Make({});
     const tls::TlsServer server(identity);
@@ -423,150 +390,6 @@ TEST_F(ChainFlag, IsSetEvenWhenTheBundleRefused) {
         return Utils::VerifyCert(nullptr, nullptr, server.Url().c_str(), file.c_str());
     });
     EXPECT_EQ(answer.code, VFS_ERR_CERT_UNTRUSTED) << answer;
-}
-
-// --- the conversation -------------------------------------------------------------------------
-
-class Conversation : public testing::Test {
-  protected:
-    void SetUp() override {
-        file_ = WriteFile("saved.pem", identity_.certificate);
-        options_.identity = identity_;
-    }
-
-    Answer Ask(const std::string& path = "/", const char* user = nullptr,
-               const char* password = nullptr) {
-        tls::TlsServer server(options_);
-        const Answer answer = Verify(server.Url(path), file_, user, password);
-        requests_ = server.Requests();
-        return answer;
-    }
-
-    tls::Identity identity_ = tls::Make({});
-    tls::ServerOptions options_;
-    std::string file_;
-    std::vector<tls::Request> requests_;
-};
-
-TEST_F(Conversation, SendsUserAndPasswordAsTheyAre) {
-    EXPECT_TRUE(Ask("/dav/", "dom\\am\xC3\xA9lie b@x%41", "p:w / \xE2\x82\xAC").ok);
-    ASSERT_EQ(requests_.size(), 1U);
-    EXPECT_EQ(requests_[0].headers["authorization"],
-              tls::Basic("dom\\am\xC3\xA9lie b@x%41", "p:w / \xE2\x82\xAC"));
-    EXPECT_EQ(requests_[0].method, "GET");
-}
-
-TEST_F(Conversation, SendsNoCredentialsWhenThereAreNone) {
-    EXPECT_TRUE(Ask("/", "", "").ok);
-    ASSERT_EQ(requests_.size(), 1U);
-    EXPECT_EQ(requests_[0].headers.count("authorization"), 0U);
-}
-
-TEST_F(Conversation, AsksForTheEscapedPath) {
-    EXPECT_TRUE(Ask("/my files/\xC3\xA9/50%").ok);
-    ASSERT_EQ(requests_.size(), 1U);
-    EXPECT_EQ(requests_[0].target, "/my%20files/%C3%A9/50%25");
-}
-
-TEST_F(Conversation, ARefusedPasswordIsAFailureWithoutAFinerCode) {
-    options_.answer = [](const tls::Request&) { return tls::Response{401, {}, ""}; };
-    const Answer answer = Ask("/", "amy", "wrong");
-    EXPECT_EQ(answer.code, VFS_ERR_FAILED) << answer;
-    EXPECT_TRUE(answer.Logged(", code=22, err=")) << answer;
-}
-
-TEST_F(Conversation, AServerThatFailsIsAFailureToo) {
-    for (const int status : {403, 404, 405, 500, 503}) {
-        options_.answer = [status](const tls::Request&) { return tls::Response{status, {}, ""}; };
-        EXPECT_EQ(Ask().code, VFS_ERR_FAILED) << status;
-    }
-}
-
-TEST_F(Conversation, FollowsARedirect) {
-    options_.answer = [](const tls::Request& request) {
-        return request.target == "/" ? tls::Response{302, {{"Location", "/dav/"}}, ""}
-                                     : tls::Response();
-    };
-    EXPECT_TRUE(Ask().ok);
-    ASSERT_EQ(requests_.size(), 2U);
-    EXPECT_EQ(requests_[1].target, "/dav/");
-}
-
-TEST_F(Conversation, ChecksTheServerBehindARedirectAsWell) {
-    const tls::TlsServer other(tls::Make({}));
-    const std::string there = other.Url();
-    options_.answer = [there](const tls::Request&) {
-        return tls::Response{301, {{"Location", there}}, ""};
-    };
-    EXPECT_EQ(Ask().code, VFS_ERR_CERT_UNTRUSTED);
-    EXPECT_TRUE(other.Requests().empty());
-}
-
-TEST_F(Conversation, ARedirectInCirclesEnds) {
-    options_.answer = [](const tls::Request&) {
-        return tls::Response{302, {{"Location", "/again"}}, ""};
-    };
-    EXPECT_EQ(Ask().code, VFS_ERR_FAILED);
-}
-
-TEST_F(Conversation, ThrowsALargeBodyAway) {
-    options_.answer = [](const tls::Request&) {
-        return tls::Response{200, {}, std::string(3000000, 'x')};
-    };
-    EXPECT_TRUE(Ask().ok);
-}
-
-TEST_F(Conversation, ARefusedPortIsAnUnreachableHost) {
-    const std::string url = "https://localhost:" + std::to_string(tls::RefusedPort()) + "/";
-    const Answer answer = Verify(url, file_);
-    EXPECT_EQ(answer.code, VFS_ERR_HOST_UNREACHABLE) << answer;
-    EXPECT_TRUE(answer.Logged(url + ", code=7, err=")) << answer;
-    EXPECT_TRUE(answer.detail.isNull());
-}
-
-TEST_F(Conversation, ANameThatNobodyKnowsIsAnUnreachableHost) {
-    const Answer answer = Verify("https://no-such-host.invalid/", file_);
-    EXPECT_EQ(answer.code, VFS_ERR_HOST_UNREACHABLE) << answer;
-}
-
-TEST_F(Conversation, AServerThatHangsUpIsAnUnreachableHost) {
-    options_.manner = tls::Manner::kCloseAtOnce;
-    const Answer answer = Ask();
-    EXPECT_EQ(answer.code, VFS_ERR_HOST_UNREACHABLE) << answer;
-}
-
-TEST_F(Conversation, AServerThatSpeaksNoTlsIsAnUnreachableHost) {
-    options_.identity = {};
-    const tls::TlsServer server(options_);
-    const Answer answer = Verify("https://localhost:" + std::to_string(server.Port()) + "/", file_);
-    EXPECT_EQ(answer.code, VFS_ERR_HOST_UNREACHABLE) << answer;
-}
-
-TEST_F(Conversation, AServerThatIsSilentIsAnUnreachableHost) {
-    shortened_waits = true;
-    options_.manner = tls::Manner::kSilent;
-    const Answer answer = Ask();
-    shortened_waits = false;
-    EXPECT_EQ(answer.code, VFS_ERR_HOST_UNREACHABLE) << answer;
-    EXPECT_TRUE(answer.Logged(", code=28, err=")) << answer;
-}
-
-TEST_F(Conversation, AServerThatGoesAwayInsteadOfAnsweringIsAFailure) {
-    options_.manner = tls::Manner::kCloseAfterHandshake;
-    EXPECT_EQ(Ask().code, VFS_ERR_FAILED);
-}
-
-TEST_F(Conversation, UrlsThatAreNoneAreAFailure) {
-    for (const std::string url : {"", "https://", "https://[", "nonsense", "gopherx://h/"}) {
-        const Answer answer = Verify(url, file_);
-        EXPECT_TRUE(answer.finished && !answer.ok) << url << answer;
-        EXPECT_NE(answer.code, VFS_ERR_NONE) << url << answer;
-    }
-}
-
-TEST_F(Conversation, AUrlWithoutEndIsAFailure) {
-    const Answer answer = Verify("https://localhost/" + std::string(9000000, ' '), file_);
-    EXPECT_EQ(answer.code, VFS_ERR_FAILED);
 }
 
 }  // namespace
