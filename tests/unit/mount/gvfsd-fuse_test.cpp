@@ -16,6 +16,7 @@ using namespace fakes;
 using testing::HasSubstr;
 using testing::StartsWith;
 
+constexpr const char* kStockUmount = "/bin/umount.stock";
 const std::string kTree = "/var/tmp/user/4001/gvfs";
 
 class Fuse : public DaemonTest {
@@ -25,11 +26,19 @@ class Fuse : public DaemonTest {
         Write("/var/tmp/user/4001/zyrovfs/keep", "");
         seams::WatchChildren();
     }
-    void TearDown() override { umount2(kTree.c_str(), MNT_DETACH); }
+    void TearDown() override {
+        umount2(kTree.c_str(), MNT_DETACH);
+        if (access(kStockUmount, F_OK) == 0) {
+            std::filesystem::rename(kStockUmount, paths::kUmount);
+        }
+    }
 
     /** /bin/umount notes its calls and then does nothing of the kind. */
     static void BreakUmount() {
-        Install(paths::kUmount, "echo \"$* $(id -u) $(id -ru)\" >>/tmp/fakes/umount\nexit 32\n");
+        if (access(kStockUmount, F_OK) != 0) {
+            std::filesystem::rename(paths::kUmount, kStockUmount);
+        }
+        Install(paths::kUmount, "echo \"$* $(id -u) $(id -ru)\" >>$reports/umount\nexit 32\n");
     }
     static bool IsStale() { return access(kTree.c_str(), F_OK) != 0 && errno == ENOTCONN; }
 };
