@@ -3,12 +3,17 @@
  * FUSE 3 refuses since they have become its normal behaviour: they are dropped here, all else is
  * handed on, and the real program takes this process's place. It keeps the pid, and since its file
  * has the same name, also the process name by which the library knows its daemon again.
+ *
+ * The library asks for allow_other, so that root's services reach the tree. That would let every
+ * user of the machine in as well; with default_permissions the kernel lets in whom the modes let
+ * in, and gvfs gives all it shows to its own user.
  */
 #include <stdio.h>
 #include <string.h>
 #include <unistd.h>
 
 #define REAL_PROGRAM "/usr/libexec/gvfsd-fuse"
+#define MOST_ARGUMENTS 64
 
 static const char* const kForgotten[] = {"big_writes", "direct_io"};
 
@@ -82,10 +87,17 @@ static void FilterArguments(char** argv) {
 }
 
 int main(int argc, char** argv) {
-    if (argc > 0) {
-        FilterArguments(argv);
+    char* all[MOST_ARGUMENTS + 3] = {REAL_PROGRAM, "-odefault_permissions"};
+    if (argc < 1 || argc > MOST_ARGUMENTS) {
+        fprintf(stderr, "%s: between 0 and %d arguments\n", REAL_PROGRAM, MOST_ARGUMENTS - 1);
+        return 127;
     }
-    execv(REAL_PROGRAM, argv);
+    FilterArguments(argv);
+    all[0] = argv[0];
+    for (int i = 1; argv[i] != NULL; i++) {
+        all[i + 1] = argv[i];
+    }
+    execv(REAL_PROGRAM, all);
     perror(REAL_PROGRAM);
     return 127;
 }

@@ -98,10 +98,15 @@ bool IsFolder(const std::string& path) {
 }
 
 /**
- * Only the last folder is made; the one above comes with the user's profiles. Every user may write
- * there, so the new folder is given away by its descriptor and not by its name.
+ * The folder above is that of the user's profiles, which a user who never saved one does not have
+ * yet. Every user may write there, so the new folder is given away by its descriptor and not by its
+ * name.
  */
 bool MakeSslFolder(const std::string& path, uid_t uid) {
+    const std::string above = paths::UserConfigDir(uid);
+    if (!Exists(above) && !Utils::CreateFolder(above.c_str(), nullptr, true, -1, -1, 0777)) {
+        return false;
+    }
     if (mkdir(path.c_str(), 0700) != 0) {
         return errno == EEXIST && IsFolder(path);
     }
