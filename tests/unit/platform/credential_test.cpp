@@ -261,8 +261,8 @@ TEST_F(Credential, UsersReadTheKeyByTheirGroup) {
               }),
               0);
     EXPECT_EQ(scratch::InChild([&] {
-                  return scratch::BecomeUser(1234, 1234) && 
-                                 Decrypt(cipher) == kNoKey && Encrypt("own") == kNoKey
+                  return scratch::BecomeUser(1234, 1234) && Decrypt(cipher) == kNoKey &&
+                                 Encrypt("own") == kNoKey
                              ? 0
                              : 1;
               }),
