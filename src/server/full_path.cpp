@@ -96,6 +96,44 @@ std::string ToCodepage(const char* path, const char* codepage) {
     return remote;
 }
 
+bool AskGio(const char* uri, std::string& full) {
+    const UniqueFile file(g_file_new_for_commandline_arg(uri));
+    const UniqueGString path(file ? g_file_get_path(file.get()) : nullptr);
+    if (!path) {
+        return false;
+    }
+    full = path.get();
+    return true;
+}
+
+/**
+ * AskGio in a process of its own. GIO's bus connection works only in the process that made it: a
+ * child that had asked GIO itself could no longer connect on demand, since the mount child that it
+ * forks would wait on a connection whose thread is not there. 0, also when GIO tells no path and
+ * `full` stays empty; another number when the process could not be run to its end.
+ */
+int AskGioApart(const char* uri, std::string& full) {
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) != 0) {
+        LOG_ERROR("Failed to create pipe");
+        return -1;
+    }
+    UniqueFd in(ends[0]);
+    UniqueFd out(ends[1]);
+    const pid_t child = fork();
+    if (child == 0) {
+        NoThrow(VFS_ERR_FAILED, [&] { return AskGio(uri, full) && WriteAll(out.Get(), full); });
+        _exit(0);
+    }
+    out.Reset();
+    if (child < 0) {
+        LOG_ERROR("Failed to fork, %m");
+        return -1;
+    }
+    full = ReadLastPiece(in.Get());
+    return WaitForChild(child).Result();
+}
+
 /**
  * The child. It writes its answer past the C library's buffer, which may hold output of the parent,
  * and ends without the parent's exit handlers. A lookup that finds nothing answers with nothing.
@@ -112,7 +150,10 @@ std::string ToCodepage(const char* path, const char* codepage) {
     NoThrow(VFS_ERR_FAILED, [&] {
         const std::string uri = remote.empty() ? id : id + "/" + remote;
         std::string full;
-        if (!GetFullPath(uri.c_str(), full)) {
+        if (AskGioApart(uri.c_str(), full) != 0) {
+            _exit(1);
+        }
+        if (full.empty() && !GetFullPathByConfig(uri.c_str(), full)) {
             LOG_ERROR("Failed to get full path, %s", uri.c_str());
             return false;
         }
@@ -173,13 +214,7 @@ bool GetFullPath(const char* uri, std::string& full) {
         LOG_ERROR("Wrong parameters");
         return false;
     }
-    const UniqueFile file(g_file_new_for_commandline_arg(uri));
-    const UniqueGString path(file ? g_file_get_path(file.get()) : nullptr);
-    if (!path) {
-        return GetFullPathByConfig(uri, full);
-    }
-    full = path.get();
-    return true;
+    return AskGio(uri, full) || GetFullPathByConfig(uri, full);
 }
 
 bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const char* codepage,
