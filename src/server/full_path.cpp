@@ -1,6 +1,7 @@
 #include <fcntl.h>
 #include <gio/gio.h>
 #include <unistd.h>
+#include <zosplatform/file.h>
 
 #include <cerrno>
 #include <cstring>
@@ -49,19 +50,6 @@ bool RecordedPath(const std::string& id, std::string& path) {
         return false;
     }
     path = record["path"].asString();
-    return true;
-}
-
-bool WriteAll(int fd, const std::string& text) {
-    size_t done = 0;
-    while (done < text.size()) {
-        const ssize_t n = write(fd, text.data() + done, text.size() - done);
-        if (n >= 0) {
-            done += static_cast<size_t>(n);
-        } else if (errno != EINTR) {
-            return false;
-        }
-    }
     return true;
 }
 
@@ -116,7 +104,8 @@ std::string ToCodepage(const char* path, const char* codepage) {
             LOG_ERROR("Failed to get full path, %s", uri.c_str());
             return false;
         }
-        return WriteAll(STDOUT_FILENO, remote.empty() ? full : full + "\n" + remote);
+        const std::string answer = remote.empty() ? full : full + "\n" + remote;
+        return ZYROWriteFileFd(STDOUT_FILENO, answer.data(), answer.size()) >= 0;
     });
     _exit(0);
 }
