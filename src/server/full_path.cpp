@@ -110,6 +110,31 @@ std::string ToCodepage(const char* path, const char* codepage) {
     _exit(0);
 }
 
+bool LookUpInChild(unsigned int uid, const std::string& id, const std::string& remote,
+                   std::string& uriOut, std::string& fullOut) {
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) != 0) {
+        LOG_ERROR("Failed to create pipe");
+        return false;
+    }
+    UniqueFd in(ends[0]);
+    UniqueFd out(ends[1]);
+    const pid_t child = fork();
+    if (child == 0) {
+        in.Reset();
+        LookUpAndExit(out.Get(), uid, id, remote);
+    }
+    out.Reset();
+    if (child < 0) {
+        LOG_ERROR("Failed to fork, %m");
+        return false;
+    }
+    const std::string answer = ReadLastPiece(in.Get());
+    const int status = WaitForChild(child).Result();
+    SplitAnswer(answer, uriOut, fullOut);
+    return status == 0;
+}
+
 }  // namespace
 
 bool GetPasswordByConfig(const char* uri, std::string& out) {
@@ -162,13 +187,15 @@ bool GetFullPath(const char* uri, std::string& full) {
         LOG_ERROR("Wrong parameters");
         return false;
     }
-    const UniqueFile file(g_file_new_for_commandline_arg(uri));
-    const UniqueGString path(file ? g_file_get_path(file.get()) : nullptr);
-    if (!path) {
-        return GetFullPathByConfig(uri, full);
-    }
-    full = path.get();
-    return true;
+    return NoThrow(VFS_ERR_FAILED, [&] {
+        const UniqueFile file(g_file_new_for_commandline_arg(uri));
+        const UniqueGString path(file ? g_file_get_path(file.get()) : nullptr);
+        if (!path) {
+            return GetFullPathByConfig(uri, full);
+        }
+        full = path.get();
+        return true;
+    });
 }
 
 bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const char* codepage,
@@ -177,28 +204,11 @@ bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const
         LOG_ERROR("Wrong parameters");
         return false;
     }
-    const SigchldGuard collectable;
-    const std::string remote = ToCodepage(path, codepage);
-    int ends[2];
-    if (pipe2(ends, O_CLOEXEC) != 0) {
-        LOG_ERROR("Failed to create pipe");
-        return false;
-    }
-    UniqueFd in(ends[0]);
-    UniqueFd out(ends[1]);
-    const pid_t child = fork();
-    if (child == 0) {
-        in.Reset();
-        LookUpAndExit(out.Get(), uid, serverId, remote);
-    }
-    out.Reset();
-    if (child < 0) {
-        return false;
-    }
-    const std::string answer = ReadLastPiece(in.Get());
-    const int status = WaitForChild(child).Result();
-    SplitAnswer(answer, uriOut, fullOut);
-    return status == 0;
+    return NoThrow(VFS_ERR_FAILED, [&] {
+        const SigchldGuard collectable;
+        const std::string remote = ToCodepage(path, codepage);
+        return LookUpInChild(uid, serverId, remote, uriOut, fullOut);
+    });
 }
 
 }  // namespace ZYROVFS::Utils
