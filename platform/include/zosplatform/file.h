@@ -3,7 +3,7 @@
 #ifndef ZOSPLATFORM_FILE_H
 #define ZOSPLATFORM_FILE_H
 
-#include <stddef.h>
+#include <stddef.h>  // NOLINT(modernize-deprecated-headers): C programs include this, too
 #include <sys/types.h>
 
 #include "zosplatform/text.h"
