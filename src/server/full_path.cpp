@@ -1,6 +1,7 @@
 #include <fcntl.h>
 #include <gio/gio.h>
 #include <unistd.h>
+#include <zosplatform/file.h>
 
 #include <cerrno>
 #include <cstring>
@@ -49,19 +50,6 @@ bool RecordedPath(const std::string& id, std::string& path) {
         return false;
     }
     path = record["path"].asString();
-    return true;
-}
-
-bool WriteAll(int fd, const std::string& text) {
-    size_t done = 0;
-    while (done < text.size()) {
-        const ssize_t n = write(fd, text.data() + done, text.size() - done);
-        if (n >= 0) {
-            done += static_cast<size_t>(n);
-        } else if (errno != EINTR) {
-            return false;
-        }
-    }
     return true;
 }
 
@@ -157,9 +145,35 @@ int AskGioApart(const char* uri, std::string& full) {
             LOG_ERROR("Failed to get full path, %s", uri.c_str());
             return false;
         }
-        return WriteAll(STDOUT_FILENO, remote.empty() ? full : full + "\n" + remote);
+        const std::string answer = remote.empty() ? full : full + "\n" + remote;
+        return ZYROWriteFileFd(STDOUT_FILENO, answer.data(), answer.size()) >= 0;
     });
     _exit(0);
+}
+
+bool LookUpInChild(unsigned int uid, const std::string& id, const std::string& remote,
+                   std::string& uriOut, std::string& fullOut) {
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) != 0) {
+        LOG_ERROR("Failed to create pipe");
+        return false;
+    }
+    UniqueFd in(ends[0]);
+    UniqueFd out(ends[1]);
+    const pid_t child = fork();
+    if (child == 0) {
+        in.Reset();
+        LookUpAndExit(out.Get(), uid, id, remote);
+    }
+    out.Reset();
+    if (child < 0) {
+        LOG_ERROR("Failed to fork, %m");
+        return false;
+    }
+    const std::string answer = ReadLastPiece(in.Get());
+    const int status = WaitForChild(child).Result();
+    SplitAnswer(answer, uriOut, fullOut);
+    return status == 0;
 }
 
 }  // namespace
@@ -214,7 +228,8 @@ bool GetFullPath(const char* uri, std::string& full) {
         LOG_ERROR("Wrong parameters");
         return false;
     }
-    return AskGio(uri, full) || GetFullPathByConfig(uri, full);
+    return NoThrow(VFS_ERR_FAILED,
+                   [&] { return AskGio(uri, full) || GetFullPathByConfig(uri, full); });
 }
 
 bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const char* codepage,
@@ -223,28 +238,11 @@ bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const
         LOG_ERROR("Wrong parameters");
         return false;
     }
-    const SigchldGuard collectable;
-    const std::string remote = ToCodepage(path, codepage);
-    int ends[2];
-    if (pipe2(ends, O_CLOEXEC) != 0) {
-        LOG_ERROR("Failed to create pipe");
-        return false;
-    }
-    UniqueFd in(ends[0]);
-    UniqueFd out(ends[1]);
-    const pid_t child = fork();
-    if (child == 0) {
-        in.Reset();
-        LookUpAndExit(out.Get(), uid, serverId, remote);
-    }
-    out.Reset();
-    if (child < 0) {
-        return false;
-    }
-    const std::string answer = ReadLastPiece(in.Get());
-    const int status = WaitForChild(child).Result();
-    SplitAnswer(answer, uriOut, fullOut);
-    return status == 0;
+    return NoThrow(VFS_ERR_FAILED, [&] {
+        const SigchldGuard collectable;
+        const std::string remote = ToCodepage(path, codepage);
+        return LookUpInChild(uid, serverId, remote, uriOut, fullOut);
+    });
 }
 
 }  // namespace ZYROVFS::Utils
