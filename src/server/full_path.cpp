@@ -110,7 +110,9 @@ int AskGioApart(const char* uri, std::string& full) {
     UniqueFd out(ends[1]);
     const pid_t child = fork();
     if (child == 0) {
-        NoThrow(VFS_ERR_FAILED, [&] { return AskGio(uri, full) && WriteAll(out.Get(), full); });
+        NoThrow(VFS_ERR_FAILED, [&] {
+            return AskGio(uri, full) && ZYROWriteFileFd(out.Get(), full.data(), full.size()) >= 0;
+        });
         _exit(0);
     }
     out.Reset();
