@@ -9,23 +9,11 @@
 #include <cstdlib>
 #include <exception>
 
+#include "core/fd_io.h"
 #include "core/handle.h"
 
 namespace ZYROVFS {
 namespace {
-
-bool WriteAll(int fd, const std::string& text) {
-    size_t done = 0;
-    while (done < text.size()) {
-        const ssize_t n = write(fd, text.data() + done, text.size() - done);
-        if (n >= 0) {
-            done += static_cast<size_t>(n);
-        } else if (errno != EINTR) {
-            return false;
-        }
-    }
-    return true;
-}
 
 /**
  * By descriptor, and before the file has its name: others may write to the directory, and what

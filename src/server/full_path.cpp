@@ -6,6 +6,7 @@
 #include <cstring>
 #include <memory>
 
+#include "core/fd_io.h"
 #include "core/handle.h"
 #include "core/identity.h"
 #include "core/log.h"
@@ -49,19 +50,6 @@ bool RecordedPath(const std::string& id, std::string& path) {
         return false;
     }
     path = record["path"].asString();
-    return true;
-}
-
-bool WriteAll(int fd, const std::string& text) {
-    size_t done = 0;
-    while (done < text.size()) {
-        const ssize_t n = write(fd, text.data() + done, text.size() - done);
-        if (n >= 0) {
-            done += static_cast<size_t>(n);
-        } else if (errno != EINTR) {
-            return false;
-        }
-    }
     return true;
 }
 
