@@ -1,12 +1,12 @@
 #include <fcntl.h>
 #include <gio/gio.h>
 #include <unistd.h>
-#include <zosplatform/file.h>
 
 #include <cerrno>
 #include <cstring>
 #include <memory>
 
+#include "core/fd_io.h"
 #include "core/handle.h"
 #include "core/identity.h"
 #include "core/log.h"
@@ -110,9 +110,7 @@ int AskGioApart(const char* uri, std::string& full) {
     UniqueFd out(ends[1]);
     const pid_t child = fork();
     if (child == 0) {
-        NoThrow(VFS_ERR_FAILED, [&] {
-            return AskGio(uri, full) && ZYROWriteFileFd(out.Get(), full.data(), full.size()) >= 0;
-        });
+        NoThrow(VFS_ERR_FAILED, [&] { return AskGio(uri, full) && WriteAll(out.Get(), full); });
         _exit(0);
     }
     out.Reset();
@@ -148,7 +146,7 @@ int AskGioApart(const char* uri, std::string& full) {
             return false;
         }
         const std::string answer = remote.empty() ? full : full + "\n" + remote;
-        return ZYROWriteFileFd(STDOUT_FILENO, answer.data(), answer.size()) >= 0;
+        return WriteAll(STDOUT_FILENO, answer);
     });
     _exit(0);
 }
