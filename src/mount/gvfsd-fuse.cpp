@@ -1,4 +1,5 @@
 #include <fcntl.h>
+#include <sys/statfs.h>
 #include <unistd.h>
 #include <zosplatform/process.h>
 
@@ -26,13 +27,21 @@ namespace {
 /** How a launch ended; travels as the helper's exit status. */
 enum LaunchResult { kLaunched = 0, kLaunchFailed = 1, kStaleMountPoint = 2 };
 
+/** Where the kernel checks permissions itself, it answers access() from what it remembers of the
+ * tree, for a second after the daemon died; the size of the file system only the daemon can tell.
+ */
+bool CanAccess(const std::string& path) {
+    struct statfs info {};
+    return access(path.c_str(), F_OK) == 0 && statfs(path.c_str(), &info) == 0;
+}
+
 /** A fuse daemon that died leaves a mount point on which every access fails. */
 int PrepareMountPoint(const std::string& path) {
     if (!Utils::CreateFolder(path.c_str(), nullptr, true, -1, -1, 0777)) {
         LOG_ERROR("Failed to mkdir %s, %m", path.c_str());
         return kStaleMountPoint;
     }
-    if (access(path.c_str(), F_OK) != 0) {
+    if (!CanAccess(path)) {
         LOG_ERROR("Failed to access %s, %m", path.c_str());
         return kStaleMountPoint;
     }

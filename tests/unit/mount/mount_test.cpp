@@ -488,7 +488,6 @@ TEST_F(Mount, WorksWhileAnotherThreadOwnsTheDefaultMainContext) {
     g_main_loop_quit(loop);
     service.join();
     g_main_loop_unref(loop);
-    open_ = mounting::OpenDescriptors();  // the default context keeps its wake-up descriptor
 }
 
 // --- steps that fail --------------------------------------------------------------------------
