@@ -6,7 +6,6 @@
 #include <cstring>
 #include <memory>
 
-#include "core/fd_io.h"
 #include "core/handle.h"
 #include "core/identity.h"
 #include "core/log.h"
