@@ -20,7 +20,7 @@ namespace ZYROVFS {
  * The numbers travel as exit statuses and to callers, so they never change; the reserved ones
  * are no longer set by anything and keep the others in place.
  */
-enum __tag_vfs_err_ {
+enum __tag_vfs_err_ : int {
     VFS_ERR_NONE = 0,
     VFS_ERR_UNKNOWN = 1,
     VFS_ERR_BAD_PARAM = 2,

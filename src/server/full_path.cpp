@@ -122,6 +122,20 @@ int AskGioApart(const char* uri, std::string& full) {
     return WaitForChild(child).Result();
 }
 
+/** A process that acts for somebody else may be about to fork a mount child, which must not inherit
+ * GIO's connection. A backend, which is the user, has threads and must not fork for a question. */
+bool AskGioSafely(const char* uri, std::string& full) {
+    if (geteuid() == GetActorUID()) {
+        return AskGio(uri, full);
+    }
+    std::string answer;
+    if (AskGioApart(uri, answer) != 0 || answer.empty()) {
+        return false;
+    }
+    full = answer;
+    return true;
+}
+
 /**
  * The child. It writes its answer past the C library's buffer, which may hold output of the parent,
  * and ends without the parent's exit handlers. A lookup that finds nothing answers with nothing.
@@ -229,7 +243,7 @@ bool GetFullPath(const char* uri, std::string& full) {
         return false;
     }
     return NoThrow(VFS_ERR_FAILED,
-                   [&] { return AskGio(uri, full) || GetFullPathByConfig(uri, full); });
+                   [&] { return AskGioSafely(uri, full) || GetFullPathByConfig(uri, full); });
 }
 
 bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const char* codepage,

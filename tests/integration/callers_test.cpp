@@ -150,6 +150,13 @@ TEST_F(Callers, WhoAskForAPathOfASavedLocationGetItConnected) {
               0)
         << "in the child that asks as the user, too";
     EXPECT_TRUE(Connections().isMember(id));
+
+    Forget(id);
+    ASSERT_FALSE(Connections().isMember(id));
+    EXPECT_EQ(FindInner([&](std::string& full) { return Utils::GetFullPath(uri.c_str(), full); }),
+              0)
+        << "and in a process that is root and asks GIO first";
+    EXPECT_TRUE(Connections().isMember(id));
     Forget(id);
 }
 
