@@ -1,5 +1,6 @@
 #include <fcntl.h>
 #include <glib.h>
+#include <sys/vfs.h>
 #include <unistd.h>
 #include <zosplatform/process.h>
 
@@ -27,13 +28,22 @@ using UniqueError = std::unique_ptr<GError, FreeWith<g_error_free>>;
 /** How a launch ended; travels as the helper's exit status. */
 enum LaunchResult { kLaunched = 0, kLaunchFailed = 1, kStaleMountPoint = 2 };
 
-/** A fuse daemon that died leaves a mount point on which every access fails. */
+/**
+ * A fuse daemon that died leaves a mount point on which every access fails. For about a second the
+ * kernel may still answer an access by what it remembers; the question for the file system's size
+ * always goes to the daemon.
+ */
+bool IsUsable(const std::string& path) {
+    struct statfs size {};
+    return access(path.c_str(), F_OK) == 0 && statfs(path.c_str(), &size) == 0;
+}
+
 int PrepareMountPoint(const std::string& path) {
     if (!Utils::CreateFolder(path.c_str(), nullptr, true, -1, -1, 0777)) {
         LOG_ERROR("Failed to mkdir %s, %m", path.c_str());
         return kStaleMountPoint;
     }
-    if (access(path.c_str(), F_OK) != 0) {
+    if (!IsUsable(path)) {
         LOG_ERROR("Failed to access %s, %m", path.c_str());
         return kStaleMountPoint;
     }
@@ -130,8 +140,12 @@ int RunFuse(uid_t uid, int& pid) {
     const int result = WaitForChild(helper).Result();
     const long long number = strtoll(text.c_str(), nullptr, 10);
     pid = number > 0 && number <= INT_MAX ? static_cast<int>(number) : 0;
-    // A helper that somebody else collected has said by the pid whether it did its work.
-    return result == kLaunched && pid == 0 ? static_cast<int>(kLaunchFailed) : result;
+    // Where children are collected unseen, the status is lost: without a pid the launch has failed,
+    // and the mount point tells whether it can be repaired.
+    if (result == kLaunched && pid == 0) {
+        return IsUsable(paths::FuseTree(uid)) ? kLaunchFailed : kStaleMountPoint;
+    }
+    return result;
 }
 
 [[noreturn]] void UnmountAsRoot(const std::string& path) {

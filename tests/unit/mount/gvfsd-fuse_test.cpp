@@ -176,6 +176,27 @@ TEST_F(Fuse, PathThatTheUserCannotMakeIsNoMountPoint) {
     EXPECT_TRUE(seams::Logged("Failed to run gvfsd-fuse, uid=4001, 2"));
 }
 
+TEST_F(Fuse, StaleMountPointIsRepairedUnderAServiceThatIgnoresItsChildren) {
+    ASSERT_TRUE(MakeStaleMount(kTree));
+    InFreshProcess([] {
+        signal(SIGCHLD, SIG_IGN);
+        EXPECT_TRUE(GVFSD_FUSE::Init()) << seams::LogDump();
+        ASSERT_TRUE(Started("gvfsd-fuse"));
+        EXPECT_EQ(Read(paths::GvfsdFusePid(kUser)), Report("gvfsd-fuse", "pids"));
+    });
+}
+
+TEST_F(Fuse, LaunchThatFailsIsSeenByAServiceThatIgnoresItsChildren) {
+    std::filesystem::remove(paths::kGvfsdFuse);
+    BreakUmount();
+    InFreshProcess([] {
+        signal(SIGCHLD, SIG_IGN);
+        EXPECT_FALSE(GVFSD_FUSE::Init());
+        EXPECT_TRUE(seams::Logged("Failed to run gvfsd-fuse, uid=4001"));
+    });
+    EXPECT_EQ(Report("umount"), "") << "there is nothing to repair";
+}
+
 TEST_F(Fuse, RepairRestoresTheServicesChoiceAboutItsChildren) {
     ASSERT_TRUE(MakeStaleMount(kTree));
     InFreshProcess([] {
