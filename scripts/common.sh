@@ -16,7 +16,8 @@ SERVER_PACKAGES=(
   vsftpd openssh-server lighttpd lighttpd-mod-webdav lighttpd-mod-openssl samba glib-networking
   iproute2 util-linux openssl procps
 )
-TEST_PACKAGES=(libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev)
+TEST_PACKAGES=(libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev python3)
+BENCH_PACKAGES=(libbenchmark-dev python3)
 
 need_root() {
   [ "$(id -u)" = 0 ] || { echo "$0: root is needed: sudo $0" >&2; exit 2; }

@@ -8,11 +8,11 @@
 
 #include "zosplatform/text.h"
 
-namespace zos __attribute__((visibility("hidden"))) {
+namespace zos {
 
-    using TextMap = std::map<std::string, std::string, std::less<>>;
+using TextMap = std::map<std::string, std::string, std::less<>>;
 
-}  // namespace )
+}  // namespace zos
 
 struct _tag_YLIBCSZLIST_ {
     std::vector<std::string> items;

@@ -21,8 +21,9 @@ namespace {
 constexpr std::string_view kVersion = "$1$";
 constexpr size_t kNonceSize = 12;
 constexpr size_t kTagSize = 16;
-/** The cipher counts in int, and base64 adds a third. */
-constexpr size_t kMaxPlain = INT_MAX / 2;
+/** The cipher and the base64 of its text are counted in int. */
+constexpr size_t kMaxText = INT_MAX / 2;
+constexpr size_t kMaxPlain = kMaxText / 2;
 
 struct FreeContext {
     void operator()(EVP_CIPHER_CTX* context) const { EVP_CIPHER_CTX_free(context); }
@@ -146,7 +147,7 @@ int Encrypt(std::string_view plain, char* out, size_t size) {
 }
 
 int Decrypt(std::string_view cipher, char* out, size_t size) {
-    if (cipher.size() > kMaxPlain || cipher.substr(0, kVersion.size()) != kVersion) {
+    if (cipher.size() > kMaxText || cipher.substr(0, kVersion.size()) != kVersion) {
         return Refuse(ZOS_ERR_BAD_CIPHER_TEXT);
     }
     std::string sealed = FromBase64(cipher.substr(kVersion.size()));

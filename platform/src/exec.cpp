@@ -133,17 +133,21 @@ int YLIBCExecv(const char* path, const char* const argv[]) {
 }
 
 int YLIBCExec(const char* path, ...) {
+    std::vector<const char*> argv;
+    const auto append = [&argv](const char* argument) {
+        return zos::OrOutOfMemory(false, [&] {
+            argv.push_back(argument);
+            return true;
+        });
+    };
+    bool appended = append(path);
     va_list args;
     va_start(args, path);
-    const int result = zos::OrOutOfMemory(kFailed, [&] {
-        std::vector<const char*> argv{path};
-        while (argv.back() != nullptr) {
-            argv.push_back(va_arg(args, const char*));
-        }
-        return YLIBCExecv(path, argv.data());
-    });
+    while (appended && argv.back() != nullptr) {
+        appended = append(va_arg(args, const char*));
+    }
     va_end(args);
-    return result;
+    return appended ? YLIBCExecv(path, argv.data()) : kFailed;
 }
 
 int YLIBServicectlStart(const char* service, int) {

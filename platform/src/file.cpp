@@ -93,8 +93,10 @@ int YLIBCFileTouch(const char* path) {
         return 0;
     }
     if (errno == ENOENT) {
-        // Times are set once more, for a file that somebody else made between the two calls.
-        const zos::Fd fd(open(path, O_WRONLY | O_CREAT | O_CLOEXEC | O_NONBLOCK, 0666));
+        // Times are set once more, for a file that somebody else made between the two calls. No
+        // file is made behind a user's link to nowhere: root touches files in users' folders.
+        const zos::Fd fd(
+            open(path, O_WRONLY | O_CREAT | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW, 0666));
         if (fd && futimens(fd.Get(), nullptr) == 0) {
             return 0;
         }

@@ -60,21 +60,6 @@ zos::Fd Enter(const zos::Fd& parent, const std::string& name, bool make, mode_t 
     return dir;
 }
 
-/** The folder of a user's tasks. */
-zos::Fd OpenStore(const std::string& directory, bool make) {
-    zos::Fd dir(open(kBase, O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-    const std::string_view user = std::string_view(directory).substr(kStore.size() + 1);
-    const std::pair<std::string, mode_t> steps[] = {
-        {"zos", kSharedMode}, {"task", kSharedMode}, {std::string(user), kUserMode}};
-    for (const auto& [name, mode] : steps) {
-        if (!dir) {
-            break;
-        }
-        dir = Enter(dir, name, make, mode);
-    }
-    return dir;
-}
-
 struct Place {
     std::string directory;
     std::string file;
@@ -82,7 +67,28 @@ struct Place {
 
 Place Split(const std::string& path) {
     const size_t slash = path.rfind('/');
-    return {path.substr(0, slash), path.substr(slash + 1)};
+    return slash == std::string::npos ? Place{"", path}
+                                      : Place{path.substr(0, slash), path.substr(slash + 1)};
+}
+
+/**
+ * The folder of a user's tasks. What all users share only root makes: in the hands of the first
+ * user who came by it would be closed to all others.
+ */
+zos::Fd OpenStore(const std::string& directory, bool make) {
+    const Place place = Split(directory);
+    if (place.directory != kStore || !CanNameAFile(place.file)) {
+        errno = EINVAL;
+        return zos::Fd();
+    }
+    zos::Fd dir(open(kBase, O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    const bool make_shared = make && geteuid() == 0;
+    for (const char* shared : {"zos", "task"}) {
+        if (dir) {
+            dir = Enter(dir, shared, make_shared, kSharedMode);
+        }
+    }
+    return dir ? Enter(dir, place.file, make, kUserMode) : zos::Fd();
 }
 
 std::string FileName(const std::string& id) {

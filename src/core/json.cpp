@@ -5,8 +5,10 @@
 #include <json/writer.h>
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <charconv>
+#include <cmath>
 #include <memory>
 
 #include "core/handle.h"
@@ -17,11 +19,14 @@ namespace {
 
 // Far beyond any document of ours, far below what would exhaust the memory of the box.
 constexpr size_t kLargestDocument = 64 << 20;
+// Levels of nesting that the reader takes; each costs stack.
+constexpr int kMostLevels = 1000;
 
 const Json::CharReaderBuilder& ReaderRules() {
     static const Json::CharReaderBuilder rules = [] {
         Json::CharReaderBuilder builder;
         builder["failIfExtra"] = true;
+        builder["stackLimit"] = kMostLevels;
         // Written into one line, a comment would swallow what stands behind it.
         builder["collectComments"] = false;
         return builder;
@@ -35,6 +40,7 @@ const Json::StreamWriterBuilder& WriterRules() {
         builder["indentation"] = "";
         // Escaping would replace what is not valid UTF-8; names and passwords keep their bytes.
         builder["emitUTF8"] = true;
+        builder["commentStyle"] = "None";
         return builder;
     }();
     return rules;
@@ -67,6 +73,20 @@ bool ReadAll(int fd, std::string& text) {
             return false;
         }
     }
+}
+
+/** Whether the reader takes back what is written of this value: no infinite number, and no deeper
+ * nesting than it allows. Far cheaper than reading the text back. */
+bool CanBeReadBack(const Json::Value& value, int levels) {
+    if (value.type() == Json::realValue) {
+        return std::isfinite(value.asDouble());
+    }
+    if (levels == 0) {
+        return false;
+    }
+    return std::all_of(value.begin(), value.end(), [levels](const Json::Value& inner) {
+        return CanBeReadBack(inner, levels - 1);
+    });
 }
 
 template <typename T>
@@ -109,14 +129,17 @@ bool fromFile(Json::Value& value, const std::string& path) try {
 }
 
 bool toFile(const Json::Value& value, const std::string& path, mode_t mode, FileOwner owner) try {
+    // What cannot be read back must not replace what can.
+    if (!CanBeReadBack(value, kMostLevels)) {
+        errno = EINVAL;
+        return false;
+    }
     const std::string text = toString(value) + "\n";
     if (text.size() > kLargestDocument) {
         errno = EFBIG;
         return false;
     }
-    // What cannot be read back (nested too deeply, an infinite number) must not replace what can.
-    Json::Value check;
-    return fromString(check, text) && ReplaceFile(path, text, mode, owner);
+    return ReplaceFile(path, text, mode, owner);
 } catch (const std::exception&) {
     errno = ENOMEM;
     return false;

@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
+#include <zosplatform/file.h>
 
 #include <cerrno>
 #include <cstdio>
@@ -15,16 +16,7 @@ namespace ZYROVFS {
 namespace {
 
 bool WriteAll(int fd, const std::string& text) {
-    size_t done = 0;
-    while (done < text.size()) {
-        const ssize_t n = write(fd, text.data() + done, text.size() - done);
-        if (n >= 0) {
-            done += static_cast<size_t>(n);
-        } else if (errno != EINTR) {
-            return false;
-        }
-    }
-    return true;
+    return ZYROWriteFileFd(fd, text.data(), text.size()) == static_cast<ssize_t>(text.size());
 }
 
 /**

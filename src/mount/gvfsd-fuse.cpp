@@ -1,6 +1,6 @@
 #include <fcntl.h>
 #include <glib.h>
-#include <sys/vfs.h>
+#include <sys/statfs.h>
 #include <unistd.h>
 #include <zosplatform/process.h>
 
@@ -28,22 +28,21 @@ using UniqueError = std::unique_ptr<GError, FreeWith<g_error_free>>;
 /** How a launch ended; travels as the helper's exit status. */
 enum LaunchResult { kLaunched = 0, kLaunchFailed = 1, kStaleMountPoint = 2 };
 
-/**
- * A fuse daemon that died leaves a mount point on which every access fails. For about a second the
- * kernel may still answer an access by what it remembers; the question for the file system's size
- * always goes to the daemon.
+/** Where the kernel checks permissions itself, it answers access() from what it remembers of the
+ * tree, for a second after the daemon died; the size of the file system only the daemon can tell.
  */
-bool IsUsable(const std::string& path) {
-    struct statfs size {};
-    return access(path.c_str(), F_OK) == 0 && statfs(path.c_str(), &size) == 0;
+bool CanAccess(const std::string& path) {
+    struct statfs info {};
+    return access(path.c_str(), F_OK) == 0 && statfs(path.c_str(), &info) == 0;
 }
 
+/** A fuse daemon that died leaves a mount point on which every access fails. */
 int PrepareMountPoint(const std::string& path) {
     if (!Utils::CreateFolder(path.c_str(), nullptr, true, -1, -1, 0777)) {
         LOG_ERROR("Failed to mkdir %s, %m", path.c_str());
         return kStaleMountPoint;
     }
-    if (!IsUsable(path)) {
+    if (!CanAccess(path)) {
         LOG_ERROR("Failed to access %s, %m", path.c_str());
         return kStaleMountPoint;
     }
@@ -143,7 +142,7 @@ int RunFuse(uid_t uid, int& pid) {
     // Where children are collected unseen, the status is lost: without a pid the launch has failed,
     // and the mount point tells whether it can be repaired.
     if (result == kLaunched && pid == 0) {
-        return IsUsable(paths::FuseTree(uid)) ? kLaunchFailed : kStaleMountPoint;
+        return CanAccess(paths::FuseTree(uid)) ? kLaunchFailed : kStaleMountPoint;
     }
     return result;
 }

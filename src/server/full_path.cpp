@@ -1,6 +1,7 @@
 #include <fcntl.h>
 #include <gio/gio.h>
 #include <unistd.h>
+#include <zosplatform/file.h>
 
 #include <cerrno>
 #include <cstring>
@@ -52,19 +53,6 @@ bool RecordedPath(const std::string& id, std::string& path) {
     return true;
 }
 
-bool WriteAll(int fd, const std::string& text) {
-    size_t done = 0;
-    while (done < text.size()) {
-        const ssize_t n = write(fd, text.data() + done, text.size() - done);
-        if (n >= 0) {
-            done += static_cast<size_t>(n);
-        } else if (errno != EINTR) {
-            return false;
-        }
-    }
-    return true;
-}
-
 /** What is left of an answer that came in several pieces: the last one. */
 std::string ReadLastPiece(int fd) {
     char buffer[kPiece];
@@ -96,6 +84,46 @@ std::string ToCodepage(const char* path, const char* codepage) {
     return remote;
 }
 
+bool AskGio(const char* uri, std::string& full) {
+    const UniqueFile file(g_file_new_for_commandline_arg(uri));
+    const UniqueGString path(file ? g_file_get_path(file.get()) : nullptr);
+    if (!path) {
+        return false;
+    }
+    full = path.get();
+    return true;
+}
+
+/**
+ * AskGio in a process of its own. GIO's bus connection works only in the process that made it: a
+ * child that had asked GIO itself could no longer connect on demand, since the mount child that it
+ * forks would wait on a connection whose thread is not there. 0, also when GIO tells no path and
+ * `full` stays empty; another number when the process could not be run to its end.
+ */
+int AskGioApart(const char* uri, std::string& full) {
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) != 0) {
+        LOG_ERROR("Failed to create pipe");
+        return -1;
+    }
+    UniqueFd in(ends[0]);
+    UniqueFd out(ends[1]);
+    const pid_t child = fork();
+    if (child == 0) {
+        NoThrow(VFS_ERR_FAILED, [&] {
+            return AskGio(uri, full) && ZYROWriteFileFd(out.Get(), full.data(), full.size()) >= 0;
+        });
+        _exit(0);
+    }
+    out.Reset();
+    if (child < 0) {
+        LOG_ERROR("Failed to fork, %m");
+        return -1;
+    }
+    full = ReadLastPiece(in.Get());
+    return WaitForChild(child).Result();
+}
+
 /**
  * The child. It writes its answer past the C library's buffer, which may hold output of the parent,
  * and ends without the parent's exit handlers. A lookup that finds nothing answers with nothing.
@@ -112,13 +140,42 @@ std::string ToCodepage(const char* path, const char* codepage) {
     NoThrow(VFS_ERR_FAILED, [&] {
         const std::string uri = remote.empty() ? id : id + "/" + remote;
         std::string full;
-        if (!GetFullPath(uri.c_str(), full)) {
+        if (AskGioApart(uri.c_str(), full) != 0) {
+            _exit(1);
+        }
+        if (full.empty() && !GetFullPathByConfig(uri.c_str(), full)) {
             LOG_ERROR("Failed to get full path, %s", uri.c_str());
             return false;
         }
-        return WriteAll(STDOUT_FILENO, remote.empty() ? full : full + "\n" + remote);
+        const std::string answer = remote.empty() ? full : full + "\n" + remote;
+        return ZYROWriteFileFd(STDOUT_FILENO, answer.data(), answer.size()) >= 0;
     });
     _exit(0);
+}
+
+bool LookUpInChild(unsigned int uid, const std::string& id, const std::string& remote,
+                   std::string& uriOut, std::string& fullOut) {
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) != 0) {
+        LOG_ERROR("Failed to create pipe");
+        return false;
+    }
+    UniqueFd in(ends[0]);
+    UniqueFd out(ends[1]);
+    const pid_t child = fork();
+    if (child == 0) {
+        in.Reset();
+        LookUpAndExit(out.Get(), uid, id, remote);
+    }
+    out.Reset();
+    if (child < 0) {
+        LOG_ERROR("Failed to fork, %m");
+        return false;
+    }
+    const std::string answer = ReadLastPiece(in.Get());
+    const int status = WaitForChild(child).Result();
+    SplitAnswer(answer, uriOut, fullOut);
+    return status == 0;
 }
 
 }  // namespace
@@ -173,13 +230,8 @@ bool GetFullPath(const char* uri, std::string& full) {
         LOG_ERROR("Wrong parameters");
         return false;
     }
-    const UniqueFile file(g_file_new_for_commandline_arg(uri));
-    const UniqueGString path(file ? g_file_get_path(file.get()) : nullptr);
-    if (!path) {
-        return GetFullPathByConfig(uri, full);
-    }
-    full = path.get();
-    return true;
+    return NoThrow(VFS_ERR_FAILED,
+                   [&] { return AskGio(uri, full) || GetFullPathByConfig(uri, full); });
 }
 
 bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const char* codepage,
@@ -188,28 +240,11 @@ bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const
         LOG_ERROR("Wrong parameters");
         return false;
     }
-    const SigchldGuard collectable;
-    const std::string remote = ToCodepage(path, codepage);
-    int ends[2];
-    if (pipe2(ends, O_CLOEXEC) != 0) {
-        LOG_ERROR("Failed to create pipe");
-        return false;
-    }
-    UniqueFd in(ends[0]);
-    UniqueFd out(ends[1]);
-    const pid_t child = fork();
-    if (child == 0) {
-        in.Reset();
-        LookUpAndExit(out.Get(), uid, serverId, remote);
-    }
-    out.Reset();
-    if (child < 0) {
-        return false;
-    }
-    const std::string answer = ReadLastPiece(in.Get());
-    const int status = WaitForChild(child).Result();
-    SplitAnswer(answer, uriOut, fullOut);
-    return status == 0;
+    return NoThrow(VFS_ERR_FAILED, [&] {
+        const SigchldGuard collectable;
+        const std::string remote = ToCodepage(path, codepage);
+        return LookUpInChild(uid, serverId, remote, uriOut, fullOut);
+    });
 }
 
 }  // namespace ZYROVFS::Utils

@@ -5,6 +5,7 @@
 
 #include "core/no_throw.h"
 #include "core/paths.h"
+#include "server/config_document.h"
 #include "server/mount_file.h"
 #include "zyrovfs/protocol.h"
 #include "zyrovfs/server.h"
@@ -72,15 +73,9 @@ bool List(Json::Value& out) {
     return true;
 }
 
-/** Saved profiles are input: what has no protocol or is no profile at all matches nothing. */
-bool HasServer(const Json::Value& document, const std::string& protocol) {
-    const Json::Value servers = document.isObject() ? document["servers"] : Json::Value();
-    if (!servers.isObject()) {
-        return false;
-    }
+bool HasServer(const Json::Value& servers, const char* protocol) {
     return std::any_of(servers.begin(), servers.end(), [&](const Json::Value& profile) {
-        const Json::Value value = profile.isObject() ? profile["protocol"] : Json::Value();
-        return value.isString() && value.asString() == protocol;
+        return Server::HasText(profile, "protocol", protocol);
     });
 }
 
@@ -102,10 +97,11 @@ bool ListProtocolByUID(unsigned int uid, Json::Value& out) {
                       ZYROERR_ARGS);
             return Fail(VFS_ERR_CONFIG_READ);
         }
+        const Json::Value& servers = Server::ServersOf(document);
         for (Json::Value& element : out) {
             // Links that others share are there to be opened without any saved server.
             const std::string protocol = element["protocol"].asString();
-            element["has_server"] = protocol == "sharing" || HasServer(document, protocol);
+            element["has_server"] = protocol == "sharing" || HasServer(servers, protocol.c_str());
         }
         return true;
     });

@@ -1,14 +1,11 @@
-// The real bus, gvfsd and gvfsd-fuse of two users: brought up, killed one by one, found dead and
-// started again by the next process that needs them.
-#include <gio/gio.h>
+// The three daemons of one user, killed and forged one after the other: the next program that uses
+// the library finds what is dead, starts it again, and a mount works through the tree.
 #include <gmock/gmock.h>
-#include <grp.h>
 #include <gtest/gtest.h>
+#include <signal.h>
 
 #include <chrono>
-#include <csignal>
-#include <thread>
-#include <vector>
+#include <fstream>
 
 #include "support/machine.h"
 #include "zyrovfs/zyrovfs_netdrive.h"
@@ -16,301 +13,215 @@
 namespace {
 
 using namespace ZYROVFS;
+using machine::Eventually;
 using machine::InProcess;
 using machine::Must;
 using machine::RunAs;
 using testing::HasSubstr;
-using testing::StartsWith;
 
 constexpr unsigned kAmy = 4001;
 constexpr unsigned kBen = 4002;
 
-std::string Runtime(unsigned uid) {
-    return "/var/tmp/user/" + std::to_string(uid);
-}
-std::string Tree(unsigned uid) {
-    return Runtime(uid) + "/gvfs";
-}
+constexpr const char* kTree = "/var/tmp/user/4001/gvfs";
+constexpr const char* kFile =
+    "/var/tmp/user/4001/gvfs/ftp:host=127.0.0.1,port=2121,user=remo/hello.txt";
+constexpr const char* kHello = "hello from the remote side\n";
 
-std::string FirstLine(const std::string& path) {
-    const std::string text = machine::Read(path);
-    return text.substr(0, text.find('\n'));
-}
+const std::string kRuntime = "/var/tmp/user/4001/";
+const std::string kBusPid = kRuntime + "dbus/dbus.pid";
+const std::string kBusPath = kRuntime + "dbus/dbus.path";
+const std::string kGvfsdPid = kRuntime + "zyrovfs/gvfsd.pid";
+const std::string kFusePid = kRuntime + "zyrovfs/gvfsd-fuse.pid";
 
-struct Chain {
-    int bus;
-    int gvfsd;
-    int fuse;
+struct Daemon {
+    std::string pid_file;
+    std::string name;
 };
 
-Chain ChainOf(unsigned uid) {
-    const auto pid = [uid](const char* file) {
-        return atoi(FirstLine(Runtime(uid) + file).c_str());
-    };
-    return {pid("/dbus/dbus.pid"), pid("/zyrovfs/gvfsd.pid"), pid("/zyrovfs/gvfsd-fuse.pid")};
+const Daemon kChain[] = {{kBusPid, "dbus-daemon"}, {kGvfsdPid, "gvfsd"}, {kFusePid, "gvfsd-fuse"}};
+
+pid_t PidIn(const std::string& file) {
+    return atoi(machine::Read(file).c_str());
 }
 
-/** Living processes of a name and an owner. */
-std::vector<int> Processes(const std::string& name, unsigned uid) {
-    std::istringstream list(
-        machine::Run("pgrep --euid " + std::to_string(uid) + " --exact " + name).output);
-    std::vector<int> pids;
-    for (int pid = 0; list >> pid;) {
-        pids.push_back(pid);
+bool IsGone(pid_t pid) {
+    return kill(pid, 0) != 0 && errno == ESRCH;
+}
+
+void Kill(const std::string& pid_file) {
+    const pid_t pid = PidIn(pid_file);
+    ASSERT_GT(pid, 1) << pid_file;
+    ASSERT_EQ(kill(pid, SIGKILL), 0) << pid_file;
+    ASSERT_TRUE(Eventually([pid] { return IsGone(pid); }));
+}
+
+void Write(const std::string& path, const std::string& text) {
+    std::ofstream(path) << text << '\n';
+}
+
+std::string StatusOf(pid_t pid) {
+    return machine::Read("/proc/" + std::to_string(pid) + "/status");
+}
+
+/** Each daemon of the pid files lives, by name and user. */
+void ExpectWholeChain() {
+    for (const Daemon& daemon : kChain) {
+        ASSERT_THAT(StatusOf(PidIn(daemon.pid_file)),
+                    testing::AllOf(HasSubstr("Name:\t" + daemon.name + "\n"),
+                                   HasSubstr("Uid:\t4001\t4001\t4001\t4001\n")))
+            << daemon.pid_file;
     }
-    return pids;
 }
 
-void ExpectOneLivingChain(unsigned uid) {
-    const Chain chain = ChainOf(uid);
-    EXPECT_THAT(Processes("dbus-daemon", uid), testing::ElementsAre(chain.bus));
-    EXPECT_THAT(Processes("gvfsd", uid), testing::ElementsAre(chain.gvfsd));
-    EXPECT_THAT(Processes("gvfsd-fuse", uid), testing::ElementsAre(chain.fuse));
+int Connect() {
+    Json::Value profile;
+    profile["protocol"] = "ftp";
+    profile["hostname"] = "127.0.0.1";
+    profile["port"] = 2121;
+    profile["alias"] = "Chain";
+    profile["account"] = "remo";
+    profile["password"] = "secret";
+    profile["codepage"] = "UTF-8";
+    std::string id;
+    Json::Value out;
+    return Server::Add(kAmy, Server::VFS_CONFIG_CONNECT, id, profile, false, out) ? 0
+                                                                                  : int{GetError()};
 }
 
-/** Ends processes as a crash would, and returns when they are gone. */
-void Kill(const std::vector<int>& pids) {
-    for (const int pid : pids) {
-        ASSERT_GT(pid, 1);
-        kill(pid, SIGKILL);
-    }
-    for (const int pid : pids) {
-        const std::string entry = "/proc/" + std::to_string(pid);
-        for (int i = 0; i < 1000 && access(entry.c_str(), F_OK) == 0; ++i) {
-            std::this_thread::sleep_for(std::chrono::milliseconds(10));
+/** The next program that needs the connection: it must work up to the remote file. */
+void ExpectThatTheNextUseWorks() {
+    ASSERT_EQ(InProcess(Connect), 0);
+    EXPECT_TRUE(Eventually([] {
+        return RunAs("amy", std::string("cat '") + kFile + "'").output == kHello;
+    })) << RunAs("amy", std::string("ls -l ") + kTree).output;
+    ExpectWholeChain();
+}
+
+/** A process that is not a daemon of amy's; ends with the object. */
+class Stranger {
+  public:
+    Stranger(const std::string& name, unsigned uid) {
+        const std::string program = "/tmp/strangers/" + name;
+        Must("mkdir -p /tmp/strangers && cp /bin/sleep " + program);
+        pid_ = fork();
+        if (pid_ == 0) {
+            if (setresuid(uid, uid, uid) == 0) {
+                execl(program.c_str(), program.c_str(), "600", nullptr);
+            }
+            _exit(1);
         }
-        ASSERT_NE(access(entry.c_str(), F_OK), 0) << pid;
+        Eventually([this, &name] { return StatusOf(pid_).rfind("Name:\t" + name + "\n", 0) == 0; });
     }
-}
-
-/** One use by a process of its own, which a program of the web layer would be. */
-int Use(unsigned uid) {
-    return InProcess([uid] {
-        if (InitGlobal(uid, false)) {
-            return 0;
-        }
-        fprintf(stderr, "InitGlobal(%u): %s\n", uid, GetErrorName(GetError()));
-        return 1;
-    });
-}
-
-void OnMounted(GObject* file, GAsyncResult* result, gpointer loop) {
-    GError* error = nullptr;
-    if (g_file_mount_enclosing_volume_finish(G_FILE(file), result, &error) == FALSE) {
-        fprintf(stderr, "mount: %s\n", error->message);
+    Stranger(const Stranger&) = delete;
+    Stranger& operator=(const Stranger&) = delete;
+    ~Stranger() {
+        kill(pid_, SIGKILL);
+        waitpid(pid_, nullptr, 0);
     }
-    g_clear_error(&error);
-    g_main_loop_quit(static_cast<GMainLoop*>(loop));
-}
+    pid_t Pid() const { return pid_; }
+    bool IsAlive() const { return waitpid(pid_, nullptr, WNOHANG) == 0; }
 
-/** A client that runs as the user: mounts the machine's own files and tells the local path of
- * /srv/chain/hello.txt in that mount. */
-int MountAndTellPath(unsigned uid, const std::string& answer) {
-    if (!InitGlobal(uid, false) || setgroups(0, nullptr) != 0 || setregid(100, 100) != 0 ||
-        setreuid(uid, uid) != 0) {
-        return 1;
-    }
-    setenv("GIO_USE_VOLUME_MONITOR", "unix", 1);
-    GFile* file = g_file_new_for_uri("localtest:///srv/chain/hello.txt");
-    GMainLoop* loop = g_main_loop_new(nullptr, FALSE);
-    g_file_mount_enclosing_volume(file, G_MOUNT_MOUNT_NONE, nullptr, nullptr, OnMounted, loop);
-    g_main_loop_run(loop);
-    char* path = g_file_get_path(file);
-    std::ofstream(answer) << (path == nullptr ? "no path" : path);
-    return path == nullptr ? 2 : 0;
-}
-
-std::string LocalPath(unsigned uid) {
-    const std::string answer = "/tmp/path-" + std::to_string(uid);
-    unlink(answer.c_str());
-    EXPECT_EQ(InProcess([&] { return MountAndTellPath(uid, answer); }), 0);
-    return machine::Read(answer);
-}
-
-/** Reads as the user. After a mount was made anew the first accesses may still meet the old one in
- * the fuse daemon's memory. */
-std::string ReadAs(const char* user, const std::string& path) {
-    machine::Outcome outcome{};
-    for (int i = 0; i < 3; ++i) {
-        outcome = RunAs(user, "cat '" + path + "'");
-        if (outcome.status == 0) {
-            break;
-        }
-    }
-    return outcome.output;
-}
-
-void ExpectTreeWorks(unsigned uid, const char* user) {
-    const std::string path = LocalPath(uid);
-    EXPECT_THAT(path, StartsWith(Tree(uid) + "/"));
-    EXPECT_EQ(ReadAs(user, path), "hello\n");
-}
+  private:
+    pid_t pid_;
+};
 
 class DaemonChain : public testing::Test {
   protected:
     static void SetUpTestSuite() {
         machine::AddUser("amy", kAmy);
         machine::AddUser("ben", kBen);
-        // The machine's catalogue offers remote servers only; this one needs no server.
-        Must("cd /usr/share/gvfs/mounts && cp localtest.mount.zyrovfs-stock localtest.mount");
-        Must("mkdir -p /srv/chain; echo hello >/srv/chain/hello.txt; chmod -R a+rX /srv/chain");
+        machine::Remote("start secret");
+        ExpectThatTheNextUseWorks();
     }
-    /** Both users at once; what lives already is left alone. */
-    void SetUp() override {
-        const pid_t ben = fork();
-        if (ben == 0) {
-            _exit(Use(kBen));
-        }
-        ASSERT_EQ(Use(kAmy), 0);
-        int status = 0;
-        waitpid(ben, &status, 0);
-        ASSERT_EQ(status, 0);
-        ASSERT_NO_FATAL_FAILURE(ExpectOneLivingChain(kAmy));
-    }
+
+    /** A test may begin with what the one before has left, but not with half a chain. */
+    void SetUp() override { ASSERT_NO_FATAL_FAILURE(ExpectWholeChain()); }
 };
 
-TEST_F(DaemonChain, TwoUsersHaveAChainEach) {
-    ExpectOneLivingChain(kAmy);
-    ExpectOneLivingChain(kBen);
-    const std::string mounts = machine::Read("/proc/mounts");
-    EXPECT_THAT(mounts, HasSubstr("gvfsd-fuse " + Tree(kAmy) + " fuse.gvfsd-fuse"));
-    EXPECT_THAT(mounts, HasSubstr("gvfsd-fuse " + Tree(kBen) + " fuse.gvfsd-fuse"));
-}
-
-TEST_F(DaemonChain, MountIsSeenThroughTheTreeOfItsUser) {
-    ExpectTreeWorks(kAmy, "amy");
-    ExpectTreeWorks(kBen, "ben");
-}
-
-TEST_F(DaemonChain, TreeLetsInItsUserAndRootOnly) {
-    const std::string path = LocalPath(kAmy);
-    ASSERT_EQ(ReadAs("amy", path), "hello\n");
-    EXPECT_EQ(machine::Run("cat '" + path + "'").output, "hello\n");
-    const auto other = RunAs("ben", "cat '" + path + "'");
-    EXPECT_NE(other.status, 0);
-    EXPECT_THAT(other.output, HasSubstr("Permission denied"));
-}
-
-TEST_F(DaemonChain, ChainThatLivesIsLeftAloneAndCostsNoWait) {
-    const Chain before = ChainOf(kAmy);
+TEST_F(DaemonChain, AHealthyChainIsUsedAndNotStartedAgain) {
+    const pid_t before[] = {PidIn(kBusPid), PidIn(kGvfsdPid), PidIn(kFusePid)};
     const auto start = std::chrono::steady_clock::now();
-    ASSERT_EQ(Use(kAmy), 0);
-    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(2));
-    const Chain after = ChainOf(kAmy);
-    EXPECT_EQ(after.bus, before.bus);
-    EXPECT_EQ(after.gvfsd, before.gvfsd);
-    EXPECT_EQ(after.fuse, before.fuse);
+    ExpectThatTheNextUseWorks();
+    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(3));
+    EXPECT_EQ(PidIn(kBusPid), before[0]);
+    EXPECT_EQ(PidIn(kGvfsdPid), before[1]);
+    EXPECT_EQ(PidIn(kFusePid), before[2]);
 }
 
-TEST_F(DaemonChain, KilledGvfsdIsStartedAgainOnTheSameBus) {
-    const Chain before = ChainOf(kAmy);
-    Kill({before.gvfsd});
-    ASSERT_EQ(Use(kAmy), 0);
-    const Chain after = ChainOf(kAmy);
-    EXPECT_EQ(after.bus, before.bus);
-    EXPECT_NE(after.gvfsd, before.gvfsd);
-    ExpectOneLivingChain(kAmy);
-    ExpectTreeWorks(kAmy, "amy");
+TEST_F(DaemonChain, ABusWithoutAnAddressFileIsToldByItsOwnCode) {
+    const pid_t bus = PidIn(kBusPid);
+    const std::string away = kBusPath + ".away";
+    ASSERT_EQ(rename(kBusPath.c_str(), away.c_str()), 0);
+    const auto init = [] { return InitGlobal(kAmy, false) ? 0 : int{GetError()}; };
+    EXPECT_EQ(InProcess(init), VFS_ERR_DBUS_ADDRESS);
+    EXPECT_NE(access(kBusPath.c_str(), F_OK), 0);
+    EXPECT_EQ(PidIn(kBusPid), bus) << "a bus that lives is not started again";
+    ASSERT_EQ(rename(away.c_str(), kBusPath.c_str()), 0);
+    EXPECT_EQ(InProcess(init), 0);
 }
 
-TEST_F(DaemonChain, KilledFuseDaemonLeavesAStaleMountPointThatIsRepaired) {
-    const Chain before = ChainOf(kAmy);
-    Kill({before.fuse});
-    EXPECT_THAT(RunAs("amy", "ls " + Tree(kAmy)).output,
+TEST_F(DaemonChain, AKilledFuseDaemonLeavesAStaleMountPointThatIsRepaired) {
+    const pid_t bus = PidIn(kBusPid);
+    ASSERT_NO_FATAL_FAILURE(Kill(kFusePid));
+    EXPECT_THAT(machine::Run(std::string("ls ") + kTree).output,
                 HasSubstr("Transport endpoint is not connected"));
-    ASSERT_EQ(Use(kAmy), 0);
-    const Chain after = ChainOf(kAmy);
-    EXPECT_EQ(after.bus, before.bus);
-    EXPECT_EQ(after.gvfsd, before.gvfsd);
-    EXPECT_NE(after.fuse, before.fuse);
-    ExpectOneLivingChain(kAmy);
-    ExpectTreeWorks(kAmy, "amy");
+    ExpectThatTheNextUseWorks();
+    EXPECT_EQ(PidIn(kBusPid), bus);
+    EXPECT_EQ(Must(std::string("grep -c ' ") + kTree + " ' /proc/mounts"), "1\n")
+        << "the stale mount must be gone, not covered";
 }
 
-TEST_F(DaemonChain, StaleMountPointIsRepairedAlsoWhileTheKernelRemembersIt) {
-    const Chain before = ChainOf(kAmy);
-    ASSERT_EQ(access(Tree(kAmy).c_str(), F_OK), 0);
-    Kill({before.fuse});
-    ASSERT_EQ(Use(kAmy), 0);
-    EXPECT_NE(ChainOf(kAmy).fuse, before.fuse);
-    ExpectOneLivingChain(kAmy);
-    ExpectTreeWorks(kAmy, "amy");
-}
-
-TEST_F(DaemonChain, KilledBusIsStartedAgainAndTheChainWorks) {
-    const Chain before = ChainOf(kAmy);
-    const std::string address = FirstLine(Runtime(kAmy) + "/dbus/dbus.path");
-    Kill({before.bus});
-    ASSERT_EQ(Use(kAmy), 0);
-    EXPECT_NE(ChainOf(kAmy).bus, before.bus);
-    EXPECT_NE(FirstLine(Runtime(kAmy) + "/dbus/dbus.path"), address);
-    ExpectTreeWorks(kAmy, "amy");
-    ExpectOneLivingChain(kAmy);
-}
-
-TEST_F(DaemonChain, BusThatWasAskedToEndIsStartedAgain) {
-    ASSERT_EQ(InProcess([] {
-                  setenv("ZYROVFS_UID", "4001", 1);
-                  return DBUS::DoKill() && DBUS::CheckDaemonDied() ? 0 : 1;
+TEST_F(DaemonChain, ForcedInitWithADeadDaemonStartsNothingAndAnswersTrue) {
+    const pid_t dead = PidIn(kFusePid);
+    ASSERT_NO_FATAL_FAILURE(Kill(kFusePid));
+    EXPECT_EQ(InProcess([] {
+                  const bool answer = InitGlobal(kAmy, true);
+                  const bool environment =
+                      std::string(getenv("ZYROVFS_UID")) == "4001" &&
+                      std::string(getenv("XDG_RUNTIME_DIR")) == "/var/tmp/user/4001" &&
+                      getenv("DBUS_SESSION_BUS_ADDRESS") == nullptr;
+                  return answer && environment ? 0 : 1;
               }),
               0);
-    ASSERT_EQ(Use(kAmy), 0);
-    ExpectTreeWorks(kAmy, "amy");
-    ExpectOneLivingChain(kAmy);
+    EXPECT_EQ(PidIn(kFusePid), dead);
+    EXPECT_NE(machine::Run("pgrep -u amy -x gvfsd-fuse").status, 0);
+    ExpectThatTheNextUseWorks();
 }
 
-TEST_F(DaemonChain, DaemonsOfOneUserDoNotFeelTheDeathOfAnothers) {
-    const std::string path = LocalPath(kBen);
-    const Chain ben = ChainOf(kBen);
-    const Chain amy = ChainOf(kAmy);
-    Kill({amy.bus, amy.gvfsd, amy.fuse});
-    EXPECT_EQ(ReadAs("ben", path), "hello\n");
-    EXPECT_EQ(ChainOf(kBen).gvfsd, ben.gvfsd);
-    ExpectOneLivingChain(kBen);
+TEST_F(DaemonChain, AKilledGvfsdIsStartedAgainOnTheSameBus) {
+    const pid_t bus = PidIn(kBusPid);
+    const pid_t gvfsd = PidIn(kGvfsdPid);
+    ASSERT_NO_FATAL_FAILURE(Kill(kGvfsdPid));
+    ExpectThatTheNextUseWorks();
+    EXPECT_NE(PidIn(kGvfsdPid), gvfsd);
+    EXPECT_EQ(PidIn(kBusPid), bus);
 }
 
-TEST_F(DaemonChain, GvfsdThatTheBusActivatesBringsNoFuseDaemonAndIsReplaced) {
-    Kill({ChainOf(kAmy).gvfsd});
-    const std::string bus = FirstLine(Runtime(kAmy) + "/dbus/dbus.path");
-    const auto asked =
-        RunAs("amy", "DBUS_SESSION_BUS_ADDRESS='" + bus +
-                         "' gdbus call --session --dest org.gtk.vfs.Daemon --object-path "
-                         "/org/gtk/vfs/mounttracker --method "
-                         "org.gtk.vfs.MountTracker.ListMounts2 false");
-    ASSERT_EQ(asked.status, 0) << asked.output;
-    ASSERT_EQ(Processes("gvfsd", kAmy).size(), 1U) << "the activated one";
-    std::this_thread::sleep_for(std::chrono::seconds(1));
-    EXPECT_LE(Processes("gvfsd-fuse", kAmy).size(), 1U);
-    ASSERT_EQ(Use(kAmy), 0);
-    ExpectTreeWorks(kAmy, "amy");
-    ExpectOneLivingChain(kAmy);
+TEST_F(DaemonChain, AKilledBusIsStartedAgainWithANewAddress) {
+    const std::string address = machine::Read(kBusPath);
+    ASSERT_NO_FATAL_FAILURE(Kill(kBusPid));
+    ExpectThatTheNextUseWorks();
+    EXPECT_NE(machine::Read(kBusPath), address);
 }
 
-TEST_F(DaemonChain, TwoProcessesThatFindAllDeadStartOneChain) {
-    const Chain chain = ChainOf(kAmy);
-    Kill({chain.fuse, chain.gvfsd, chain.bus});
-    const pid_t other = fork();
-    if (other == 0) {
-        _exit(Use(kAmy));
+TEST_F(DaemonChain, PidFilesThatNameStrangersAreOverwrittenAndTheStrangersLeftAlone) {
+    const Stranger bens_bus("dbus-daemon", kBen);
+    const Stranger other_name("sleep", kAmy);
+    const pid_t dead = PidIn(kFusePid);
+    for (const Daemon& daemon : kChain) {
+        const pid_t pid = PidIn(daemon.pid_file);
+        kill(pid, SIGKILL);
+        ASSERT_TRUE(Eventually([pid] { return IsGone(pid); }));
     }
-    EXPECT_EQ(Use(kAmy), 0);
-    int status = 0;
-    waitpid(other, &status, 0);
-    EXPECT_EQ(status, 0);
-    ExpectOneLivingChain(kAmy);
-    ExpectTreeWorks(kAmy, "amy");
-}
-
-TEST_F(DaemonChain, ServiceThatIgnoresItsChildrenGetsAChain) {
-    const Chain chain = ChainOf(kAmy);
-    Kill({chain.fuse, chain.gvfsd, chain.bus});
-    ASSERT_EQ(InProcess([] {
-                  signal(SIGCHLD, SIG_IGN);
-                  return InitGlobal(kAmy, false) ? 0 : 1;
-              }),
-              0);
-    ExpectOneLivingChain(kAmy);
-    ExpectTreeWorks(kAmy, "amy");
+    Write(kBusPid, std::to_string(bens_bus.Pid()));
+    Write(kGvfsdPid, std::to_string(other_name.Pid()));
+    Write(kFusePid, std::to_string(dead));
+    ExpectThatTheNextUseWorks();
+    EXPECT_NE(PidIn(kBusPid), bens_bus.Pid());
+    EXPECT_NE(PidIn(kGvfsdPid), other_name.Pid());
+    EXPECT_NE(PidIn(kFusePid), dead);
+    EXPECT_TRUE(bens_bus.IsAlive());
+    EXPECT_TRUE(other_name.IsAlive());
 }
 
 }  // namespace

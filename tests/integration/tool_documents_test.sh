@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
-# Man page and completion know every command and option that the tool has, and the completion finds
-# saved ids.
+# Man page and completion know every command and option that the tool has, the documents show commands
+# as the tool takes them, and the completion finds saved ids.
 #   tool_documents_test.sh BUILD_DIR SOURCE_DIR
 set -euo pipefail
 build=$1 source=$2
@@ -59,6 +59,18 @@ for group in $(commands_of); do
   done
 done
 [ $count = 18 ] || complain "found $count commands, not 18"
+
+# Every command for a user that a document shows is one that the tool understands; there is no such
+# user here, so none does anything.
+shown=0
+while read -r line; do
+  shown=$((shown + 1))
+  status=0
+  zyrovfs ${line#*zyrovfs } </dev/null >/dev/null 2>&1 || status=$?
+  [ $status = 1 ] || complain "shown in a document, but ends with $status: $line"
+done < <({ cat "$source/README.md" "$source"/docs/*.md; sed 's/\\-/-/g' "$source/packaging/zyrovfs.1"; } |
+  grep -oE '(^|[ (])zyrovfs [^`)]*--user amy[^`)]*')
+[ $shown -ge 5 ] || complain "found only $shown commands in the documents"
 
 useradd --uid 4001 --gid 100 amy
 id=ftp://nas.example:2121

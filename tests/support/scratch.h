@@ -2,6 +2,7 @@
 #ifndef ZYROVFS_TESTS_SCRATCH_H
 #define ZYROVFS_TESTS_SCRATCH_H
 
+#include <grp.h>
 #include <gtest/gtest.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -65,7 +66,8 @@ inline int InChild(const std::function<int()>& body) {
 
 /** In a child, for good: an ordinary user in the group that all users have. */
 inline bool BecomeUser(uid_t uid, gid_t gid = 100) {
-    return setresgid(gid, gid, gid) == 0 && setresuid(uid, uid, uid) == 0;
+    return setgroups(0, nullptr) == 0 && setresgid(gid, gid, gid) == 0 &&
+           setresuid(uid, uid, uid) == 0;
 }
 
 }  // namespace scratch

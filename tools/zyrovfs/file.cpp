@@ -4,6 +4,7 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
+#include <zosplatform/file.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -19,15 +20,8 @@ std::string NewName(const std::string& path) {
 }
 
 bool WriteAll(int fd, const std::string& content) {
-    size_t done = 0;
-    while (done < content.size()) {
-        const ssize_t count = write(fd, content.data() + done, content.size() - done);
-        if (count < 0 && errno != EINTR) {
-            return false;
-        }
-        done += count > 0 ? static_cast<size_t>(count) : 0;
-    }
-    return true;
+    return ZYROWriteFileFd(fd, content.data(), content.size()) ==
+           static_cast<ssize_t>(content.size());
 }
 
 bool Fail(const std::string& leftover) {

@@ -3,7 +3,6 @@
 #ifndef ZOSPLATFORM_FILE_H
 #define ZOSPLATFORM_FILE_H
 
-#include <stddef.h>
 #include <sys/types.h>
 
 #include "zosplatform/text.h"

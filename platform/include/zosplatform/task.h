@@ -1,6 +1,7 @@
 /**
  * Background tasks of a user, so that others can find and end them. One JSON file per task below
- * /var/tmp/zos/task/USER/, replaced atomically.
+ * /var/tmp/zos/task/USER/, replaced atomically. Tasks are kept by root: only root makes the folders
+ * above, and what another than root or the reader wrote is no task.
  */
 #ifndef ZOSPLATFORM_TASK_H
 #define ZOSPLATFORM_TASK_H

@@ -255,6 +255,21 @@ TEST_F(JsonFile, ValueThatCouldNotBeReadBackIsNotWritten) {
     EXPECT_EQ(NamesInTop(), 1U);
 }
 
+TEST_F(JsonFile, WhatIsWrittenAtTheLimitOfNestingIsRead) {
+    for (int levels = 995; levels < 1005; ++levels) {
+        Json::Value deep = "bottom";
+        for (int i = 1; i < levels; ++i) {
+            Json::Value outer;
+            outer["in"].swap(deep);
+            deep.swap(outer);
+        }
+        Json::Value back;
+        EXPECT_EQ(toFile(deep, kFile), levels <= 1000) << levels;
+        EXPECT_TRUE(levels > 1000 || fromFile(back, kFile)) << levels;
+        EXPECT_EQ(fromString(back, toString(deep)), levels <= 1000) << levels;
+    }
+}
+
 TEST_F(JsonFile, InfiniteNumberNeverSpoilsADocument) {
     ASSERT_TRUE(toFile(Document(), kFile));
     for (const double number : {HUGE_VAL, -HUGE_VAL, std::nan("")}) {

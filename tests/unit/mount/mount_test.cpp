@@ -460,7 +460,6 @@ TEST_F(Mount, DoesNotRunTheParentsExitHandlersOrFlushItsFiles) {
     fstat(fileno(file.get()), &info);
     EXPECT_EQ(info.st_size, 4);
     EXPECT_EQ(Seen().mark, 0);
-    open_.insert(fileno(file.get()));
 }
 
 TEST_F(Mount, DoesNotRunTheParentsMainLoop) {
@@ -488,7 +487,6 @@ TEST_F(Mount, WorksWhileAnotherThreadOwnsTheDefaultMainContext) {
     g_main_loop_quit(loop);
     service.join();
     g_main_loop_unref(loop);
-    open_ = mounting::OpenDescriptors();  // the default context keeps its wake-up descriptor
 }
 
 // --- steps that fail --------------------------------------------------------------------------
@@ -588,8 +586,6 @@ TEST_F(Mount, OfDavsWithAnUnreachableHostNeverForksOrLocks) {
     EXPECT_EQ(GetError(), VFS_ERR_HOST_UNREACHABLE);
     EXPECT_EQ(mounting::forks, 0);
     EXPECT_EQ(seams::MicroSleeps().size(), 0U);
-    flock(other.Get(), LOCK_UN);
-    open_.insert(other.Get());
 }
 
 TEST_F(Mount, OfDavsWithForceTakesTheCertificateAndMounts) {

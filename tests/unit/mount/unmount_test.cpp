@@ -1,5 +1,8 @@
 #include <gtest/gtest.h>
+#include <time.h>
 #include <zosplatform/task.h>
+
+#include <algorithm>
 
 #include "support/machine.h"
 #include "support/mount_fixture.h"
@@ -212,12 +215,14 @@ class Transfers : public UnMount {
         EXPECT_NE(ZOS::TaskMgr("amy").createTask(task), nullptr);
         return pid;
     }
-    /** Whether the process was ended by SIGTERM; it is collected then. */
+    /**
+     * Whether the process was sent SIGTERM; it has ended then and is collected. What was not is
+     * ended by a signal of a higher number, which the kernel delivers after one that waits.
+     */
     bool WasEnded(pid_t pid) {
+        kill(pid, SIGPROF);
         int status = 0;
-        if (waitpid(pid, &status, WNOHANG) != pid) {
-            return false;
-        }
+        EXPECT_EQ(waitpid(pid, &status, 0), pid);
         pids_.erase(std::find(pids_.begin(), pids_.end(), pid));
         return WIFSIGNALED(status) && WTERMSIG(status) == SIGTERM;
     }
@@ -229,6 +234,11 @@ TEST_F(Transfers, OfTheConnectionEndAsRootBeforeTheUnmount) {
     const pid_t of_root = Start("scripted://nas");
     const pid_t other = Start("scripted://other");
     Script().on_unmount = [of_root](GMountOperation*) {
+        // It has been sent its end, or this process, which is the user by now, will never see it.
+        for (int i = 0; i < 500 && YLIBCProcAlive(of_root) != 0; ++i) {
+            const timespec pause{0, 10 * 1000 * 1000};
+            nanosleep(&pause, nullptr);
+        }
         scripted::TheSeen().mark = YLIBCProcAlive(of_root) == 0 ? 1 : 2;
     };
     EXPECT_TRUE(session_.UnMount());

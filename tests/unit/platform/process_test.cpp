@@ -1,6 +1,7 @@
 #include <pthread.h>
 #include <sys/mman.h>
 #include <sys/prctl.h>
+#include <sys/syscall.h>
 #include <zosplatform/error.h>
 #include <zosplatform/process.h>
 
@@ -99,8 +100,7 @@ TEST(ProcAlive, AProcessWhoseFirstThreadEndedIs) {
                 }
             },
             tid);
-        pthread_exit(nullptr);
-        return 0;
+        return static_cast<int>(syscall(SYS_exit, 0));  // this thread alone
     });
     while (*static_cast<volatile pid_t*>(tid) == 0) {
         sched_yield();

@@ -6,6 +6,7 @@
 #include "support/catalogue.h"
 #include "support/profiles.h"
 #include "support/seams.h"
+#include "zyrovfs/utils.h"
 
 namespace ZYROVFS::Server {
 namespace {
@@ -191,6 +192,23 @@ TEST_F(BadInput, OptionalTextsOfAnotherTypeAreRefused) {
     }
 }
 
+TEST_F(BadInput, AliasOfASharedLinkIsATextOfAnyLength) {
+    for (const Wrong& wrong : kWrongTexts) {
+        if (std::string(wrong.name) == "a megabyte") {
+            continue;
+        }
+        Json::Value conf = GoodSharing();
+        conf["alias"] = wrong.value;
+        ExpectUseless(conf, std::string("alias as ") + wrong.name);
+    }
+    Json::Value conf = GoodSharing();
+    conf["alias"] = std::string(1 << 20, 'x');
+    std::string id;
+    Json::Value out;
+    ASSERT_TRUE(Add(kUser, VFS_CONFIG_SERVER, id, conf, false, out));
+    EXPECT_EQ(Stored(VFS_CONFIG_SERVER)[id]["alias"], conf["alias"]);
+}
+
 TEST_F(BadInput, KeysThatNobodyKnowsAreDropped) {
     Json::Value conf = GoodProfile();
     for (const Wrong& wrong : kWrongTexts) {
@@ -214,6 +232,16 @@ TEST_F(BadInput, ChangesOfAWrongTypeLeaveTheProfile) {
             if (wrong.value.isNull()) {
                 continue;  // no change at all
             }
+            Json::Value changes;
+            changes[key] = wrong.value;
+            EXPECT_FALSE(Set(kUser, VFS_CONFIG_SERVER, id, changes, false))
+                << key << " as " << wrong.name;
+            EXPECT_EQ(GetError(), VFS_ERR_BAD_PARAM) << key << " as " << wrong.name;
+            EXPECT_EQ(profiles::Text(profiles::File(VFS_CONFIG_SERVER)), before);
+        }
+    }
+    for (const char* key : {"port", "max_connection"}) {
+        for (const Wrong& wrong : kWrongNumbers) {
             Json::Value changes;
             changes[key] = wrong.value;
             EXPECT_FALSE(Set(kUser, VFS_CONFIG_SERVER, id, changes, false))
@@ -268,6 +296,135 @@ TEST_F(BadInput, TruncatedFilesAreReadOrRefusedWhole) {
         if (!readable) {
             EXPECT_EQ(GetError(), VFS_ERR_CONFIG_READ) << size;
         }
+    }
+}
+
+/** Ids that no profile has, and most of which are no URI either. */
+std::vector<std::string> StrangeIds() {
+    return {"",
+            ":",
+            "://",
+            "ftp:",
+            "ftp://",
+            "/",
+            "%",
+            "ftp://%",
+            "ftp://a%00b@%00",
+            "ftp://[::1",
+            "\xff",
+            "ftp://\xff",
+            "ftp://h:99999",
+            "ftp://" + std::string(1 << 20, 'h'),
+            std::string(1 << 20, '/')};
+}
+
+TEST_F(BadInput, StrangeIdsAreNoProfiles) {
+    Json::Value servers;
+    servers["good"] = GoodProfile();
+    Put(VFS_CONFIG_SERVER, servers);
+    Put(VFS_CONFIG_CONNECT, servers);
+    for (const std::string& strange : StrangeIds()) {
+        SCOPED_TRACE(strange.substr(0, 40));
+        const char* text = strange.c_str();
+        Json::Value out;
+        for (const VFS_CONFIG_MODE mode : {VFS_CONFIG_SERVER, VFS_CONFIG_CONNECT}) {
+            EXPECT_FALSE(Get(kUser, mode, text, true, true, out));
+            EXPECT_EQ(GetError(), VFS_ERR_CONFIG_NOT_FOUND);
+            EXPECT_TRUE(Delete(kUser, mode, text));
+            std::string id = strange;
+            EXPECT_FALSE(Set(kUser, mode, id, GoodProfile(), true));
+            EXPECT_EQ(GetError(), VFS_ERR_CONFIG_NOT_FOUND);
+            EXPECT_EQ(id, strange);
+            EXPECT_FALSE(Add(kUser, mode, id, Json::Value(), true, out));
+            EXPECT_EQ(GetError(), strange.empty() ? VFS_ERR_BAD_PARAM : VFS_ERR_FAILED);
+        }
+        EXPECT_FALSE(Connect(kUser, text, true));
+        EXPECT_EQ(GetError(), VFS_ERR_CONFIG_NOT_FOUND);
+        EXPECT_FALSE(Disconnect(kUser, text));
+        EXPECT_EQ(GetError(), VFS_ERR_CONFIG_NOT_FOUND);
+    }
+    EXPECT_EQ(Stored(VFS_CONFIG_SERVER), servers);
+    EXPECT_EQ(Stored(VFS_CONFIG_CONNECT), servers);
+}
+
+TEST_F(BadInput, StrangeUrisLeadNowhere) {
+    for (const std::string& strange : StrangeIds()) {
+        SCOPED_TRACE(strange.substr(0, 40));
+        std::string a;
+        std::string b;
+        std::string c;
+        EXPECT_FALSE(GetUserAndURI(strange.c_str(), a, b));
+        EXPECT_FALSE(Utils::GetPasswordByConfig(strange.c_str(), a));
+        EXPECT_FALSE(Utils::GetFullPathByConfig(strange.c_str(), a));
+        EXPECT_FALSE(Utils::GetFullPathByConfig(strange.c_str(), a, b, c));
+    }
+}
+
+TEST_F(BadInput, NullIdsFailWithoutACrash) {
+    Json::Value out;
+    std::string a;
+    std::string b;
+    std::string c;
+    EXPECT_FALSE(Get(kUser, VFS_CONFIG_SERVER, nullptr, true, true, out));
+    EXPECT_EQ(GetError(), VFS_ERR_BAD_PARAM);
+    EXPECT_FALSE(Delete(kUser, VFS_CONFIG_SERVER, nullptr));
+    EXPECT_EQ(GetError(), VFS_ERR_BAD_PARAM);
+    EXPECT_FALSE(Connect(kUser, nullptr, false));
+    EXPECT_EQ(GetError(), VFS_ERR_CONFIG_NOT_FOUND);
+    EXPECT_FALSE(Disconnect(kUser, nullptr));
+    EXPECT_EQ(GetError(), VFS_ERR_CONFIG_NOT_FOUND);
+    EXPECT_FALSE(GetUserAndURI(nullptr, a, b));
+    EXPECT_FALSE(GetSFTPHost(nullptr, a));
+    EXPECT_FALSE(Utils::GetPasswordByConfig(nullptr, a));
+    EXPECT_FALSE(Utils::GetFullPathByConfig(nullptr, a));
+    EXPECT_FALSE(Utils::GetFullPathByConfig(nullptr, a, b, c));
+    EXPECT_FALSE(Utils::GetFullPath(nullptr, a));
+    EXPECT_FALSE(Utils::GetFullPath(kUser, nullptr, nullptr, nullptr, a, b));
+    char buffer[16];
+    EXPECT_EQ(SzEncrypt(nullptr, buffer, sizeof buffer), 0);
+    EXPECT_EQ(SzEncrypt("text", nullptr, 16), 0);
+    EXPECT_EQ(SzEncrypt("text", buffer, 0), 0);
+    EXPECT_EQ(SzDecrypt(nullptr, buffer, sizeof buffer), 0);
+    EXPECT_EQ(SzDecrypt("text", nullptr, 16), 0);
+    EXPECT_EQ(SzDecrypt("text", buffer, 0), 0);
+}
+
+TEST_F(BadInput, ModesThatDoNotExistFailEveryOperation) {
+    const auto mode = static_cast<VFS_CONFIG_MODE>(7);
+    std::string id;
+    Json::Value out;
+    EXPECT_FALSE(Add(kUser, mode, id, GoodProfile(), false, out));
+    EXPECT_EQ(GetError(), VFS_ERR_CONFIG_FULL) << "what cannot be counted counts as full";
+    EXPECT_FALSE(Get(kUser, mode, kId, true, false, out));
+    EXPECT_EQ(GetError(), VFS_ERR_CONFIG_READ);
+    EXPECT_FALSE(Delete(kUser, mode, kId));
+    EXPECT_EQ(GetError(), VFS_ERR_CONFIG_READ);
+    id = kId;
+    EXPECT_FALSE(Set(kUser, mode, id, GoodProfile(), false));
+    EXPECT_EQ(GetError(), VFS_ERR_CONFIG_NOT_FOUND);
+    EXPECT_FALSE(List(kUser, mode, nullptr, nullptr, true, 0, 0, out));
+    EXPECT_EQ(GetError(), VFS_ERR_CONFIG_READ);
+}
+
+TEST_F(BadInput, ServersAsAnArrayAreRefusedAndStay) {
+    for (const char* text : {R"({"servers":[]})", R"({"servers":["x"]})", R"({"servers":"x"})",
+                             R"({"servers":1})", "[]", "7", "\"x\""}) {
+        SCOPED_TRACE(text);
+        for (const VFS_CONFIG_MODE mode : {VFS_CONFIG_SERVER, VFS_CONFIG_CONNECT}) {
+            profiles::PutText(profiles::File(mode), text);
+        }
+        std::string id;
+        Json::Value out;
+        EXPECT_FALSE(Add(kUser, VFS_CONFIG_SERVER, id, GoodProfile(), false, out));
+        EXPECT_EQ(GetError(), VFS_ERR_CONFIG_READ);
+        EXPECT_FALSE(Get(kUser, VFS_CONFIG_SERVER, kId, true, false, out));
+        EXPECT_EQ(GetError(), VFS_ERR_CONFIG_NOT_FOUND);
+        EXPECT_TRUE(Delete(kUser, VFS_CONFIG_SERVER, kId));
+        EXPECT_FALSE(Connect(kUser, kId, false));
+        EXPECT_EQ(GetError(), VFS_ERR_CONFIG_NOT_FOUND);
+        EXPECT_TRUE(List(kUser, VFS_CONFIG_SERVER, nullptr, nullptr, true, 0, 0, out));
+        EXPECT_EQ(out["total"].asUInt(), 0U);
+        EXPECT_EQ(profiles::Text(profiles::File(VFS_CONFIG_SERVER)), text);
     }
 }
 

@@ -2,6 +2,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <climits>
 
 #include "support/catalogue.h"
@@ -225,6 +226,17 @@ TEST_F(ListTest, EqualEntriesKeepTheFilesOrderAndChangePlacesDownwards) {
     EXPECT_THAT(Ids(), ElementsAre("ftp://0", "ftp://1", "ftp://2", "ftp://3", "ftp://4"));
     ASSERT_TRUE(Run("alias", false));
     EXPECT_THAT(Ids(), ElementsAre("ftp://4", "ftp://3", "ftp://2", "ftp://1", "ftp://0"));
+}
+
+TEST_F(ListTest, SortIsStableForManyEqualEntries) {
+    PutNumbered(90);
+    ASSERT_TRUE(Run());
+    std::vector<std::string> order = Ids();
+    ASSERT_TRUE(Run("alias", true));
+    EXPECT_EQ(Ids(), order);
+    ASSERT_TRUE(Run("alias", false));
+    std::reverse(order.begin(), order.end());
+    EXPECT_EQ(Ids(), order);
 }
 
 struct Page {

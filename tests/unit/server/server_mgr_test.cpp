@@ -6,6 +6,25 @@
 #include "support/fake_server.h"
 #include "support/profiles.h"
 
+namespace {
+
+/** Services asked for, with the number of mounts attempted by then and who asked. */
+struct Start {
+    std::string service;
+    int flag;
+    size_t mounts;
+    uid_t effective_uid;
+};
+std::vector<Start> starts;
+
+}  // namespace
+
+/** In the place of the platform's: no test starts a service of the machine. */
+extern "C" int YLIBServicectlStart(const char* service, int flag) {
+    starts.push_back({service, flag, fake::Calls("Mount").size(), geteuid()});
+    return -1;
+}
+
 namespace ZYROVFS::Server {
 namespace {
 
@@ -196,6 +215,28 @@ TEST_F(ServerMgrTest, MountUnmountAndCleanUpRunAsRootTheRestAsTheCaller) {
                                 call.operation == "DeletePostProcess";
         EXPECT_EQ(call.effective_uid, privileged ? 0 : kUser) << call.operation;
     }
+}
+
+TEST_F(ServerMgrTest, EveryAttemptToMountStartsTheWatchingServiceAsRoot) {
+    ASSERT_TRUE(Load(Conf()));
+    for (const __tag_vfs_err_ outcome : {VFS_ERR_NONE, VFS_ERR_WRONG_PASSWORD}) {
+        fake::Now().calls.clear();
+        starts.clear();
+        fake::Fail("Mount", {outcome});
+        ASSERT_EQ(seteuid(kUser), 0);
+        const bool mounted = mgr_.Mount(kUser, VFS_CONFIG_CONNECT, Conf(), true);
+        ASSERT_EQ(seteuid(0), 0);
+        EXPECT_EQ(mounted, outcome == VFS_ERR_NONE) << "whatever the service says";
+        ASSERT_EQ(starts.size(), 1U);
+        EXPECT_EQ(starts[0].service, "pkg-FileHarbor-zyrovfsd");
+        EXPECT_EQ(starts[0].flag, 0);
+        EXPECT_EQ(starts[0].mounts, 1U) << "after the mount";
+        EXPECT_EQ(starts[0].effective_uid, 0U);
+    }
+    starts.clear();
+    mgr_.Unmount(kUser, VFS_CONFIG_CONNECT);
+    ServerMgr().Mount(kUser, VFS_CONFIG_CONNECT, Conf(), true);
+    EXPECT_TRUE(starts.empty()) << "neither an unmount nor a mount of nothing";
 }
 
 TEST_F(ServerMgrTest, SectionThatCannotBecomeRootStillRunsAndGivesTheResult) {
