@@ -11,6 +11,7 @@
 #include <cmath>
 #include <memory>
 
+#include "core/fd_io.h"
 #include "core/handle.h"
 #include "core/replace_file.h"
 
@@ -58,21 +59,6 @@ bool Parse(const char* begin, const char* end, Json::Value& value) {
     value = Json::Value();
     errno = EINVAL;
     return false;
-}
-
-bool ReadAll(int fd, std::string& text) {
-    char buffer[65536];
-    for (;;) {
-        const ssize_t n = read(fd, buffer, sizeof buffer);
-        if (n == 0) {
-            return true;
-        }
-        if (n > 0) {
-            text.append(buffer, static_cast<size_t>(n));
-        } else if (errno != EINTR) {
-            return false;
-        }
-    }
 }
 
 /** Whether the reader takes back what is written of this value: no infinite number, and no deeper

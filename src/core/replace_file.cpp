@@ -3,21 +3,17 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
-#include <zosplatform/file.h>
 
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <exception>
 
+#include "core/fd_io.h"
 #include "core/handle.h"
 
 namespace ZYROVFS {
 namespace {
-
-bool WriteAll(int fd, const std::string& text) {
-    return ZYROWriteFileFd(fd, text.data(), text.size()) == static_cast<ssize_t>(text.size());
-}
 
 /**
  * By descriptor, and before the file has its name: others may write to the directory, and what

@@ -1,5 +1,4 @@
 #include <fcntl.h>
-#include <glib.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -12,6 +11,7 @@
 #include "core/no_throw.h"
 #include "core/paths.h"
 #include "mount/daemon.h"
+#include "mount/glib_handle.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"
@@ -19,7 +19,6 @@
 namespace ZYROVFS {
 namespace {
 
-using UniqueError = std::unique_ptr<GError, FreeWith<g_error_free>>;
 using UniqueStrv = std::unique_ptr<char*, FreeWith<g_strfreev>>;
 using UniqueChannel = std::unique_ptr<GIOChannel, FreeWith<g_io_channel_unref>>;
 

@@ -1,5 +1,4 @@
 #include <fcntl.h>
-#include <gio/gio.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -8,6 +7,7 @@
 
 #include "core/handle.h"
 #include "core/log.h"
+#include "mount/glib_handle.h"
 #include "mount/mkdir.h"
 #include "zyrovfs/utils.h"
 
@@ -50,9 +50,6 @@ UniqueFile OpenRegular(const char* path) {
     }
     return stream;
 }
-
-template <typename T>
-using UniqueObject = std::unique_ptr<T, FreeWith<g_object_unref>>;
 
 UniqueObject<GFileInfo> Query(GFile* file, const char* path, const char* attributes) {
     GError* error = nullptr;

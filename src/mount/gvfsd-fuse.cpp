@@ -1,5 +1,4 @@
 #include <fcntl.h>
-#include <glib.h>
 #include <sys/statfs.h>
 #include <unistd.h>
 #include <zosplatform/process.h>
@@ -10,20 +9,20 @@
 #include <cstdlib>
 
 #include "core/error_cell.h"
+#include "core/fd_io.h"
 #include "core/handle.h"
 #include "core/log.h"
 #include "core/no_throw.h"
 #include "core/paths.h"
 #include "mount/daemon.h"
 #include "mount/fork_as_user.h"
+#include "mount/glib_handle.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"
 
 namespace ZYROVFS {
 namespace {
-
-using UniqueError = std::unique_ptr<GError, FreeWith<g_error_free>>;
 
 /** How a launch ended; travels as the helper's exit status. */
 enum LaunchResult { kLaunched = 0, kLaunchFailed = 1, kStaleMountPoint = 2 };
@@ -93,7 +92,8 @@ int LaunchAsUser(uid_t uid) {
     return result;
 }
 
-[[noreturn]] void RunHelper(int report, uid_t uid) {
+/** An exception that left the child would go on with the caller's work in it. */
+[[noreturn]] void RunHelper(int report, uid_t uid) noexcept {
     dup2(report, STDOUT_FILENO);
     // The fuse daemon outlives the caller and its terminal.
     setsid();
@@ -102,19 +102,6 @@ int LaunchAsUser(uid_t uid) {
         LOG_ERROR("Failed to run gvfsd-fuse, uid=%u, %d", uid, result);
     }
     _exit(result);
-}
-
-std::string ReadToEnd(int fd) {
-    std::string text;
-    char buffer[128];
-    for (;;) {
-        const ssize_t n = read(fd, buffer, sizeof buffer - 1);
-        if (n > 0) {
-            text.append(buffer, static_cast<size_t>(n));
-        } else if (n == 0 || errno != EINTR) {
-            return text;
-        }
-    }
 }
 
 int RunFuse(uid_t uid, int& pid) {
@@ -135,7 +122,8 @@ int RunFuse(uid_t uid, int& pid) {
         return kLaunchFailed;
     }
     report.Reset();
-    const std::string text = ReadToEnd(answer.Get());
+    std::string text;
+    ReadAll(answer.Get(), text);
     const int result = WaitForChild(helper).Result();
     const long long number = strtoll(text.c_str(), nullptr, 10);
     pid = number > 0 && number <= INT_MAX ? static_cast<int>(number) : 0;
@@ -147,7 +135,7 @@ int RunFuse(uid_t uid, int& pid) {
     return result;
 }
 
-[[noreturn]] void UnmountAsRoot(const std::string& path) {
+[[noreturn]] void UnmountAsRoot(const std::string& path) noexcept {
     if (!BecomeRootForGood()) {
         _exit(1);
     }

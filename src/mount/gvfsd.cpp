@@ -1,17 +1,14 @@
-#include <glib.h>
 #include <unistd.h>
 
-#include "core/handle.h"
 #include "core/log.h"
 #include "core/no_throw.h"
 #include "core/paths.h"
 #include "mount/daemon.h"
+#include "mount/glib_handle.h"
 #include "zyrovfs/vfs.h"
 
 namespace ZYROVFS {
 namespace {
-
-using UniqueError = std::unique_ptr<GError, FreeWith<g_error_free>>;
 
 void SetUpGvfsd(gpointer data) {
     PointStdioAtNull();

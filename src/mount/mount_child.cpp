@@ -1,28 +1,23 @@
 #include "mount/mount_child.h"
 
-#include <libsoup/soup.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <clocale>
 #include <csignal>
-#include <memory>
 #include <new>
 
 #include "core/error_cell.h"
-#include "core/handle.h"
 #include "core/json.h"
 #include "core/log.h"
 #include "mount/fork_as_user.h"
+#include "mount/glib_handle.h"
 #include "mount/vfs_question.h"
 #include "mount/vfs_result.h"
 #include "zyrovfs/utils.h"
 
 namespace ZYROVFS {
 namespace {
-
-using UniqueSoupUri = std::unique_ptr<SoupURI, FreeWith<soup_uri_free>>;
-using UniqueGText = std::unique_ptr<char, FreeWith<g_free>>;
 
 /**
  * The loop's context is the child's own. The default one may belong to another thread of the
@@ -37,25 +32,21 @@ GMainLoop* NewLoop() {
 }
 
 void MountLocation(VFS& session) {
-    std::unique_ptr<VFSMountOperaion> mount(new (std::nothrow) VFSMountOperaion);
+    const std::unique_ptr<VFSMountOperaion> mount = NewMountOperaion(session);
     if (mount == nullptr) {
-        LOG_ERROR("No memory");
-        return FailIfNoneSet();
+        return;
     }
-    setlocale(LC_ALL, "");
-    mount->session = &session;
     GFile* file =
         NewLocation(session.GetFullURI(), session.GetUser(), "", VFS_ERR_HOST_UNREACHABLE);
     if (file == nullptr) {
         return;
     }
-    GMountOperation* operation = NewOperation(*mount, file);
-    g_signal_connect(operation, "ask-question", G_CALLBACK(AskQuestion), mount.get());
+    const UniqueObject<GMountOperation> operation = NewOperation(*mount, file);
+    g_signal_connect(operation.get(), "ask-question", G_CALLBACK(AskQuestion), mount.get());
     SetErr(VFS_ERR_NONE);
-    g_file_mount_enclosing_volume(file, G_MOUNT_MOUNT_NONE, operation, nullptr, MountFinished,
+    g_file_mount_enclosing_volume(file, G_MOUNT_MOUNT_NONE, operation.get(), nullptr, MountFinished,
                                   mount.get());
     g_main_loop_run(mount->loop);
-    g_object_unref(operation);
 }
 
 /** The identity that a user has to confirm, or the place of the mount inside the location. */
@@ -84,6 +75,18 @@ void FailIfNoneSet(SourceLine at) {
     }
 }
 
+std::unique_ptr<VFSMountOperaion> NewMountOperaion(VFS& session, SourceLine at) {
+    std::unique_ptr<VFSMountOperaion> mount(new (std::nothrow) VFSMountOperaion);
+    if (mount == nullptr) {
+        LOG_ERROR_AT(at, "No memory");
+        FailIfNoneSet(at);
+        return nullptr;
+    }
+    setlocale(LC_ALL, "");
+    mount->session = &session;
+    return mount;
+}
+
 GFile* NewLocation(const std::string& uri, const std::string& user, const std::string& path,
                    __tag_vfs_err_ bad_uri, SourceLine at) {
     const UniqueSoupUri parsed(soup_uri_new(uri.c_str()));
@@ -108,11 +111,11 @@ GFile* NewLocation(const std::string& uri, const std::string& user, const std::s
     return file;
 }
 
-GMountOperation* NewOperation(VFSMountOperaion& mount, GFile* file) {
+UniqueObject<GMountOperation> NewOperation(VFSMountOperaion& mount, GFile* file) {
     mount.file = file;
     mount.loop = NewLoop();
-    GMountOperation* operation = g_mount_operation_new();
-    g_signal_connect(operation, "ask-password", G_CALLBACK(AskPassword), &mount);
+    UniqueObject<GMountOperation> operation(g_mount_operation_new());
+    g_signal_connect(operation.get(), "ask-password", G_CALLBACK(AskPassword), &mount);
     return operation;
 }
 

@@ -7,9 +7,11 @@
 
 #include <sys/types.h>
 
+#include <memory>
 #include <string>
 
 #include "core/source_line.h"
+#include "mount/glib_handle.h"
 #include "mount/vfs_private.h"
 #include "zyrovfs/error.h"
 
@@ -25,6 +27,13 @@ namespace ZYROVFS {
 [[noreturn]] void RunUnmountChild(VFS& session, uid_t actor) noexcept;
 
 /**
+ * What the callbacks will work on, in the locale of the environment; null, with the failure logged
+ * in the name of `at` and a code set, when memory is short.
+ */
+std::unique_ptr<VFSMountOperaion> NewMountOperaion(VFS& session,
+                                                   SourceLine at = SourceLine::Here());
+
+/**
  * The location of `uri` with `user` (and `path`, unless empty) put in, as GIO takes it. Null after
  * setting `bad_uri` for a URI that cannot be parsed, or VFS_ERR_INVALID_SERVER.
  */
@@ -35,7 +44,7 @@ GFile* NewLocation(const std::string& uri, const std::string& user, const std::s
  * Readies `mount` for an asynchronous call on `file`, of which it becomes the owner: gives it a
  * loop and hands out the operation that asks the session for passwords.
  */
-GMountOperation* NewOperation(VFSMountOperaion& mount, GFile* file);
+UniqueObject<GMountOperation> NewOperation(VFSMountOperaion& mount, GFile* file);
 
 /** A step that failed without a word must not end as success. */
 void FailIfNoneSet(SourceLine at = SourceLine::Here());

@@ -1,26 +1,20 @@
-#include <libsoup/soup.h>
-
-#include <memory>
 #include <string>
 
-#include "core/handle.h"
 #include "core/log.h"
+#include "mount/glib_handle.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
 
 namespace ZYROVFS {
 namespace {
 
-using UniqueUri = std::unique_ptr<SoupURI, FreeWith<soup_uri_free>>;
-using UniqueText = std::unique_ptr<char, FreeWith<g_free>>;
-
 /** Null, with the failure logged in the name of `at`, for what is no URI. */
-UniqueUri Parse(const char* text, SourceLine at = SourceLine::Here()) {
+UniqueSoupUri Parse(const char* text, SourceLine at = SourceLine::Here()) {
     if (text == nullptr) {
         LOG_ERROR_AT(at, "Wrong parameters");
         return nullptr;
     }
-    UniqueUri uri(soup_uri_new(text));
+    UniqueSoupUri uri(soup_uri_new(text));
     if (uri == nullptr || uri->scheme == nullptr) {
         LOG_ERROR_AT(at, "Wrong uri, %s", text);
         return nullptr;
@@ -29,18 +23,18 @@ UniqueUri Parse(const char* text, SourceLine at = SourceLine::Here()) {
 }
 
 /** Null for a part that the URI does not have. */
-UniqueText DecodePart(const char* part) {
-    return UniqueText(part == nullptr ? nullptr : soup_uri_decode(part));
+UniqueGText DecodePart(const char* part) {
+    return UniqueGText(part == nullptr ? nullptr : soup_uri_decode(part));
 }
 
 /** The server that a URI names, as text: scheme, host, port, and the user when asked for. */
 bool PrintServer(const char* text, bool with_user, std::string& base,
                  SourceLine at = SourceLine::Here()) {
-    const UniqueUri uri = Parse(text, at);
+    const UniqueSoupUri uri = Parse(text, at);
     if (uri == nullptr) {
         return false;
     }
-    const UniqueUri server(soup_uri_new(nullptr));
+    const UniqueSoupUri server(soup_uri_new(nullptr));
     if (server == nullptr) {
         LOG_ERROR_AT(at, "Can't new uri, %s", text);
         return false;
@@ -52,18 +46,18 @@ bool PrintServer(const char* text, bool with_user, std::string& base,
         soup_uri_set_user(server.get(), DecodePart(uri->user).get());
     }
     soup_uri_set_path(server.get(), "");
-    base = Utils::DecodeURI(UniqueText(soup_uri_to_string(server.get(), FALSE)).get());
+    base = Utils::DecodeURI(UniqueGText(soup_uri_to_string(server.get(), FALSE)).get());
     return true;
 }
 
 /** Decoded host of a URI that has one. */
 bool HostOf(const char* text, std::string& host, unsigned& port,
             SourceLine at = SourceLine::Here()) {
-    const UniqueUri uri = Parse(text, at);
+    const UniqueSoupUri uri = Parse(text, at);
     if (uri == nullptr) {
         return false;
     }
-    const UniqueText decoded = DecodePart(uri->host);
+    const UniqueGText decoded = DecodePart(uri->host);
     if (decoded == nullptr) {
         LOG_ERROR_AT(at, "Wrong uri, %s", text);
         return false;
@@ -78,7 +72,7 @@ bool HostOf(const char* text, std::string& host, unsigned& port,
 namespace Utils {
 
 std::string DecodeURI(const char* text) {
-    const UniqueText decoded = DecodePart(text);
+    const UniqueGText decoded = DecodePart(text);
     std::string result = decoded == nullptr ? "" : decoded.get();
     if (result.size() > 2 && result.back() == '/') {
         result.pop_back();
@@ -103,7 +97,7 @@ bool GetBaseURI(const char* uri, std::string& base, bool withUser) {
 }
 
 bool GetProtocol(const char* uri, std::string& out) {
-    const UniqueUri parsed = Parse(uri);
+    const UniqueSoupUri parsed = Parse(uri);
     if (parsed == nullptr) {
         return false;
     }

@@ -1,10 +1,8 @@
 #include <unistd.h>
 #include <zosplatform/process.h>
 
-#include <clocale>
 #include <cstdlib>
 #include <memory>
-#include <new>
 #include <string>
 
 #include "core/error_cell.h"
@@ -12,6 +10,7 @@
 #include "core/log.h"
 #include "core/no_throw.h"
 #include "mount/fork_as_user.h"
+#include "mount/glib_handle.h"
 #include "mount/mount_child.h"
 #include "mount/vfs_result.h"
 #include "zyrovfs/global.h"
@@ -19,8 +18,6 @@
 
 namespace ZYROVFS {
 namespace {
-
-using UniqueError = std::unique_ptr<GError, FreeWith<g_error_free>>;
 
 /** Transfers of the connection keep its mount busy. They may run under any identity of the user. */
 void KillTransfers(const std::string& uri) {
@@ -49,9 +46,9 @@ GFile* MountedLocation(const VFS& session) {
 }
 
 /** Null for a location that is not mounted, which is what an unmount wants. */
-GMount* FindMount(GFile* file, const std::string& uri) {
+UniqueObject<GMount> FindMount(GFile* file, const std::string& uri) {
     GError* raw = nullptr;
-    GMount* found = g_file_find_enclosing_mount(file, nullptr, &raw);
+    UniqueObject<GMount> found(g_file_find_enclosing_mount(file, nullptr, &raw));
     const UniqueError error(raw);
     if (found == nullptr) {
         LOG_ERROR("Unable to unmount location uri %s, [%d], %s", uri.c_str(),
@@ -63,27 +60,22 @@ GMount* FindMount(GFile* file, const std::string& uri) {
 }
 
 void UnmountLocation(VFS& session) {
-    std::unique_ptr<VFSMountOperaion> mount(new (std::nothrow) VFSMountOperaion);
+    const std::unique_ptr<VFSMountOperaion> mount = NewMountOperaion(session);
     if (mount == nullptr) {
-        LOG_ERROR("No memory");
-        return FailIfNoneSet();
+        return;
     }
-    setlocale(LC_ALL, "");
-    mount->session = &session;
     GFile* file = MountedLocation(session);
     if (file == nullptr) {
         return;
     }
-    GMountOperation* operation = NewOperation(*mount, file);
-    if (GMount* found = FindMount(file, session.GetURI())) {
+    const UniqueObject<GMountOperation> operation = NewOperation(*mount, file);
+    if (const UniqueObject<GMount> found = FindMount(file, session.GetURI())) {
         // A refused unmount sets no code and so counts as done, whatever the cell held before.
         SetErr(VFS_ERR_NONE);
-        g_mount_unmount_with_operation(found, G_MOUNT_UNMOUNT_NONE, operation, nullptr,
+        g_mount_unmount_with_operation(found.get(), G_MOUNT_UNMOUNT_NONE, operation.get(), nullptr,
                                        UnmountFinished, mount.get());
         g_main_loop_run(mount->loop);
-        g_object_unref(found);
     }
-    g_object_unref(operation);
 }
 
 bool UnmountLocked(VFS& session) {

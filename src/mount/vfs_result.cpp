@@ -1,18 +1,15 @@
 #include "mount/vfs_result.h"
 
 #include <cstring>
-#include <memory>
 #include <string>
 
 #include "core/error_cell.h"
-#include "core/handle.h"
 #include "core/log.h"
+#include "mount/glib_handle.h"
 #include "mount/vfs_private.h"
 
 namespace ZYROVFS {
 namespace {
-
-using UniqueError = std::unique_ptr<GError, FreeWith<g_error_free>>;
 
 struct GioCode {
     int gio;

@@ -1,7 +1,6 @@
 #include <fcntl.h>
 #include <gio/gio.h>
 #include <unistd.h>
-#include <zosplatform/file.h>
 
 #include <cerrno>
 #include <cstring>
@@ -110,9 +109,7 @@ int AskGioApart(const char* uri, std::string& full) {
     UniqueFd out(ends[1]);
     const pid_t child = fork();
     if (child == 0) {
-        NoThrow(VFS_ERR_FAILED, [&] {
-            return AskGio(uri, full) && ZYROWriteFileFd(out.Get(), full.data(), full.size()) >= 0;
-        });
+        NoThrow(VFS_ERR_FAILED, [&] { return AskGio(uri, full) && WriteAll(out.Get(), full); });
         _exit(0);
     }
     out.Reset();
@@ -148,7 +145,7 @@ int AskGioApart(const char* uri, std::string& full) {
             return false;
         }
         const std::string answer = remote.empty() ? full : full + "\n" + remote;
-        return ZYROWriteFileFd(STDOUT_FILENO, answer.data(), answer.size()) >= 0;
+        return WriteAll(STDOUT_FILENO, answer);
     });
     _exit(0);
 }

@@ -1,6 +1,5 @@
-// What goes wrong around a connection, through the shipped library and against real servers:
-// hosts that are not there or say nothing, children that are killed, certificates that nobody
-// vouches for. Each program of a caller is a process of its own here, too.
+// What goes wrong around a connection, through the shipped library and against real servers: hosts
+// that are silent or not there, killed children, certificates that nobody vouches for.
 #include <gtest/gtest.h>
 #include <netinet/in.h>
 #include <signal.h>
@@ -324,7 +323,6 @@ class Certificates : public testing::Test {
 };
 
 int forks_seen = 0;
-
 /** Mounts without a chain: the code, +100 when there was a fork, +200 without the detail. */
 int MountDavs(const std::string& subject, const std::string& issuer) {
     signal(SIGCHLD, [](int) { ++forks_seen; });

@@ -2,7 +2,6 @@
 #ifndef ZYROVFS_TESTS_CATALOGUE_TEST_H
 #define ZYROVFS_TESTS_CATALOGUE_TEST_H
 
-#include <dlfcn.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -13,14 +12,10 @@
 #include "support/catalogue.h"
 #include "support/profiles.h"
 #include "support/seams.h"
-#include "zosplatform/text.h"
 #include "zyrovfs/error.h"
 #include "zyrovfs/protocol.h"
 
 namespace catalogue {
-
-inline bool out_of_lists = false;
-inline bool out_of_hashes = false;
 
 inline std::string Path(const std::string& file) {
     return std::string(ZYROVFS::paths::kCatalogueDir) + "/" + file;
@@ -38,15 +33,13 @@ inline void AsUser(const std::function<void()>& body) {
     ASSERT_EQ(setresuid(-1, 0, -1), 0);
 }
 
-/** An empty catalogue, and memory enough. */
+/** An empty catalogue. */
 class CatalogueTest : public profiles::ProfileTest {
   protected:
     void SetUp() override {
         ProfileTest::SetUp();
         seams::Reset();
         Clear();
-        out_of_lists = false;
-        out_of_hashes = false;
     }
     void TearDown() override { Clear(); }
 };
@@ -70,17 +63,5 @@ inline std::vector<std::pair<std::string, std::string>> DamagedTexts() {
 }
 
 }  // namespace catalogue
-
-/** In the place of the platform's, so that a test can run out of memory. */
-extern "C" inline __attribute__((used)) PYLIBCSZLIST YLIBCSzListAlloc(int size) {
-    static const auto real =
-        reinterpret_cast<PYLIBCSZLIST (*)(int)>(dlsym(RTLD_NEXT, "YLIBCSzListAlloc"));
-    return catalogue::out_of_lists ? nullptr : real(size);
-}
-extern "C" inline __attribute__((used)) PYLIBCSZHASH YLIBCSzHashAlloc(int size) {
-    static const auto real =
-        reinterpret_cast<PYLIBCSZHASH (*)(int)>(dlsym(RTLD_NEXT, "YLIBCSzHashAlloc"));
-    return catalogue::out_of_hashes ? nullptr : real(size);
-}
 
 #endif

@@ -53,6 +53,24 @@ TEST(InitEnv, RootGetsTheDirectoryOfTheNewUser) {
     EXPECT_STREQ(getenv("DBUS_SESSION_BUS_ADDRESS"), "unix:path=/bus");
 }
 
+TEST(InitEnv, ThatSucceedsLeavesAnOldCodeInTheCell) {
+    VFSSetErrEx(VFS_ERR_BUSY, "unit.cpp", 3);
+    EXPECT_TRUE(InitEnv("1234", "unix:path=/bus"));
+    EXPECT_EQ(GetError(), VFS_ERR_BUSY);
+    EXPECT_STREQ(GetErrorFile(), "unit.cpp");
+    EXPECT_EQ(GetErrorLine(), 3);
+    ResetError();
+}
+
+TEST(InitEnv, OfAnotherUserThanRootGetsHisOwnDirectoryWhateverTheText) {
+    ASSERT_EQ(seteuid(1000), 0);
+    const bool ready = InitEnv("1234", "unix:path=/bus");
+    ASSERT_EQ(seteuid(0), 0);
+    EXPECT_TRUE(ready);
+    EXPECT_STREQ(getenv("ZYROVFS_UID"), "1234");
+    EXPECT_STREQ(getenv("XDG_RUNTIME_DIR"), "/var/tmp/user/1000");
+}
+
 TEST(ActorUID, IsTheUserWhomRootActsFor) {
     setenv("ZYROVFS_UID", "4321", 1);
     EXPECT_EQ(GetActorUID(), 4321U);

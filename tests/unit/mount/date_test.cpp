@@ -93,6 +93,15 @@ INSTANTIATE_TEST_SUITE_P(
         "2010-01-32T00:00:00Z", "2010-01-01T24:00:00Z", "2010-01-01T00:60:00Z",
         "2010-01-01T00:00:62Z", "\xff\xfe\x01"));
 
+TEST(ParseRFC3339ToTime, SevenFractionDigitsAreRefusedAndSixAreNot) {
+    timeval time{};
+    EXPECT_TRUE(ParseRFC3339ToTime("2010-08-21T22:31:20.123456Z", time));
+    EXPECT_EQ(time.tv_usec, 123456);
+    EXPECT_FALSE(ParseRFC3339ToTime("2010-08-21T22:31:20.1234567Z", time));
+    EXPECT_FALSE(ParseRFC3339ToTime("2010-08-21T22:31:20.0000000Z", time));
+    EXPECT_EQ(time.tv_usec, 123456);
+}
+
 TEST(ParseRFC3339ToTime, HugeTextIsRefused) {
     timeval time{};
     EXPECT_FALSE(ParseRFC3339ToTime(std::string(1 << 20, '9'), time));

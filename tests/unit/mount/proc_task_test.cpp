@@ -1,4 +1,3 @@
-#include <dlfcn.h>
 #include <gmock/gmock.h>
 #include <signal.h>
 #include <sys/prctl.h>
@@ -13,6 +12,7 @@
 #include <functional>
 #include <string>
 
+#include "support/kill_seam.h"
 #include "support/other_process.h"
 #include "support/seams.h"
 #include "zyrovfs/error.h"
@@ -20,28 +20,16 @@
 
 namespace {
 
-/** In place of the system's answer, if set. */
-std::function<int(pid_t, int)> instead_of_kill;
 bool no_records = false;
 
-template <typename Function>
-Function* Real(const char* name) {
-    return reinterpret_cast<Function*>(dlsym(RTLD_NEXT, name));
-}
-
 }  // namespace
-
-extern "C" int kill(pid_t pid, int signal) noexcept {
-    return instead_of_kill ? instead_of_kill(pid, signal)
-                           : Real<int(pid_t, int)>("kill")(pid, signal);
-}
 
 extern "C" PYLIBCPROC YLIBCProcGetByPid(pid_t pid) {
     if (no_records) {
         YLIBCErrSetEx(0x600, "process.cpp", 9);
         return nullptr;
     }
-    return Real<PYLIBCPROC(pid_t)>("YLIBCProcGetByPid")(pid);
+    return kill_seam::Real<PYLIBCPROC(pid_t)>("YLIBCProcGetByPid")(pid);
 }
 
 namespace ZYROVFS::Utils {
@@ -81,7 +69,7 @@ class Tasks : public testing::Test {
         VFSSetErrEx(VFS_ERR_NONE, nullptr, 0);
     }
     void TearDown() override {
-        instead_of_kill = nullptr;
+        kill_seam::instead = nullptr;
         no_records = false;
     }
 };
@@ -181,7 +169,7 @@ TEST_F(KillProcByUsernameTest, EachProcessIsWaitedForThreeSecondsAfterAllWereTol
 TEST_F(KillProcByUsernameTest, FailedKillIsLoggedNotWaitedForAndStillSuccess) {
     OtherProcess mover(BecomeMover);
     Register(Properties(mover.pid()));
-    instead_of_kill = [](pid_t, int) {
+    kill_seam::instead = [](pid_t, int) {
         errno = EPERM;
         return -1;
     };
@@ -190,11 +178,11 @@ TEST_F(KillProcByUsernameTest, FailedKillIsLoggedNotWaitedForAndStillSuccess) {
                               "), error=Operation not permitted(1)"))
         << seams::LogDump();
     EXPECT_THAT(seams::MicroSleeps(), testing::IsEmpty());
-    instead_of_kill = nullptr;
+    kill_seam::instead = nullptr;
 }
 
 TEST_F(KillProcByUsernameTest, PropertiesOfTheWrongTypeEndNothing) {
-    instead_of_kill = [](pid_t pid, int) {
+    kill_seam::instead = [](pid_t pid, int) {
         ADD_FAILURE() << "a signal for " << pid;
         return 0;
     };
@@ -222,7 +210,7 @@ TEST_F(KillProcByUsernameTest, PropertiesOfTheWrongTypeEndNothing) {
         Register(properties);
     }
     EXPECT_TRUE(KillProcByUsername(kUri, kUser));
-    instead_of_kill = nullptr;
+    kill_seam::instead = nullptr;
 }
 
 TEST_F(KillProcByUsernameTest, ATaskThatCannotBeReadIsPassedOver) {

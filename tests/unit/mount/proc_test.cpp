@@ -1,4 +1,3 @@
-#include <dlfcn.h>
 #include <gmock/gmock.h>
 #include <signal.h>
 #include <sys/prctl.h>
@@ -11,30 +10,20 @@
 #include <functional>
 #include <string>
 
+#include "support/kill_seam.h"
 #include "support/other_process.h"
 #include "support/seams.h"
 #include "zyrovfs/utils.h"
 
 namespace {
 
-/** In place of the system call, if set. */
-std::function<int(pid_t, int)> instead_of_kill;
 std::function<int(pid_t)> instead_of_alive;
-
-template <typename Function>
-Function* Real(const char* name) {
-    return reinterpret_cast<Function*>(dlsym(RTLD_NEXT, name));
-}
 
 }  // namespace
 
-extern "C" int kill(pid_t pid, int signal) noexcept {
-    return instead_of_kill ? instead_of_kill(pid, signal)
-                           : Real<int(pid_t, int)>("kill")(pid, signal);
-}
-
 extern "C" int YLIBCProcAlive(pid_t pid) {
-    return instead_of_alive ? instead_of_alive(pid) : Real<int(pid_t)>("YLIBCProcAlive")(pid);
+    return instead_of_alive ? instead_of_alive(pid)
+                            : kill_seam::Real<int(pid_t)>("YLIBCProcAlive")(pid);
 }
 
 namespace ZYROVFS::Utils {
@@ -58,7 +47,7 @@ bool BecomeDaemonThatWillNotEnd() {
 class Processes : public testing::Test {
   protected:
     void TearDown() override {
-        instead_of_kill = nullptr;
+        kill_seam::instead = nullptr;
         instead_of_alive = nullptr;
     }
 };
@@ -117,7 +106,7 @@ TEST_F(KillProcTest, PidReusedByAnotherNameOrOwnerIsNotTouchedAndCountsAsKilled)
 }
 
 TEST_F(KillProcTest, ProcessesThatDoNotExistCountAsKilled) {
-    instead_of_kill = [](pid_t pid, int) {
+    kill_seam::instead = [](pid_t pid, int) {
         ADD_FAILURE() << "a signal for " << pid;
         return 0;
     };
@@ -149,7 +138,7 @@ TEST_F(KillProcTest, WaitEndsAfterThirtySecondsAndTheResultIsTrueAllTheSame) {
 TEST_F(KillProcTest, CallerWhoMayNotIsToldAndLogged) {
     OtherProcess daemon(BecomeDaemon);
     ASSERT_TRUE(daemon.ok());
-    instead_of_kill = [](pid_t, int) {
+    kill_seam::instead = [](pid_t, int) {
         errno = EPERM;
         return -1;
     };
@@ -158,19 +147,19 @@ TEST_F(KillProcTest, CallerWhoMayNotIsToldAndLogged) {
                                   ", reason=Operation not permitted(1)"))
         << seams::LogDump();
     EXPECT_THAT(seams::MicroSleeps(), testing::IsEmpty());
-    instead_of_kill = nullptr;
+    kill_seam::instead = nullptr;
 }
 
 TEST_F(KillProcTest, ProcessThatWentMeanwhileGivesFalseWithoutALogLine) {
     OtherProcess daemon(BecomeDaemon);
     ASSERT_TRUE(daemon.ok());
-    instead_of_kill = [](pid_t, int) {
+    kill_seam::instead = [](pid_t, int) {
         errno = ESRCH;
         return -1;
     };
     EXPECT_FALSE(KillProc(daemon.pid(), kName, kAmy, true));
     EXPECT_THAT(seams::LogLines(), testing::IsEmpty());
-    instead_of_kill = nullptr;
+    kill_seam::instead = nullptr;
 }
 
 }  // namespace

@@ -133,12 +133,33 @@ TEST_F(SslPeer, AReadOnlyFolderFailsWithTheStepThatCouldNotBeDone) {
 
 // --- the folder -------------------------------------------------------------------------------
 
-TEST_F(SslPeer, WithoutTheUsersFolderTheOneForCertificatesIsNotMade) {
+TEST_F(SslPeer, AUserWithoutAnyFolderGetsBothOnTheFirstQuestion) {
+    const tls::TlsServer server(signed_);
     fs::remove_all(parent_);
-    const Answer answer = Ask("davs://localhost:1/");
+    const Answer answer = Ask(Davs(server));
+    EXPECT_TRUE(answer.ok) << answer;
+    struct stat above {};
+    struct stat info {};
+    ASSERT_EQ(stat(parent_.c_str(), &above), 0);
+    ASSERT_EQ(stat(folder_.c_str(), &info), 0);
+    EXPECT_EQ(above.st_mode & 07777, 0777U);
+    EXPECT_EQ(info.st_mode & 07777, 0700U);
+    EXPECT_EQ(info.st_uid, kAmy);
+    EXPECT_EQ(info.st_gid, 0U);
+    EXPECT_EQ(Target(File(server)), paths::kCaBundle);
+}
+
+TEST_F(SslPeer, AFolderThatCannotBeMadeFailsBeforeAnyoneIsAsked) {
+    const tls::TlsServer server(signed_);
+    fs::remove_all(parent_);
+    const Answer answer = fresh::Ask([&] {
+        return setgroups(0, nullptr) == 0 && setgid(100) == 0 && setuid(kAmy) == 0 &&
+               Utils::SSLVerifyPeer(nullptr, nullptr, Davs(server).c_str(), false);
+    });
     EXPECT_EQ(answer.code, VFS_ERR_FAILED) << answer;
     EXPECT_TRUE(answer.Logged("Failed to create ssl folder " + folder_)) << answer;
     EXPECT_FALSE(fs::exists(parent_));
+    EXPECT_TRUE(server.Requests().empty());
 }
 
 TEST_F(SslPeer, AFolderThatCannotBeGivenAwayIsTakenBack) {
