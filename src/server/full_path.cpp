@@ -6,6 +6,7 @@
 #include <cstring>
 #include <memory>
 
+#include "core/fd_io.h"
 #include "core/handle.h"
 #include "core/identity.h"
 #include "core/log.h"
