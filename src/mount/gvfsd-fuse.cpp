@@ -127,8 +127,12 @@ int RunFuse(uid_t uid, int& pid) {
     const int result = WaitForChild(helper).Result();
     const long long number = strtoll(text.c_str(), nullptr, 10);
     pid = number > 0 && number <= INT_MAX ? static_cast<int>(number) : 0;
-    // A helper that somebody else collected has said by the pid whether it did its work.
-    return result == kLaunched && pid == 0 ? static_cast<int>(kLaunchFailed) : result;
+    // Where children are collected unseen, the status is lost: without a pid the launch has failed,
+    // and the mount point tells whether it can be repaired.
+    if (result == kLaunched && pid == 0) {
+        return CanAccess(paths::FuseTree(uid)) ? kLaunchFailed : kStaleMountPoint;
+    }
+    return result;
 }
 
 [[noreturn]] void UnmountAsRoot(const std::string& path) noexcept {

@@ -1,6 +1,6 @@
 /**
  * Programs put in the place of a user's daemons on the private host. Each writes down how it was
- * started, into a folder of the running test, and then does as the test says.
+ * started, into /tmp/fakes, and then does as the test says.
  */
 #ifndef ZYROVFS_TESTS_FAKE_DAEMONS_H
 #define ZYROVFS_TESTS_FAKE_DAEMONS_H
@@ -34,16 +34,8 @@ namespace fakes {
 namespace paths = ZYROVFS::paths;
 
 constexpr unsigned kUser = 4001;
-constexpr const char* kAddress = "unix:path=/tmp/bus,guid=0123";
-
-/** Each test has a folder of its own: a daemon of the last test may still be writing to its. */
-inline int& TestNumber() {
-    static int number = 0;
-    return number;
-}
-inline std::string Reports() {
-    return "/tmp/fakes-" + std::to_string(TestNumber());
-}
+constexpr const char* kReports = "/tmp/fakes";
+constexpr const char* kAddress = "unix:path=/tmp/fakes/bus,guid=0123";
 
 inline std::string Read(const std::string& path) {
     std::ifstream file(path);
@@ -74,13 +66,13 @@ inline bool Eventually(const std::function<bool()>& condition) {
 /** Puts a script in the place of a program. */
 inline void Install(const std::string& program, const std::string& script) {
     std::filesystem::remove(program);
-    Write(program, "#!/bin/bash\nreports=" + Reports() + "\n" + script);
+    Write(program, "#!/bin/bash\n" + script);
     chmod(program.c_str(), 0755);
 }
 
 /** How a daemon was started; written before the rest of its script runs. */
 constexpr const char* kReport = R"(
-report=$reports/$(basename "$0")
+report=/tmp/fakes/$(basename "$0")
 ls -l /proc/$$/fd >"$report.fds"
 tr '\0' '\n' </proc/$$/environ >"$report.env"
 echo $$ >>"$report.pids"
@@ -108,7 +100,7 @@ inline void InstallAll() {
 
 /** What a fake daemon wrote down: "", "env", "fds" or "pids". Empty when it was not started. */
 inline std::string Report(const std::string& name, const std::string& what = "") {
-    const std::string path = Reports() + "/" + name;
+    const std::string path = std::string(kReports) + "/" + name;
     return Read(what.empty() ? path : path + "." + what);
 }
 
@@ -122,38 +114,37 @@ inline long Starts(const std::string& name) {
     return std::count(pids.begin(), pids.end(), '\n');
 }
 
+/** Ends everything that this process has below it, and collects it. */
+inline void EndChildren() {
+    const std::string list = "/proc/self/task/" + std::to_string(getpid()) + "/children";
+    for (std::string pids = Read(list); !pids.empty(); pids = Read(list)) {
+        std::istringstream numbers(pids);
+        for (pid_t pid = 0; numbers >> pid;) {
+            kill(pid, SIGKILL);
+            waitpid(pid, nullptr, 0);
+        }
+    }
+}
+
 /** A clean machine and an environment that acts for kUser. */
 class DaemonTest : public testing::Test {
   protected:
     void SetUp() override {
-        LetTheLastTestsDaemonsStart();
-        umount2(paths::FuseTree(kUser).c_str(), MNT_DETACH);
-        ++TestNumber();
-        for (const char* tree : {"/var/tmp/user", "/tmp/zyrovfs"}) {
+        // Daemons come to this process when the one that started them goes, so that none of them
+        // lives on into the next test.
+        prctl(PR_SET_CHILD_SUBREAPER, 1);
+        for (const char* tree : {"/var/tmp/user", "/tmp/zyrovfs", kReports}) {
             std::filesystem::remove_all(tree);
         }
-        mkdir(Reports().c_str(), 0777);
-        chmod(Reports().c_str(), 0777);
+        mkdir(kReports, 0777);
+        chmod(kReports, 0777);
         setenv("ZYROVFS_UID", std::to_string(kUser).c_str(), 1);
         unsetenv("DBUS_SESSION_BUS_ADDRESS");
         InstallAll();
     }
-
-  private:
-    /** A daemon that has only been forked would read this test's script and report to it. */
-    static void LetTheLastTestsDaemonsStart() {
-        const std::string folder = paths::RuntimeDir(kUser);
-        for (const char* file :
-             {"/dbus/dbus.pid", "/zyrovfs/gvfsd.pid", "/zyrovfs/gvfsd-fuse.pid"}) {
-            const int pid = atoi(Read(folder + file).c_str());
-            const std::string name = "/proc/" + std::to_string(pid);
-            Eventually([&] {
-                const std::string pids = Report("dbus-daemon", "pids") + Report("gvfsd", "pids") +
-                                         Report("gvfsd-fuse", "pids");
-                return pid <= 0 || access(name.c_str(), F_OK) != 0 ||
-                       pids.find(std::to_string(pid) + "\n") != std::string::npos;
-            });
-        }
+    void TearDown() override {
+        EndChildren();
+        umount2(paths::FuseTree(kUser).c_str(), MNT_DETACH);
     }
 };
 
@@ -189,11 +180,11 @@ class LiveProcess {
 
     int pid() const { return pid_; }
     void End() {
-        if (pid_ > 0) {
+        if (pid_ > 0 && waitpid(pid_, nullptr, WNOHANG) == 0) {
             kill(pid_, SIGKILL);
             waitpid(pid_, nullptr, 0);
-            pid_ = 0;
         }
+        pid_ = 0;
     }
 
   private:

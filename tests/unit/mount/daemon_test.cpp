@@ -216,10 +216,12 @@ TEST_P(EveryDaemon, HoldsNoDescriptorOfItsCaller) {
 }
 
 TEST_P(EveryDaemon, IsCollectedByTheSystemAndNotLeftToTheCaller) {
-    ASSERT_TRUE(row().init());
-    ASSERT_TRUE(Started(row().daemon->process));
-    EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1);
-    EXPECT_EQ(errno, ECHILD);
+    InFreshProcess([this] {
+        ASSERT_TRUE(row().init());
+        ASSERT_TRUE(Started(row().daemon->process));
+        EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1);
+        EXPECT_EQ(errno, ECHILD);
+    });
 }
 
 TEST_P(EveryDaemon, StartsUnderAServiceThatIgnoresItsChildren) {

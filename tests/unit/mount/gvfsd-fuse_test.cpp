@@ -16,8 +16,9 @@ using namespace fakes;
 using testing::HasSubstr;
 using testing::StartsWith;
 
-constexpr const char* kStockUmount = "/bin/umount.stock";
 const std::string kTree = "/var/tmp/user/4001/gvfs";
+
+constexpr const char* kRealUmount = "/bin/umount.real";
 
 class Fuse : public DaemonTest {
   protected:
@@ -27,18 +28,17 @@ class Fuse : public DaemonTest {
         seams::WatchChildren();
     }
     void TearDown() override {
-        umount2(kTree.c_str(), MNT_DETACH);
-        if (access(kStockUmount, F_OK) == 0) {
-            std::filesystem::rename(kStockUmount, paths::kUmount);
-        }
+        DaemonTest::TearDown();
+        std::error_code none;
+        std::filesystem::rename(kRealUmount, paths::kUmount, none);
     }
 
     /** /bin/umount notes its calls and then does nothing of the kind. */
     static void BreakUmount() {
-        if (access(kStockUmount, F_OK) != 0) {
-            std::filesystem::rename(paths::kUmount, kStockUmount);
+        if (!std::filesystem::exists(kRealUmount)) {
+            std::filesystem::rename(paths::kUmount, kRealUmount);
         }
-        Install(paths::kUmount, "echo \"$* $(id -u) $(id -ru)\" >>$reports/umount\nexit 32\n");
+        Install(paths::kUmount, "echo \"$* $(id -u) $(id -ru)\" >>/tmp/fakes/umount\nexit 32\n");
     }
     static bool IsStale() { return access(kTree.c_str(), F_OK) != 0 && errno == ENOTCONN; }
 };
@@ -174,6 +174,27 @@ TEST_F(Fuse, PathThatTheUserCannotMakeIsNoMountPoint) {
     EXPECT_FALSE(GVFSD_FUSE::Init());
     EXPECT_TRUE(seams::LoggedPart("Failed to mkdir " + kTree + ", ")) << seams::LogDump();
     EXPECT_TRUE(seams::Logged("Failed to run gvfsd-fuse, uid=4001, 2"));
+}
+
+TEST_F(Fuse, StaleMountPointIsRepairedUnderAServiceThatIgnoresItsChildren) {
+    ASSERT_TRUE(MakeStaleMount(kTree));
+    InFreshProcess([] {
+        signal(SIGCHLD, SIG_IGN);
+        EXPECT_TRUE(GVFSD_FUSE::Init()) << seams::LogDump();
+        ASSERT_TRUE(Started("gvfsd-fuse"));
+        EXPECT_EQ(Read(paths::GvfsdFusePid(kUser)), Report("gvfsd-fuse", "pids"));
+    });
+}
+
+TEST_F(Fuse, LaunchThatFailsIsSeenByAServiceThatIgnoresItsChildren) {
+    std::filesystem::remove(paths::kGvfsdFuse);
+    BreakUmount();
+    InFreshProcess([] {
+        signal(SIGCHLD, SIG_IGN);
+        EXPECT_FALSE(GVFSD_FUSE::Init());
+        EXPECT_TRUE(seams::Logged("Failed to run gvfsd-fuse, uid=4001"));
+    });
+    EXPECT_EQ(Report("umount"), "") << "there is nothing to repair";
 }
 
 TEST_F(Fuse, RepairRestoresTheServicesChoiceAboutItsChildren) {
