@@ -16,7 +16,10 @@ SERVER_PACKAGES=(
   vsftpd openssh-server lighttpd lighttpd-mod-webdav lighttpd-mod-openssl samba glib-networking
   iproute2 util-linux openssl procps
 )
-TEST_PACKAGES=(libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev python3)
+TEST_PACKAGES=(
+  libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev python3
+  man-db groff-base bsdextrautils
+)
 BENCH_PACKAGES=(libbenchmark-dev python3)
 
 need_root() {
