@@ -12,15 +12,13 @@
 #include "core/log.h"
 #include "core/no_throw.h"
 #include "mount/fork_as_user.h"
+#include "mount/glib_handle.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
 
 namespace ZYROVFS::Utils {
 namespace {
-
-using UniqueFile = std::unique_ptr<GFile, FreeWith<g_object_unref>>;
-using UniqueGString = std::unique_ptr<char, FreeWith<g_free>>;
 
 /** The parent takes an answer in pieces of this size and keeps the last one. */
 constexpr size_t kPiece = 8201;
@@ -85,8 +83,8 @@ std::string ToCodepage(const char* path, const char* codepage) {
 }
 
 bool AskGio(const char* uri, std::string& full) {
-    const UniqueFile file(g_file_new_for_commandline_arg(uri));
-    const UniqueGString path(file ? g_file_get_path(file.get()) : nullptr);
+    const UniqueObject<GFile> file(g_file_new_for_commandline_arg(uri));
+    const UniqueGText path(file ? g_file_get_path(file.get()) : nullptr);
     if (!path) {
         return false;
     }

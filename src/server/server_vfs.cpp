@@ -10,15 +10,13 @@
 #include "core/handle.h"
 #include "core/log.h"
 #include "core/no_throw.h"
+#include "mount/glib_handle.h"
 #include "server/profile_text.h"
 #include "zyrovfs/protocol.h"
 #include "zyrovfs/utils.h"
 
 namespace ZYROVFS::Server {
 namespace {
-
-using UniqueSoupUri = std::unique_ptr<SoupURI, FreeWith<soup_uri_free>>;
-using UniqueGString = std::unique_ptr<char, FreeWith<g_free>>;
 
 struct TextKey {
     const char* key;
@@ -142,7 +140,7 @@ bool VFSServer::GetServerID(std::string& id) {
     if (port_ != 0) {
         soup_uri_set_port(uri.get(), port_);
     }
-    const UniqueGString text(soup_uri_to_string(uri.get(), 0));
+    const UniqueGText text(soup_uri_to_string(uri.get(), 0));
     if (!text) {
         LOG_ERROR("soup_uri_to_string failed, protocol: %s, host: %s, port: %u", protocol_.c_str(),
                   hostname_.c_str(), port_);

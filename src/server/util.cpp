@@ -7,14 +7,13 @@
 #include "core/handle.h"
 #include "core/log.h"
 #include "core/no_throw.h"
+#include "mount/glib_handle.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
 
 namespace ZYROVFS::Server {
 namespace {
-
-using UniqueSoupUri = std::unique_ptr<SoupURI, FreeWith<soup_uri_free>>;
 
 /** The user of a URI, decoded; a URI without one leaves `user` alone. */
 void TakeUser(const char* uri, std::string& user) {
