@@ -37,7 +37,8 @@ struct Storage {
     Kind kind = Kind::kMemory;
     std::string folder;  ///< for kFolder: unnamed files in it hold the bytes
 };
-std::unique_ptr<Sink> MakeSink(const Storage& storage);
+/** Without `hash` the sum is made when it is asked for; one that only counts has none then. */
+std::unique_ptr<Sink> MakeSink(const Storage& storage, bool hash = true);
 
 ContentPtr MakeBytes(std::string bytes);
 /**

@@ -54,6 +54,34 @@ class Journal {
     /** One line each: for the message of a failed expectation. */
     std::string Text() const;
     void Clear();
+
+    // What follows is the server's side.
+    struct Options {
+        size_t body_limit = 64 * 1024;
+        bool keep = true;
+        std::string file;
+    };
+    Journal() : Journal(Options()) {}
+    explicit Journal(const Options& options);
+    Journal(const Journal&) = delete;
+    Journal& operator=(const Journal&) = delete;
+    ~Journal();
+
+    size_t BodyLimit() const { return options_.body_limit; }
+    /** Gives the entry its number. */
+    std::shared_ptr<JournalEntry> Begin(JournalEntry entry);
+    /** Changes an entry so that no reader sees it half changed. */
+    void Change(JournalEntry& entry, const std::function<void(JournalEntry&)>& change);
+    void Finish(JournalEntry& entry);
+    uint64_t AddConnection();
+
+  private:
+    const Options options_;
+    std::FILE* file_ = nullptr;
+    mutable std::mutex mutex_;
+    mutable std::condition_variable changed_;
+    std::vector<std::shared_ptr<JournalEntry>> entries_;
+    uint64_t last_number_ = 0, connections_ = 0;
 };
 
 }  // namespace cloudsim
