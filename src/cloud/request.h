@@ -72,11 +72,12 @@ class Request {
     bool Send(Json::Value& answer);
 
   private:
-    bool DescribeTo(APIHandler& api);
+    bool Start(APIHandler& api, XferData* xfer);
+    bool Describe(APIHandler& api);
     bool Process();
-    bool Perform();
     bool Refused();
-    bool ReadAnswer(Json::Value& answer);
+    bool TakeAnswer(Json::Value& answer);
+    bool AskForAnswer(Json::Value& answer);
 
     PublicCloud& cloud_;
     const FrameRules& rules_;
