@@ -6,8 +6,8 @@
  * direct options, then Process(), then GetResponse() or GetError(). What a failure means and
  * whether it is worth a retry is the ErrorHandler's to say.
  *
- * Operations answer bool, true for success, unless stated otherwise; none of them throws. One
- * thread at a time.
+ * Operations answer bool, true for success, unless stated otherwise. Values of the wrong type in a
+ * description make Process fail; it never throws. One thread at a time.
  */
 #ifndef ZYROVFS_HTTP_API_HANDLER_H
 #define ZYROVFS_HTTP_API_HANDLER_H
@@ -16,16 +16,15 @@
 #include <json/value.h>
 
 #include <string>
+#include <vector>
 
+#include "core/handle.h"
 #include "core/source_line.h"
 #include "http/error_handler.h"
+#include "zyrovfs/cloud.h"
 
 namespace ZYROCloud {
 
-struct FormUploadData;
-
-/** What libcurl calls to give away or to fetch bytes. */
-using XferCallback = size_t (*)(char* data, size_t size, size_t count, void* context);
 /** What libcurl calls to go back in the bytes to send: CURL_SEEKFUNC_... */
 using SeekCallback = int (*)(void* context, curl_off_t offset, int origin);
 
@@ -90,9 +89,9 @@ class APIHandler {
     // --- direct options: after Init. Failures are logged and known to the error handler ---------
 
     /** Null leaves the function or the data as it is, here and in the next three. */
-    bool SetWriteFunAndData(XferCallback function, void* data);
-    bool SetReadFunAndData(XferCallback function, void* data);
-    bool SetHeaderFunAndData(XferCallback function, void* data);
+    bool SetWriteFunAndData(CurlCallback function, void* data);
+    bool SetReadFunAndData(CurlCallback function, void* data);
+    bool SetHeaderFunAndData(CurlCallback function, void* data);
     /**
      * How to go back in what the read function gives: libcurl needs it when a kept connection dies
      * in the middle of a body, or the body is asked for again. For sources that can seek. The file
@@ -150,33 +149,33 @@ class APIHandler {
     static int WriteToDebugStr(CURL* curl, curl_infotype type, char* text, size_t size,
                                std::string* out);
 
-    /** Query or form text: "name=escaped&name=escaped". Names are not escaped. */
+    /** Query or form text: "name=escaped&name=escaped". Names are not escaped. Json::Exception for
+     * a value that has no text. */
     std::string BuildParamString(const Json::Value& params);
     /** Text up to the first NUL, escaped for a URL; "" on failure. */
     std::string EscapeURLString(const std::string& text);
-    /** Appends a line per header of the description; the caller frees the list in any case. */
+    /** Appends a line per header of the description; the caller frees the list in any case.
+     * Json::Exception for a value that has no text. */
     bool BuildHeaderParam(curl_slist** list);
 
   private:
-    class Form;
-    struct Option;
-
     bool SetBasicOpt();
-    bool SetUserAgent();
-    template <typename T>
-    bool Set(CURLoption option, T value, const char* what,
-             ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
-    template <typename Data>
-    bool SetFunAndData(CURLoption function_option, Data function, CURLoption data_option,
-                       void* data, const char* what, ZYROVFS::SourceLine at);
-    bool AddObject(const char* key, const Json::Value& object);
+    /** Whether libcurl took an option; a refusal is logged in the name of `at`. */
+    static bool Taken(CURLcode code, const char* what,
+                      ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
+    /** Taken, and the error handler knows of a refusal. */
+    bool Accept(CURLcode code, const char* what,
+                ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
+    bool SetMember(const char* key, const Json::Value& object);
     bool AddMember(const char* key, const std::string& name, const Json::Value& value);
-    bool SetPinnedCertificate(const std::string& path);
-    bool SetProxyFree(const std::string& url);
-    bool BuildUrl(std::string& url);
+    void UsePinnedCertificate(const std::string& path);
+    std::string LoggableUrl() const;
+    bool SetHeaders(curl_slist** list);
+    bool SetTarget();
     bool SetBody();
     bool SetMethod();
-    bool SetRequest(curl_slist** headers, Form& form);
+    bool SetForm(curl_mime** form);
+    bool SetUp(curl_slist** headers, curl_mime** form);
     bool Perform(int attempts);
     void AdaptTo(CURLcode code, int failed);
 
@@ -192,6 +191,8 @@ class APIHandler {
     FormUploadData* form_data_ = nullptr;
     char* cert_data_ = nullptr;
     SeekCallback seek_function_ = nullptr;
+    /** Connections that are still open may check against these once more. */
+    std::vector<ZYROVFS::UniqueCString> old_cert_data_;
 };
 
 }  // namespace ZYROCloud
