@@ -77,9 +77,8 @@ bool CutAtLastSlash(const std::string& path, std::string& parent, std::string& n
     if (slash == std::string::npos) {
         return false;
     }
-    const std::string behind = path.substr(slash + 1);
+    name = path.substr(slash + 1);
     parent = path.substr(0, slash);
-    name = behind;
     return true;
 }
 
