@@ -43,9 +43,9 @@ class Attempts {
             return false;
         }
         Copy(plan_.copy == CopyError::kAfterCancelTest);
-        const Verdict verdict = plan_.judge(cloud_.GetErrorCode());
-        if (verdict.kind != Verdict::kRetry) {
-            if (verdict.kind == Verdict::kGiveUp) {
+        const NextStep next = plan_.judge(cloud_.GetErrorCode());
+        if (next.kind != NextStep::kRetry) {
+            if (next.kind == NextStep::kGiveUp) {
                 Copy(plan_.copy == CopyError::kAtEnd);
                 Log(plan_.refused);
             }
@@ -55,8 +55,8 @@ class Attempts {
             return false;
         }
         LOG_ERROR_AT(at_, "%s: %d/%d", plan_.retry, plan_.first_number + number, kMostAttempts);
-        sleep(verdict.seconds < 0 ? cloud_.GetRetrySleepTime()
-                                  : static_cast<unsigned>(verdict.seconds));
+        sleep(next.seconds < 0 ? cloud_.GetRetrySleepTime()
+                                  : static_cast<unsigned>(next.seconds));
         return true;
     }
 
@@ -90,12 +90,12 @@ bool RunAttempts(Cloud& cloud, const AttemptPlan& plan, SourceLine at) {
     return Attempts(cloud, plan, at).Run();
 }
 
-Verdict JudgeUpload(Cloud& cloud, const XferContext& context, bool cured) {
-    return Verdict::RetryIf(context.fd != -1 && (cured || cloud.IsNeedRetry()));
+NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured) {
+    return NextStep::RetryIf(context.fd != -1 && (cured || cloud.IsNeedRetry()));
 }
 
-Verdict JudgeDownload(Cloud& cloud, const XferContext& context) {
-    return Verdict::RetryIf(context.can_retry && cloud.IsNeedRetry());
+NextStep JudgeDownload(Cloud& cloud, const XferContext& context) {
+    return NextStep::RetryIf(context.can_retry && cloud.IsNeedRetry());
 }
 
 bool SeekSource(int fd, off64_t offset, const char* text, SourceLine at) {

@@ -21,7 +21,7 @@ namespace ZYROCloud {
 constexpr int kMostAttempts = 6;
 
 /** What a failed attempt leads to. */
-struct Verdict {
+struct NextStep {
     enum Kind {
         kEnd,     ///< no further attempt; whoever says so has logged what there is to log
         kGiveUp,  ///< no further attempt; the plan's `refused` line is logged
@@ -31,11 +31,11 @@ struct Verdict {
     /** Before the next attempt; negative: as long as the error handler asks for. */
     int seconds = -1;
 
-    static Verdict End() { return {kEnd}; }
-    static Verdict GiveUp() { return {kGiveUp}; }
-    static Verdict Retry() { return {kRetry}; }
-    static Verdict RetryAfter(int seconds) { return {kRetry, seconds}; }
-    static Verdict RetryIf(bool worth_it) { return worth_it ? Retry() : GiveUp(); }
+    static NextStep End() { return {kEnd}; }
+    static NextStep GiveUp() { return {kGiveUp}; }
+    static NextStep Retry() { return {kRetry}; }
+    static NextStep RetryAfter(int seconds) { return {kRetry, seconds}; }
+    static NextStep RetryIf(bool worth_it) { return worth_it ? Retry() : GiveUp(); }
 };
 
 /** When the driver's record becomes the error of the handler. The tests for a cancel, and `judge`,
@@ -52,7 +52,7 @@ struct AttemptPlan {
     std::function<bool()> prepare;
     std::function<bool()> send;
     /** Asked after a failure that was no cancel, with the driver's code at that time. */
-    std::function<Verdict(__tag_vfs_err_)> judge;
+    std::function<NextStep(__tag_vfs_err_)> judge;
     /** Puts the source where the next attempt begins; false ends the transfer. May be empty. */
     std::function<bool()> rewind;
 
@@ -80,10 +80,10 @@ bool RunAttempts(Cloud& cloud, const AttemptPlan& plan,
 
 /** An upload is repeated when its source can be read again and the failure may pass; `cured` is
  * for failures that the service's plan has cured by itself. */
-Verdict JudgeUpload(Cloud& cloud, const XferContext& context, bool cured = false);
+NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured = false);
 
 /** A download is repeated from its start, so only before the first byte was written. */
-Verdict JudgeDownload(Cloud& cloud, const XferContext& context);
+NextStep JudgeDownload(Cloud& cloud, const XferContext& context);
 
 /** lseek64 to `offset`; a failure logs `text`, a format that may end in "%m". */
 bool SeekSource(int fd, off64_t offset, const char* text,

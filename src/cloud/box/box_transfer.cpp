@@ -106,7 +106,7 @@ bool Box::SendForm(XferData* xfer, const Json::Value& meta) {
         if (code == VFS_ERR_UNAUTHORIZED) {
             // The new token is for the caller's next upload: this request has the old one.
             RefreshToken(true);
-            return Verdict::End();
+            return NextStep::End();
         }
         return JudgeUpload(*this, *xfer->context);
     };
