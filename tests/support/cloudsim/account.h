@@ -2,6 +2,7 @@
 #ifndef ZYROVFS_TESTS_CLOUDSIM_ACCOUNT_H
 #define ZYROVFS_TESTS_CLOUDSIM_ACCOUNT_H
 
+#include <atomic>
 #include <cstdint>
 #include <memory>
 #include <string>
@@ -76,12 +77,12 @@ class Account {
     std::string Bytes(const std::string& id) const;
     std::vector<Item> List(const std::string& folder) const;
 
-    void SetQuota(uint64_t bytes);
-    uint64_t Quota() const;
+    void SetQuota(uint64_t bytes) { quota_ = bytes; }
+    uint64_t Quota() const { return quota_; }
     uint64_t Used() const;
     /** Largest file that the service takes from this account. */
-    void SetMaxUpload(uint64_t bytes);
-    uint64_t MaxUpload() const;
+    void SetMaxUpload(uint64_t bytes) { max_upload_ = bytes; }
+    uint64_t MaxUpload() const { return max_upload_; }
 
     /**
      * Fills the account from a folder of the disk; what clients change from now on is changed there
@@ -90,8 +91,12 @@ class Account {
     void Serve(const std::string& folder);
 
   private:
+    struct Node& At(const std::string& id) const;
+    struct Node& FreePlace(const std::string& parent, const std::string& name) const;
+
     Service& service_;
     const std::string email_, name_, id_;
+    std::atomic<uint64_t> quota_{107374182400}, max_upload_{16106127360};
 };
 
 }  // namespace cloudsim
