@@ -50,6 +50,7 @@ void APIHandler::Reset() {
     }
     form_data_ = nullptr;
     seek_function_ = nullptr;
+    seek_data_ = nullptr;
     request_ = Json::Value(Json::objectValue);
     ResetRespString();
     ResetRespHeader();
@@ -271,13 +272,40 @@ bool APIHandler::Process(int retries) {
     return success;
 }
 
+/**
+ * A kept connection may be dead without anyone knowing. When libcurl learns that while it reads, it
+ * takes another connection by itself; when it learns it while it sends, this does.
+ */
+CURLcode APIHandler::Transfer() {
+    ResetRespString();
+    ResetRespHeader();
+    const CURLcode code = curl_easy_perform(curl_);
+    if (code != CURLE_SEND_ERROR || !CanSendAgain()) {
+        return code;
+    }
+    ResetRespString();
+    ResetRespHeader();
+    return curl_easy_perform(curl_);
+}
+
+/** Whether an old connection broke before any answer, and the body is back at its start. */
+bool APIHandler::CanSendAgain() {
+    long status = 0;
+    long fresh_connections = 1;
+    curl_easy_getinfo(curl_, CURLINFO_RESPONSE_CODE, &status);
+    curl_easy_getinfo(curl_, CURLINFO_NUM_CONNECTS, &fresh_connections);
+    if (status != 0 || fresh_connections != 0 || seek_function_ == nullptr) {
+        return false;
+    }
+    return form_data_ != nullptr ||  // libcurl takes a form from its start by itself
+           seek_function_(seek_data_, 0, SEEK_SET) == CURL_SEEKFUNC_OK;
+}
+
 bool APIHandler::Perform(int attempts) {
     Taken(curl_easy_setopt(curl_, CURLOPT_IPRESOLVE, static_cast<long>(CURL_IPRESOLVE_WHATEVER)),
           "address family");
     for (int failed = 0;;) {
-        ResetRespString();
-        ResetRespHeader();
-        const CURLcode code = curl_easy_perform(curl_);
+        const CURLcode code = Transfer();
         if (ParseCurlError(code)) {
             return true;
         }

@@ -94,8 +94,9 @@ class APIHandler {
     bool SetHeaderFunAndData(CurlCallback function, void* data);
     /**
      * How to go back in what the read function gives: libcurl needs it when a kept connection dies
-     * in the middle of a body, or the body is asked for again. For sources that can seek. The file
-     * part of a form uses the function, too, with the context of its XferData in place of `data`.
+     * in the middle of a body, or the body is asked for again. For sources that can seek; offset 0
+     * is the first byte of this body. The file part of a form uses the function, too, with the
+     * context of its XferData in place of `data`.
      */
     bool SetSeekFunAndData(SeekCallback function, void* data);
 
@@ -177,6 +178,8 @@ class APIHandler {
     bool SetForm(curl_mime** form);
     bool SetUp(curl_slist** headers, curl_mime** form);
     bool Perform(int attempts);
+    CURLcode Transfer();
+    bool CanSendAgain();
     void AdaptTo(CURLcode code, int failed);
 
     CURL* curl_;
@@ -191,6 +194,7 @@ class APIHandler {
     FormUploadData* form_data_ = nullptr;
     char* cert_data_ = nullptr;
     SeekCallback seek_function_ = nullptr;
+    void* seek_data_ = nullptr;
     /** Connections that are still open may check against these once more. */
     std::vector<ZYROVFS::UniqueCString> old_cert_data_;
 };

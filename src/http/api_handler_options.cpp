@@ -144,6 +144,9 @@ bool APIHandler::SetSeekFunAndData(SeekCallback function, void* data) {
     if (function != nullptr) {
         seek_function_ = function;
     }
+    if (data != nullptr) {
+        seek_data_ = data;
+    }
     return (function == nullptr ||
             Accept(curl_easy_setopt(curl_, CURLOPT_SEEKFUNCTION, function), "seek function")) &&
            (data == nullptr ||
