@@ -45,6 +45,8 @@ void AddProfileCommands(CLI::App& app, Session& session);
 void AddConnectionCommands(CLI::App& app, Session& session);
 void AddPathCommand(CLI::App& app, Session& session);
 void AddUserCommands(CLI::App& app, Session& session);
+void AddTransferCommands(CLI::App& app, Session& session);
+void AddCloudCommands(CLI::App& app, Session& session);
 void AddHostCommands(CLI::App& app, Session& session);
 
 }  // namespace tool

@@ -17,6 +17,8 @@ int Main(int argc, char** argv) {
     AddProfileCommands(app, session);
     AddConnectionCommands(app, session);
     AddPathCommand(app, session);
+    AddTransferCommands(app, session);
+    AddCloudCommands(app, session);
     AddUserCommands(app, session);
     AddHostCommands(app, session);
     try {

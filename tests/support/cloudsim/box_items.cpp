@@ -146,7 +146,10 @@ Reply BoxService::ListFolder(const BoxCall& call) {
     list["limit"] = Json::UInt64(page.limit);
     if (marked) {
         const uint64_t next = page.offset + list["entries"].size();
-        list["next_marker"] = next < nodes.size() ? std::to_string(next) : "";
+        // The last page has no marker at all.
+        if (next < nodes.size()) {
+            list["next_marker"] = std::to_string(next);
+        }
         return JsonReply(200, list);
     }
     list["total_count"] = Json::UInt64(nodes.size());

@@ -86,6 +86,27 @@ TEST_F(BoxTest, CapsTheLimitAtAThousandAndTheOffsetAtTheDocumentedOne) {
     EXPECT_EQ("invalid_limit", Code(Get("/2.0/folders/0/items?limit=many")));
 }
 
+TEST_F(BoxTest, PagesByMarkersUntilAPageHasNone) {
+    amy.AddMany("0", 3, 1);
+    const std::string path = "/2.0/folders/0/items?usemarker=true&limit=2";
+    const Json::Value first = Get(path).Json();
+    EXPECT_EQ(2u, first["entries"].size());
+    EXPECT_FALSE(first.isMember("total_count"));
+    const Json::Value last = Get(path + "&marker=" + first["next_marker"].asString()).Json();
+    EXPECT_THAT(Names(last), ElementsAre("item-000002.bin"));
+    EXPECT_FALSE(last.isMember("next_marker"));
+}
+
+TEST_F(BoxTest, SortsWithinFoldersAndFiles) {
+    amy.AddFolder("0", "folder");
+    amy.AddFile("0", "a", "longest");
+    amy.AddFile("0", "b", "");
+    EXPECT_THAT(Names(Get("/2.0/folders/0/items?sort=size").Json()),
+                ElementsAre("folder", "b", "a"));
+    EXPECT_THAT(Names(Get("/2.0/folders/0/items?direction=DESC").Json()),
+                ElementsAre("folder", "b", "a"));
+}
+
 TEST_F(BoxTest, MakesAFolderOnceWithoutRegardToCase) {
     const Got made = Send("POST", "/2.0/folders", R"({"name":"Docs","parent":{"id":"0"}})");
     EXPECT_EQ(201, made.status);
