@@ -150,6 +150,7 @@ Node& BoxUpload::Store(const BoxCall& call) {
         throw box::Failure{box::Error(400, "bad_digest",
                                       "The specified content-md5 did not match what we received")};
     }
+    const Dates dates = ReadDates(call.body);
     Node& file =
         id_.empty() ? StoreNew(call, std::move(content)) : StoreVersion(call, std::move(content));
     file.content_created = dates.created < 0 ? file.content_created : dates.created;
