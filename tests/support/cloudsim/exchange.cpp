@@ -145,6 +145,10 @@ bool Exchange::Answer() {
 }
 
 void Exchange::SumBody() {
+    if (summed_) {
+        return;
+    }
+    summed_ = true;
     const std::string sum =
         received_ != 0 && server_.options.journal_hashes ? sum_.Hex() : std::string();
     server_.journal.Change(*entry_, [&](JournalEntry& entry) {
@@ -152,7 +156,6 @@ void Exchange::SumBody() {
         entry.body_size = received_;
         entry.body_sha1 = sum;
     });
-    body_.clear();
 }
 
 Reply Exchange::MakeReply() {
@@ -170,9 +173,7 @@ void Exchange::End() {
         return;
     }
     handler_.reset();
-    if (!body_.empty()) {
-        SumBody();
-    }
+    SumBody();
     server_.journal.Change(*entry_, [&](JournalEntry& entry) { entry.answer_size = sent_; });
     server_.journal.Finish(*entry_);
     if (fault_ != nullptr && (*fault_)->close_after_answer) {
@@ -181,9 +182,7 @@ void Exchange::End() {
 }
 
 bool Exchange::Break(Effect effect) {
-    if (!body_.empty()) {
-        SumBody();
-    }
+    SumBody();
     Happens(effect);
     if ((*fault_)->reset) {
         Reset();

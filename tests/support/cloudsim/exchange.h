@@ -61,6 +61,7 @@ class Exchange : public std::enable_shared_from_this<Exchange> {
     std::unique_ptr<Handler> handler_;
     std::shared_ptr<JournalEntry> entry_;
     std::string body_;  ///< beginning of the request's
+    bool summed_ = false;
     uint64_t received_ = 0, sent_ = 0;
     Sha1 sum_;
     Server::Time began_, answer_began_;
