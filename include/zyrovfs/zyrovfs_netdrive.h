@@ -2,6 +2,8 @@
 #ifndef ZYROVFS_NETDRIVE_H
 #define ZYROVFS_NETDRIVE_H
 
+#include "zyrovfs/cloud.h"
+#include "zyrovfs/cloud_utils.h"
 #include "zyrovfs/error.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/protocol.h"
