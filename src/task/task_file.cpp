@@ -126,8 +126,8 @@ bool JustCleaned(const std::string& stamp) {
     if (stat(stamp.c_str(), &info) != 0 || !S_ISREG(info.st_mode)) {
         return false;
     }
-    // Unsigned, so that one comparison bounds both sides; a stamp from the future counts for long
-    // no more than one from the past.
+    // Unsigned, so that one comparison bounds both sides: a clock that was set back must not keep
+    // the queue from being cleaned until it has caught up.
     return static_cast<uint64_t>(info.st_mtime - time(nullptr) + 2) < 5;
 }
 

@@ -82,6 +82,7 @@ struct Records {
     bool pretend = false;
     bool watch_children = false;
     std::function<void()> on_micro_sleep;
+    std::function<void()> on_sleep;
 };
 
 Records& Get() {
@@ -170,6 +171,9 @@ extern "C" {
 
 unsigned sleep(unsigned seconds) {
     Keep({Entry::kSleep, static_cast<int>(seconds), ""});
+    if (Get().on_sleep) {
+        Get().on_sleep();
+    }
     return 0;
 }
 
@@ -277,6 +281,10 @@ void FailIdentity(const std::string& function, int error, int after) {
 
 void OnMicroSleep(std::function<void()> hook) {
     Get().on_micro_sleep = std::move(hook);
+}
+
+void OnSleep(std::function<void()> hook) {
+    Get().on_sleep = std::move(hook);
 }
 
 void PretendIdentity(bool on) {

@@ -25,8 +25,9 @@ void WatchChildren();
 std::vector<unsigned> Sleeps();
 std::vector<unsigned> MicroSleeps();
 
-/** Called by each usleep(), for a test in which something happens during a wait. */
+/** Called by each usleep() or sleep(), for a test in which something happens during a wait. */
 void OnMicroSleep(std::function<void()> hook);
+void OnSleep(std::function<void()> hook);
 
 struct LogLine {
     int priority;
