@@ -8,6 +8,7 @@
 #include "zyrovfs/global.h"
 #include "zyrovfs/protocol.h"
 #include "zyrovfs/server.h"
+#include "zyrovfs/task.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"
 

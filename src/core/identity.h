@@ -82,6 +82,22 @@ class EffectiveUid {
 };
 
 /**
+ * Form 3 as the task registry needs it: root's effective uid where it is not in force already. A
+ * switch that fails is logged in the name of `at`, and the block runs all the same.
+ */
+class RootUid {
+  public:
+    explicit RootUid(SourceLine at = SourceLine::Here());
+    RootUid(const RootUid&) = delete;
+    RootUid& operator=(const RootUid&) = delete;
+    ~RootUid();
+
+  private:
+    uid_t saved_;
+    SourceLine at_;
+};
+
+/**
  * Form 3 as the start of the daemons needs it: effective uid of the user, effective group root.
  * Failures while leaving are logged in the name of `at` and change nothing else.
  */

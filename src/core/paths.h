@@ -57,6 +57,10 @@ inline std::string GvfsdFusePid(unsigned int uid) {
 inline std::string FuseTree(unsigned int uid) {
     return RuntimeDir(uid) + "/gvfs";
 }
+/** Queues of background jobs, a folder for each type of job. */
+inline std::string TaskRoot(unsigned int uid) {
+    return RuntimeDir(uid) + "/zyrovfs/task";
+}
 
 inline std::string MountLock(unsigned int uid) {
     return "/tmp/zyrovfs/lock/user/" + std::to_string(uid) + "/mnt.lock";

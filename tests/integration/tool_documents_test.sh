@@ -62,7 +62,7 @@ check_group() {
   check_command "$@"
 }
 check_group
-[ $count = 23 ] || complain "found $count commands, not 23"
+[ $count = 27 ] || complain "found $count commands, not 27"
 
 # Every command for a user that a document shows is one that the tool understands; there is no such
 # user here, so none does anything.
@@ -85,6 +85,9 @@ expect "" zyrovfs profile show --user amy x
 expect "" zyrovfs profile show ""
 expect "" zyrovfs connection delete --uid 4001 ""
 expect "amy" zyrovfs profile list --user amy
+zyrovfs task add copy job --pid $$ --user amy >/dev/null
+expect "copy" zyrovfs task clean --user amy ""
+expect "rmdir" zyrovfs task run copy --user amy -- rmdi
 expect "dav davs" zyrovfs profile list --protocol da
 [ $code != 0 ] || echo "man page and completion: ok"
 exit $code

@@ -47,6 +47,7 @@ void AddPathCommand(CLI::App& app, Session& session);
 void AddUserCommands(CLI::App& app, Session& session);
 void AddTransferCommands(CLI::App& app, Session& session);
 void AddCloudCommands(CLI::App& app, Session& session);
+void AddTaskCommands(CLI::App& app, Session& session);
 void AddHostCommands(CLI::App& app, Session& session);
 
 }  // namespace tool

@@ -20,6 +20,7 @@ int Main(int argc, char** argv) {
     AddTransferCommands(app, session);
     AddCloudCommands(app, session);
     AddUserCommands(app, session);
+    AddTaskCommands(app, session);
     AddHostCommands(app, session);
     try {
         app.parse(argc, argv);
