@@ -2,6 +2,7 @@
 #ifndef ZYROVFS_NETDRIVE_H
 #define ZYROVFS_NETDRIVE_H
 
+#include "zyrovfs/cfg.h"
 #include "zyrovfs/error.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/protocol.h"
