@@ -18,6 +18,7 @@ int Main(int argc, char** argv) {
     AddConnectionCommands(app, session);
     AddPathCommand(app, session);
     AddUserCommands(app, session);
+    AddPolicyCommands(app, session);
     AddHostCommands(app, session);
     try {
         app.parse(argc, argv);
