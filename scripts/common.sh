@@ -17,7 +17,7 @@ SERVER_PACKAGES=(
   iproute2 util-linux openssl procps
 )
 TEST_PACKAGES=(
-  libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev python3
+  libgtest-dev libgmock-dev libfuse3-dev clang clang-tidy clang-format libclang-rt-14-dev python3
   man-db groff-base bsdextrautils
 )
 BENCH_PACKAGES=(libbenchmark-dev python3)

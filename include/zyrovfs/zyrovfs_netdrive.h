@@ -3,6 +3,8 @@
 #define ZYROVFS_NETDRIVE_H
 
 #include "zyrovfs/cfg.h"
+#include "zyrovfs/cloud.h"
+#include "zyrovfs/cloud_utils.h"
 #include "zyrovfs/error.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/protocol.h"

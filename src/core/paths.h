@@ -11,6 +11,8 @@ inline constexpr const char* kConfigRoot = "/usr/zyro/etc/zyrovfs";
 /** Live connections. */
 inline constexpr const char* kConnectRoot = "/var/tmp/zyrovfs";
 inline constexpr const char* kServersFile = "servers.conf";
+/** Addresses and OAuth clients of the clouds. */
+inline constexpr const char* kServiceConfig = "/usr/zyro/etc/zyrovfs/cloud.conf";
 inline constexpr const char* kConnectFile = "connect.conf";
 
 /** Who may use remote connections. */

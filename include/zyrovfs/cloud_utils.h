@@ -1,0 +1,57 @@
+/** Making drivers, text helpers that they share, and the OAuth clients that they renew with. */
+#ifndef ZYROVFS_CLOUD_UTILS_H
+#define ZYROVFS_CLOUD_UTILS_H
+
+#include <json/value.h>
+
+#include <string>
+
+#include "zyrovfs/cloud.h"
+#include "zyrovfs/export.h"
+#include "zyrovfs/server.h"
+
+namespace ZYROCloud::Utils {
+
+// --- drivers. The caller owns what it gets; null is a failure, told by a log line. -------------
+
+/** The driver of a kind, for a profile with its credentials in plain text and its "server_id". */
+ZYROVFS_API Cloud* CreateCloudByConfig(_tag_cloud_type type, unsigned int uid,
+                                       const Json::Value& config);
+/** The driver of a stored profile or connection. */
+ZYROVFS_API Cloud* CreateCloudByServerID(unsigned int uid, const std::string& server_id,
+                                         ZYROVFS::Server::VFS_CONFIG_MODE mode);
+/** The same for any location below a server id. */
+ZYROVFS_API Cloud* CreateCloudByURI(unsigned int uid, const std::string& uri,
+                                    ZYROVFS::Server::VFS_CONFIG_MODE mode);
+
+// --- text ---------------------------------------------------------------------------------------
+
+/** By the text in front of "://"; text without it is CLOUD_TYPE_UNKNOWN. */
+ZYROVFS_API _tag_cloud_type GetCloudTypeFromURI(const std::string& uri);
+
+/** A backslash in front of each quote. A backslash of the text itself stays single. */
+ZYROVFS_API std::string EscapeSingleQuote(const std::string& text);
+ZYROVFS_API std::string EscapeDoubleQuote(const std::string& text);
+
+// --- OAuth clients of this installation ---------------------------------------------------------
+
+/**
+ * Deciphers a client secret into `out`, which is cleared over its `size` first. 1, or 0 for a text
+ * that this machine did not encipher or that does not fit with its NUL.
+ */
+ZYROVFS_API int Decrypt(char* in, char* out, int size);
+
+/**
+ * The OAuth clients in the service configuration, by service ("box", "dropbox", "google",
+ * "onedrive") and client id. For root. Adding replaces the secret of a known id; removing what is
+ * not there is a success. Secrets are kept enciphered and never given back. `out` becomes an object
+ * of arrays of client ids. VFS_ERR_BAD_PARAM, VFS_ERR_CONFIG_READ, VFS_ERR_CONFIG_WRITE.
+ */
+ZYROVFS_API bool AddClient(const std::string& service, const std::string& client_id,
+                           const std::string& secret);
+ZYROVFS_API bool RemoveClient(const std::string& service, const std::string& client_id);
+ZYROVFS_API bool ListClients(Json::Value& out);
+
+}  // namespace ZYROCloud::Utils
+
+#endif
