@@ -164,13 +164,16 @@ bool StoreUsers(const std::string& old, const std::string& type, bool first, boo
     return (type == old && !in_force ? true : users->Set(conf)) && Land(std::move(users));
 }
 
-int Report(const std::string& old, const std::string& type, bool json) {
+int Report(const std::string& old, const std::string& type, bool settings, bool json) {
     if (json) {
         PrintJson(WithType(type));
-        return kSuccess;
+    } else if (old != type) {
+        Say("The policy is now " + type + "; it was " + Printable(old) + ".");
+    } else if (settings) {
+        Say("Changed the settings; the policy is " + Printable(type) + ".");
+    } else {
+        Say("The policy is " + Printable(type) + " already.");
     }
-    Say(old == type ? "The policy is " + type + ", with the settings changed."
-                    : "The policy is now " + type + "; it was " + Printable(old) + ".");
     return kSuccess;
 }
 
@@ -196,7 +199,7 @@ int Set(const SetOptions& options, bool json) {
     if (!StoreUsers(old, type, !policy.isMember("user_enabled_type"), settings, users)) {
         return ReportFailure(kWhat, json);
     }
-    return Report(old, type, json);
+    return Report(old, type, settings, json);
 }
 
 void AddChanges(CLI::App& command, const std::string& suffix, const std::string& word,
