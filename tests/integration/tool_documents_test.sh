@@ -58,7 +58,7 @@ for group in $(commands_of); do
     check_command "$group" $command
   done
 done
-[ $count = 18 ] || complain "found $count commands, not 18"
+[ $count = 22 ] || complain "found $count commands, not 22"
 
 # Every command for a user that a document shows is one that the tool understands; there is no such
 # user here, so none does anything.
@@ -81,6 +81,9 @@ expect "" zyrovfs profile show --user amy x
 expect "" zyrovfs profile show ""
 expect "" zyrovfs connection delete --uid 4001 ""
 expect "amy" zyrovfs profile list --user amy
+expect "admin all" zyrovfs policy set --type a
+expect "amy" zyrovfs policy set --enable amy
+expect "sudo" zyrovfs policy set --enable-group sud
 expect "dav davs" zyrovfs profile list --protocol da
 [ $code != 0 ] || echo "man page and completion: ok"
 exit $code
