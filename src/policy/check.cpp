@@ -68,11 +68,8 @@ PermissionDecision DecideByListedGroups(const PYLIBCSZLIST groups) {
     return No(PERMISSION_NOT_ENABLED);
 }
 
-PermissionDecision DecideByGroups(unsigned int uid, _VFS_USER_CONFIG_ config) {
-    PermissionDecision decision{};
-    if (DecideByStanding(uid, decision)) {
-        return decision;
-    }
+/** For a user whose standing decides nothing. */
+PermissionDecision DecideByMembership(unsigned int uid, _VFS_USER_CONFIG_ config) {
     PZYROUSER found = nullptr;
     if (ZYROUserGetByUID(uid, &found) < 0) {
         LOG_ERROR("Failed to get user (%d), " ZYROERR_FORMAT, static_cast<int>(uid), ZYROERR_ARGS);
@@ -84,6 +81,11 @@ PermissionDecision DecideByGroups(unsigned int uid, _VFS_USER_CONFIG_ config) {
         return No(PERMISSION_NO_GROUPS);
     }
     return IsConsulted(config) ? DecideByListedGroups(groups.get()) : No(PERMISSION_NOT_ENABLED);
+}
+
+PermissionDecision DecideByGroups(unsigned int uid, _VFS_USER_CONFIG_ config) {
+    PermissionDecision decision{};
+    return DecideByStanding(uid, decision) ? decision : DecideByMembership(uid, config);
 }
 
 PermissionDecision Decide(unsigned int uid, _VFS_USER_CONFIG_ config, const char* protocol) {
@@ -105,7 +107,7 @@ PermissionDecision Decide(unsigned int uid, _VFS_USER_CONFIG_ config, const char
     if (IsEnabled(entry)) {
         return Yes(PERMISSION_USER_ENABLED);
     }
-    return DecideByGroups(uid, config);
+    return DecideByMembership(uid, config);
 }
 
 /** Memory that runs out is a no as well. */
