@@ -62,7 +62,7 @@ check_group() {
   check_command "$@"
 }
 check_group
-[ $count = 27 ] || complain "found $count commands, not 27"
+[ $count = 31 ] || complain "found $count commands, not 31"
 
 # Every command for a user that a document shows is one that the tool understands; there is no such
 # user here, so none does anything.
@@ -88,6 +88,9 @@ expect "amy" zyrovfs profile list --user amy
 zyrovfs task add copy job --pid $$ --user amy >/dev/null
 expect "copy" zyrovfs task clean --user amy ""
 expect "rmdir" zyrovfs task run copy --user amy -- rmdi
+expect "admin all" zyrovfs policy set --type a
+expect "amy" zyrovfs policy set --enable amy
+expect "sudo" zyrovfs policy set --enable-group sud
 expect "dav davs" zyrovfs profile list --protocol da
 [ $code != 0 ] || echo "man page and completion: ok"
 exit $code

@@ -48,6 +48,7 @@ void AddUserCommands(CLI::App& app, Session& session);
 void AddTransferCommands(CLI::App& app, Session& session);
 void AddCloudCommands(CLI::App& app, Session& session);
 void AddTaskCommands(CLI::App& app, Session& session);
+void AddPolicyCommands(CLI::App& app, Session& session);
 void AddHostCommands(CLI::App& app, Session& session);
 
 }  // namespace tool

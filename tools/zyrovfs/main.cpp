@@ -21,6 +21,7 @@ int Main(int argc, char** argv) {
     AddCloudCommands(app, session);
     AddUserCommands(app, session);
     AddTaskCommands(app, session);
+    AddPolicyCommands(app, session);
     AddHostCommands(app, session);
     try {
         app.parse(argc, argv);
