@@ -13,6 +13,7 @@
 #include <atomic>
 #include <cstddef>
 
+#include "core/source_line.h"
 #include "zyrovfs/cloud.h"
 
 namespace ZYROCloud {
@@ -26,10 +27,17 @@ enum SlotState : int {
     kDownloadDone = 4,  ///< download finished; its last chunk may still be in the slot
 };
 
+/** What the service was asked for in one pass of a download, and what came of it. */
+struct Answer {
+    unsigned long long from = 0;
+    unsigned long long length = 0;  ///< as in "len": 0 is the whole file
+    unsigned long long received = 0;
+    unsigned long long expected = 0;  ///< bytes of a whole answer; 0 when that is not known
+};
+
 struct TransferGlobals {
     std::atomic<int> slot_state{kSlotEmpty};
     char* slot_buffer = nullptr;
-    size_t slot_capacity = 0;
     size_t slot_length = 0;
     size_t slot_offset = 0;
     unsigned long long bytes_left = 0;
@@ -43,32 +51,31 @@ struct TransferGlobals {
     pthread_cond_t slot_free_cond = PTHREAD_COND_INITIALIZER;
     pthread_cond_t slot_full_cond = PTHREAD_COND_INITIALIZER;
 
-    /** Where the local file of an upload ends, by the size that the service was told; -1 unknown. */
+    size_t slot_capacity = 0;  ///< of slot_buffer, which only grows
+    Answer answer;
+    /** Position at which the local file of an upload ends, by the size that the service was told;
+     * -1 when that is not known. */
     long long source_end = -1;
-    /** What the service was asked for, in this pass of a download; a length of 0 is all. */
-    unsigned long long asked_from = 0;
-    unsigned long long asked_length = 0;
-    /** Bytes of the answer that were taken, and how many there must be for a whole one (0 when that
-     * is not known). */
-    unsigned long long received = 0;
-    unsigned long long expected = 0;
 };
 
 extern TransferGlobals transfer;
 
-/** Begins a transfer of `size` bytes: forgets the last one's state. The relay sets what is its own
- * behind that. */
-void BeginTransfer(unsigned long long size, ProgressCallback progress, CancelCallback cancel,
-                   SpeedCallback speed);
+struct TransferCallbacks {
+    ProgressCallback progress;
+    CancelCallback cancel;
+    SpeedCallback speed;
+};
 
-/** Runs `body`, which answers bool: a false or an exception is false, and an exception leaves
- * VFS_ERR_CLOUD_FAILED in the driver's record. */
-bool DriverStep(Cloud& cloud, bool (*body)(void*), void* argument) noexcept;
+/** Begins a transfer of `size` bytes, all of what the last one left forgotten. */
+void BeginTransfer(unsigned long long size, const TransferCallbacks& callbacks);
 
-// --- for libcurl ---------------------------------------------------------------------------------
+/** Sets the platform error that callers of a copy look at. */
+void SetPlatformErrorFromCode(__tag_vfs_err_ code);
 
-/** What a write function of this engine answers to end a transfer. libcurl takes any number but the
- * chunk's size for a failure, so that a chunk of this very size goes through. */
+// --- for libcurl; `context` is an XferContext ----------------------------------------------------
+
+/** What a write function of the engine answers to end a transfer. libcurl takes any number but the
+ * chunk's size for a failure; a failed chunk of this very size goes through. */
 inline constexpr size_t kWriteFailed = 23;
 
 /** Bytes of a local file, for an upload. */
@@ -79,18 +86,19 @@ size_t FileWriteCallback(char* data, size_t size, size_t count, void* context);
 size_t CopyWriteCallback(char* data, size_t size, size_t count, void* context);
 size_t CopyReadCallback(char* data, size_t size, size_t count, void* context);
 
-/** True, with the platform error of a cancel, when the user wants to stop. */
-bool IsCancelled();
-/** read() for a read function; a failure, logged, leaves the platform error and gives -1. */
-ssize_t ReadSource(int fd, char* data, size_t size);
-/** Asks the speed callback, if any, how much to take next, and gives that to the handle. */
-void LimitReceiving(size_t chunk, unsigned long long done, CURL* curl);
-/** False, with a log line, when the first bytes of an answer are not those that were asked for: the
- * whole file in place of a part of it, or another part. */
-bool BeginsWhereAsked(CURL* curl);
+// --- parts of these, shared ----------------------------------------------------------------------
 
-/** Sets the platform error that callers of a copy look at. */
-void SetPlatformErrorFromCode(__tag_vfs_err_ code);
+/** Whether the user wants to stop; leaves the platform error of a cancel. */
+bool IsStopAsked();
+/** read(2) for a read function. A failure gives -1, the platform error and, for an unusual cause, a
+ * log line in the name of `at`. */
+ssize_t ReadSource(int fd, char* data, size_t size,
+                   ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
+/** Asks the speed callback, if there is one, how much to take at once behind this chunk. */
+void LimitReceiving(size_t chunk, unsigned long long done, void* curl);
+/** False, logged, when an answer is another part of the file than was asked for. For its first
+ * bytes, with the state of `transfer.answer`. */
+bool BeginsWhereAsked(void* curl);
 
 }  // namespace ZYROCloud
 
