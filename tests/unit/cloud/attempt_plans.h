@@ -5,27 +5,17 @@
 #ifndef ZYROVFS_TESTS_ATTEMPT_PLANS_H
 #define ZYROVFS_TESTS_ATTEMPT_PLANS_H
 
-#include "cloud/attempt.h"
-
-#include <fcntl.h>
-#include <gmock/gmock.h>
-#include <sys/mman.h>
-
 #include <deque>
-#include <functional>
+#include <string>
+#include <vector>
 
-#include "core/handle.h"
+#include "cloud/attempt.h"
 #include "support/scripted_cloud.h"
-#include "support/seams.h"
 
 namespace ZYROCloud {
-using namespace ZYROVFS;  // NOLINT(google-build-using-namespace)
-using testing::ElementsAre;
-using testing::ElementsAreArray;
-using testing::IsEmpty;
 
+using namespace ZYROVFS;  // NOLINT(google-build-using-namespace)
 using Texts = std::vector<std::string>;
-using Seconds = std::vector<unsigned>;
 
 /** One transfer under way: a plan as a driver makes it, and what came of it. */
 struct Transfer {
@@ -48,7 +38,7 @@ struct Transfer {
         plan.rewind = [this] { return Note("rewind", can_seek); };
     }
     bool Renew() { return Note("renew", renews); }
-    bool Go() { return RunAttempts(cloud, plan); }
+    bool Go(SourceLine at = SourceLine::Here()) { return RunAttempts(cloud, plan, at); }
 
     ScriptedCloud cloud;
     XferContext context;

@@ -19,6 +19,7 @@ using testing::HasSubstr;
 class Secret : public testing::Test {
   protected:
     void SetUp() override {
+        std::filesystem::create_directories(paths::kConfigRoot);
         std::filesystem::remove(paths::kServiceConfig);
         seams::Reset();
     }

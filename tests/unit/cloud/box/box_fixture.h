@@ -61,6 +61,7 @@ class BoxTest : public profiles::ProfileTest {
         Json::Value document;
         document["hosts"]["BoxApiHost"] = service.ApiHost();
         document["hosts"]["BoxUploadHost"] = service.UploadHost();
+        std::filesystem::create_directories(paths::kConfigRoot);
         ASSERT_TRUE(json::toFile(document, paths::kServiceConfig, 0640));
         ASSERT_TRUE(Utils::AddClient("box", "mine", kSecret));
         Json::Value connections;

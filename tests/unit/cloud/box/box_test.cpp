@@ -144,7 +144,7 @@ TEST_F(BoxListing, OnePageMovesTheOffsetOnAndNeverBack) {
     EXPECT_TRUE(box->ListFolder("", Json::Value(), out, &offset));
     EXPECT_EQ(offset, 1000U);
     EXPECT_EQ(out["total_count"], 1);
-    service.AddFault(Fault::On("GET", "/2.0/folders/0/items").Body("{}"));
+    service.AddFault(Fault::On("GET", "/2.0/folders/0/items").Answer(200, "{}"));
     offset = 4294967000U;
     EXPECT_TRUE(box->ListFolder("", Json::Value(), out, &offset));
     EXPECT_EQ(offset, 4294967295U);
