@@ -191,6 +191,7 @@ void BeginTransfer(unsigned long long size, const TransferCallbacks& callbacks) 
     transfer.slot_length = 0;
     transfer.slot_offset = 0;
     transfer.watched_pid = 0;
+    transfer.own_pid = getpid();
     transfer.source_end = -1;
     transfer.answer = Answer();
     if (YLIBCErrGet() == kPlatformCancelled) {

@@ -51,6 +51,7 @@ struct TransferGlobals {
     pthread_cond_t slot_free_cond = PTHREAD_COND_INITIALIZER;
     pthread_cond_t slot_full_cond = PTHREAD_COND_INITIALIZER;
 
+    pid_t own_pid = 0;         ///< asked once: a copy looks at it with each chunk
     size_t slot_capacity = 0;  ///< of slot_buffer, which only grows
     Answer answer;
     /** Position at which the local file of an upload ends, by the size that the service was told;

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <charconv>
+#include <cstdint>
 #include <cstring>
 #include <iterator>
 #include <string_view>
@@ -65,10 +66,21 @@ size_t LimitSending(size_t want) {
     return want;
 }
 
-/** Bytes up to the end that the service was told, -1 when there is no such end. */
-long long LeftInSource(int fd) {
-    const off64_t position = transfer.source_end < 0 ? -1 : lseek64(fd, 0, SEEK_CUR);
-    return position < 0 ? -1 : std::max(0LL, transfer.source_end - position);
+/** Position in a source whose end is known, -1 in any other. */
+off64_t SourcePosition(int fd) {
+    return transfer.source_end < 0 ? -1 : lseek64(fd, 0, SEEK_CUR);
+}
+
+/**
+ * Copying from a page to a few bytes further within a page is half as fast on some processors, and
+ * libcurl's buffer begins just so: behind the 16 bytes that malloc keeps in front of a mapping. One
+ * piece that is half a page shorter moves all that follow out of step.
+ */
+size_t OutOfStep(const char* data, off64_t position, size_t want) {
+    constexpr uintptr_t kPage = 4096;
+    constexpr uintptr_t kClose = 256;
+    const uintptr_t ahead = (reinterpret_cast<uintptr_t>(data) - position) % kPage;
+    return ahead > 0 && ahead < kClose && want > 2 * kPage ? want - kPage / 2 : want;
 }
 
 size_t SendPiece(XferContext& context, char* data, size_t want) {
@@ -81,9 +93,11 @@ size_t SendPiece(XferContext& context, char* data, size_t want) {
     }
     // What was announced is what is sent. A file that has grown would run into what follows the
     // body on the wire; one that has become shorter would leave the service waiting.
-    const long long left = LeftInSource(context.fd);
-    if (left >= 0) {
-        want = std::min(want, static_cast<size_t>(left));
+    const off64_t position = SourcePosition(context.fd);
+    long long left = 0;
+    if (position >= 0) {
+        left = std::max(0LL, transfer.source_end - static_cast<long long>(position));
+        want = std::min(OutOfStep(data, position, want), static_cast<size_t>(left));
     }
     const ssize_t n = ReadSource(context.fd, data, want);
     if (n < 0) {
@@ -220,7 +234,7 @@ bool IsStopAsked() {
     const pid_t watched = transfer.watched_pid;
     // A copy watches its own process, about which nobody needs to ask.
     const bool stop = (transfer.cancel_cb != nullptr && transfer.cancel_cb() != 0) ||
-                      (watched != 0 && watched != getpid() && YLIBCProcAlive(watched) != 1);
+                      (watched != 0 && watched != transfer.own_pid && YLIBCProcAlive(watched) != 1);
     if (stop) {
         SetPlatformErr(kPlatformCancelled);
     }

@@ -29,7 +29,7 @@ struct Side {
 /** Upload: the content length must be known, so it starts when the first data is there. */
 bool WaitForData(Side& side) {
     const time_t deadline = SlotDeadline();
-    const SlotLock lock;
+    SlotLock lock;
     if (!lock.WaitWhile(kSlotEmpty, transfer.slot_full_cond, deadline)) {
         LOG_ERROR("timeout");
         side.cloud->SetError(VFS_ERR_TIMEOUT, "");
@@ -49,7 +49,7 @@ bool UploadAll(Side& side) {
     if (!WaitForData(side) || !side.cloud->Upload(&side.xfer, side.meta)) {
         return false;
     }
-    const SlotLock lock;
+    SlotLock lock;
     if (transfer.bytes_left != 0) {
         LOG_ERROR("Upload left out %llu bytes", transfer.bytes_left);
         side.cloud->SetError(VFS_ERR_TRANSFER_ABORTED, "");
@@ -61,12 +61,12 @@ bool UploadAll(Side& side) {
 void* UploadThread(void* argument) {
     Side& side = *static_cast<Side*>(argument);
     const bool done = Guard(*side.cloud, [&side] { return UploadAll(side); });
-    const SlotLock lock;
+    SlotLock lock;
     if (done) {
         SetPlatformErr(0);
     }
     transfer.slot_state = done ? kUploadDone : kSlotAborted;
-    pthread_cond_signal(&transfer.slot_free_cond);
+    lock.Signal(transfer.slot_free_cond);
     return nullptr;
 }
 
@@ -74,7 +74,7 @@ void* DownloadThread(void* argument) {
     Side& side = *static_cast<Side*>(argument);
     const bool done =
         Guard(*side.cloud, [&side] { return side.cloud->Download(&side.xfer, side.meta); });
-    const SlotLock lock;
+    SlotLock lock;
     if (done) {
         SetPlatformErr(0);
     }
@@ -83,7 +83,7 @@ void* DownloadThread(void* argument) {
     } else if (transfer.slot_state != kSlotAborted) {  // what has failed stays so
         transfer.slot_state = kDownloadDone;
     }
-    pthread_cond_signal(&transfer.slot_full_cond);
+    lock.Signal(transfer.slot_full_cond);
     return nullptr;
 }
 
@@ -97,9 +97,9 @@ bool Start(Side& side, void* (*body)(void*)) {
 
 /** Ends what waits in the slot. */
 void AbortSlot() {
-    const SlotLock lock;
+    SlotLock lock;
     transfer.slot_state = kSlotAborted;
-    pthread_cond_signal(&transfer.slot_full_cond);
+    lock.Signal(transfer.slot_full_cond);
 }
 
 bool RunBoth(Side& source, Side& target) {

@@ -17,6 +17,14 @@ namespace {
 
 constexpr time_t kLongestWait = 90;
 
+// Giving the processor to the other side and looking again costs a third of a sleep and a wake-up.
+// Where it does not help, because the network is what both wait for, it is tried less and less.
+constexpr int kMostYields = 64;
+constexpr int kLeastYields = 4;
+
+Patience writer;
+Patience reader;
+
 /** reallocf: what cannot grow is freed. */
 bool GrowSlot(size_t size) {
     if (size <= transfer.slot_capacity) {
@@ -34,9 +42,9 @@ bool GrowSlot(size_t size) {
 // --- download side -------------------------------------------------------------------------------
 
 size_t FailWrite() {
-    const SlotLock lock;
+    SlotLock lock;
     transfer.slot_state = kSlotAborted;
-    pthread_cond_signal(&transfer.slot_full_cond);
+    lock.Signal(transfer.slot_full_cond);
     return kWriteFailed;
 }
 
@@ -47,7 +55,7 @@ void TakeLength(void* curl) {
         if (curl_easy_getinfo(curl, CURLINFO_CONTENT_LENGTH_DOWNLOAD_T, &length) != CURLE_OK) {
             LOG_ERROR("Failed to get download content length");
         } else if (length != -1) {
-            const SlotLock lock;
+            SlotLock lock;
             transfer.bytes_left = static_cast<unsigned long long>(length);
             transfer.answer.expected = transfer.bytes_left;
         }
@@ -58,8 +66,8 @@ void TakeLength(void* curl) {
 enum Room { kRoom, kNoRoom, kNotWanted };
 
 Room WaitForRoom(time_t deadline, unsigned long long& done) {
-    AwaitShortly(kSlotFull);
-    const SlotLock lock;
+    writer.Await(kSlotFull);
+    SlotLock lock;
     if (transfer.slot_state == kSlotAborted) {
         return kNoRoom;
     }
@@ -75,7 +83,7 @@ Room WaitForRoom(time_t deadline, unsigned long long& done) {
 }
 
 bool Put(const char* data, size_t size) {
-    const SlotLock lock;
+    SlotLock lock;
     if (transfer.slot_state == kSlotAborted || transfer.slot_state == kUploadDone) {
         return false;
     }
@@ -89,18 +97,18 @@ bool Put(const char* data, size_t size) {
     // The failure result is a number like any other: a chunk of this size is taken for a failed
     // one and ends the copy.
     transfer.slot_state = size == kWriteFailed ? kSlotAborted : kSlotFull;
-    pthread_cond_signal(&transfer.slot_full_cond);
+    lock.Signal(transfer.slot_full_cond);
     return true;
 }
 
 // --- upload side ---------------------------------------------------------------------------------
 
 size_t FailRead() {
-    const SlotLock lock;
+    SlotLock lock;
     if (transfer.slot_state != kSlotAborted && transfer.slot_state != kDownloadDone) {
         transfer.slot_state = kSlotAborted;
     }
-    pthread_cond_signal(&transfer.slot_free_cond);
+    lock.Signal(transfer.slot_free_cond);
     return CURL_READFUNC_ABORT;
 }
 
@@ -132,7 +140,7 @@ bool Take(XferContext& context, char* data, size_t want, size_t& taken) {
 }
 
 /** Makes room for the next chunk when this one is used up. */
-void Release() {
+void Release(SlotLock& lock) {
     if (transfer.slot_offset != transfer.slot_length) {
         return;
     }
@@ -141,12 +149,12 @@ void Release() {
     if (transfer.slot_state != kSlotAborted && transfer.slot_state != kDownloadDone) {
         transfer.slot_state = kSlotEmpty;
     }
-    pthread_cond_signal(&transfer.slot_free_cond);
+    lock.Signal(transfer.slot_free_cond);
 }
 
 bool WaitForChunk(time_t deadline) {
-    AwaitShortly(kSlotEmpty);
-    const SlotLock lock;
+    reader.Await(kSlotEmpty);
+    SlotLock lock;
     if (transfer.slot_state == kSlotAborted) {
         return false;
     }
@@ -175,7 +183,7 @@ size_t TakeChunk(XferContext& context, char* data, size_t want, time_t deadline,
     bool taken = false;
     unsigned long long done = 0;
     {
-        const SlotLock lock;
+        SlotLock lock;
         taken = Take(context, data, want, n);
         done = transfer.bytes_total - transfer.bytes_left;
         more = transfer.bytes_left != 0;
@@ -186,8 +194,8 @@ size_t TakeChunk(XferContext& context, char* data, size_t want, time_t deadline,
     if (transfer.progress_cb != nullptr) {
         transfer.progress_cb(n, done);
     }
-    const SlotLock lock;
-    Release();
+    SlotLock lock;
+    Release(lock);
     return n;
 }
 
@@ -222,14 +230,23 @@ bool SlotLock::WaitWhile(SlotState state, pthread_cond_t& changed, time_t deadli
     return transfer.slot_state != state;
 }
 
-bool AwaitShortly(SlotState state) {
-    for (int i = 0; i < 100; ++i) {
+bool Patience::Await(SlotState state) {
+    for (int i = 0; i < limit_; ++i) {
         if (transfer.slot_state.load(std::memory_order_relaxed) != state) {
+            limit_ = std::min(2 * limit_, kMostYields);
             return true;
         }
-        __builtin_ia32_pause();
+        sched_yield();
     }
+    limit_ = std::max(limit_ / 2, kLeastYields);
     return false;
+}
+
+SlotLock::~SlotLock() {
+    pthread_mutex_unlock(&transfer.transfer_mutex);
+    if (signalled_ != nullptr) {
+        pthread_cond_signal(signalled_);
+    }
 }
 
 size_t CopyWriteCallback(char* data, size_t size, size_t count, void* opaque) {
@@ -274,7 +291,7 @@ size_t CopyReadCallback(char* data, size_t size, size_t count, void* opaque) {
     size_t total = 0;
     bool more = true;
     // Several chunks, as long as they come without a sleep: libcurl then sends them at once.
-    while (more && (total == 0 || (AwaitShortly(kSlotEmpty) && transfer.slot_state == kSlotFull))) {
+    while (more && (total == 0 || (reader.Await(kSlotEmpty) && transfer.slot_state == kSlotFull))) {
         const size_t n = TakeChunk(*context, data + total, room - total, deadline, more);
         if (n == CURL_READFUNC_ABORT) {
             return n;

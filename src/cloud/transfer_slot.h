@@ -28,16 +28,28 @@ class SlotLock {
     SlotLock() { pthread_mutex_lock(&transfer.transfer_mutex); }
     SlotLock(const SlotLock&) = delete;
     SlotLock& operator=(const SlotLock&) = delete;
-    ~SlotLock() { pthread_mutex_unlock(&transfer.transfer_mutex); }
+    ~SlotLock();
 
     /** Waits for the state to leave `state`, at most until `deadline`, without the mutex. False
      * when the time ran out. */
     bool WaitWhile(SlotState state, pthread_cond_t& changed, time_t deadline) const;
+    /** Wakes who waits for this, once the mutex is free: woken earlier, it would wait for that. */
+    void Signal(pthread_cond_t& changed) { signalled_ = &changed; }
+
+  private:
+    pthread_cond_t* signalled_ = nullptr;
 };
 
-/** Waits without the mutex for the state to leave `state`, for as long as that is cheaper than to
- * sleep. True when it has. */
-bool AwaitShortly(SlotState state);
+/** One side's short wait, without the mutex, in front of each sleep. */
+class Patience {
+  public:
+    /** Waits for the state to leave `state` as long as that is likely to be cheaper than to sleep.
+     * True when it has. */
+    bool Await(SlotState state);
+
+  private:
+    int limit_ = 1;
+};
 
 }  // namespace ZYROCloud
 
