@@ -2,6 +2,7 @@
 #ifndef ZYROVFS_NETDRIVE_H
 #define ZYROVFS_NETDRIVE_H
 
+#include "zyrovfs/cfg.h"
 #include "zyrovfs/cloud.h"
 #include "zyrovfs/cloud_utils.h"
 #include "zyrovfs/error.h"

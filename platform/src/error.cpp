@@ -1,11 +1,14 @@
 #include "zosplatform/error.h"
 
+#include <atomic>
+
 namespace {
 
+/** Process-wide, as callers expect it; the two threads of a copy write it, too. */
 struct {
-    unsigned int code = 0;
-    const char* file = "";
-    int line = 0;
+    std::atomic<unsigned int> code = 0;
+    std::atomic<const char*> file = "";
+    std::atomic<int> line = 0;
 } cell;
 
 }  // namespace

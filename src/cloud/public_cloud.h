@@ -52,6 +52,11 @@ class PublicCloud : public Cloud {
     TokenInfo token_;
     std::string client_id_;
     Json::Value account_info_;
+
+  private:
+    void TakeTokenOfOthers();
+    bool AskForToken();
+    bool TakeToken(const std::string& text);
 };
 
 }  // namespace ZYROCloud

@@ -134,6 +134,16 @@ RootUid::~RootUid() {
     }
 }
 
+RootUntilRestored::RootUntilRestored(SourceLine at) : saved_(geteuid()) {
+    if (saved_ != 0) {
+        SetUid(0, at);
+    }
+}
+
+bool RootUntilRestored::Restore() const {
+    return geteuid() == saved_ || setresuid(kUnchanged, saved_, kUnchanged) == 0;
+}
+
 UserWithRootGroup::UserWithRootGroup(uid_t uid, SourceLine at)
     : saved_uid_(geteuid()), saved_gid_(0), at_(at) {
     if (saved_uid_ != uid && seteuid(uid) != 0) {

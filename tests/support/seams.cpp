@@ -13,7 +13,10 @@
 #include <cstdarg>
 #include <cstdio>
 #include <cstring>
+#include <ctime>
 #include <map>
+#include <mutex>
+#include <optional>
 
 namespace {
 
@@ -82,6 +85,7 @@ struct Records {
     bool pretend = false;
     bool watch_children = false;
     std::function<void()> on_micro_sleep;
+    std::optional<time_t> now;
     std::function<void()> on_sleep;
 };
 
@@ -90,7 +94,14 @@ Records& Get() {
     return records;
 }
 
+/** Units under test may report from several threads. */
+std::mutex& KeepMutex() {
+    static std::mutex mutex;
+    return mutex;
+}
+
 void Keep(Entry entry) {
+    const std::lock_guard<std::mutex> guard(KeepMutex());
     if (Get().watch_children) {
         Journal::Get().Add(entry);
     } else {
@@ -175,6 +186,19 @@ unsigned sleep(unsigned seconds) {
         Get().on_sleep();
     }
     return 0;
+}
+
+time_t time(time_t* out) {
+    timespec real{};
+    clock_gettime(CLOCK_REALTIME, &real);
+    const time_t now = Get().now.value_or(real.tv_sec);
+    if (now == -1) {
+        errno = EOVERFLOW;
+    }
+    if (out != nullptr) {
+        *out = now;
+    }
+    return now;
 }
 
 int usleep(useconds_t microseconds) {
@@ -277,6 +301,10 @@ std::vector<std::string> IdentityCalls() {
 
 void FailIdentity(const std::string& function, int error, int after) {
     Get().failures[function] = {error, after};
+}
+
+void SetTime(time_t now) {
+    Get().now = now;
 }
 
 void OnMicroSleep(std::function<void()> hook) {

@@ -6,6 +6,7 @@
 #ifndef ZYROVFS_TESTS_SEAMS_H
 #define ZYROVFS_TESTS_SEAMS_H
 
+#include <ctime>
 #include <functional>
 #include <string>
 #include <vector>
@@ -24,6 +25,9 @@ void WatchChildren();
 /** Seconds of each sleep() and microseconds of each usleep(), in order. */
 std::vector<unsigned> Sleeps();
 std::vector<unsigned> MicroSleeps();
+
+/** time() answers this from now on, until the next Reset; -1 is a clock that fails. */
+void SetTime(time_t now);
 
 /** Called by each usleep() or sleep(), for a test in which something happens during a wait. */
 void OnMicroSleep(std::function<void()> hook);

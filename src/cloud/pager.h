@@ -1,0 +1,53 @@
+/** Listings that come in pages. */
+#ifndef ZYROVFS_CLOUD_PAGER_H
+#define ZYROVFS_CLOUD_PAGER_H
+
+#include <json/value.h>
+
+#include <utility>
+
+namespace ZYROCloud {
+
+/** Moves the items of `page[member]` that `keep` accepts to the end of the array `out`. A page
+ * without the member has no items; throws Json::LogicError when it is no array. */
+template <typename Keep>
+void MoveItems(Json::Value& page, const char* member, Json::Value& out, Keep keep) {
+    Json::Value items;
+    if (page.isMember(member)) {
+        items.swap(page[member]);
+    }
+    if (!items.isNull() && !items.isArray()) {
+        Json::throwLogicError("the items of a page are no array");
+    }
+    for (Json::Value& item : items) {
+        if (keep(static_cast<const Json::Value&>(item))) {
+            out.append(std::move(item));
+        }
+    }
+}
+
+/**
+ * Appends the items of all pages to `out`, which becomes an array if it is none. `fetch(page)` gets
+ * the next page, `more(page)` says whether there is another one and remembers where it begins, be
+ * it an offset, a token or a cursor; it sees the page without its items. Only one page is held at a
+ * time. A page that cannot be had ends the listing with false; what came before it stays.
+ */
+template <typename Fetch, typename Keep, typename More>
+bool ForEachPage(const char* member, Json::Value& out, Fetch fetch, Keep keep, More more) {
+    if (!out.isArray()) {
+        out = Json::Value(Json::arrayValue);
+    }
+    for (bool again = true; again;) {
+        Json::Value page;
+        if (!fetch(page)) {
+            return false;
+        }
+        MoveItems(page, member, out, keep);
+        again = more(static_cast<const Json::Value&>(page));
+    }
+    return true;
+}
+
+}  // namespace ZYROCloud
+
+#endif

@@ -1,0 +1,161 @@
+#include <sched.h>
+#include <unistd.h>
+
+#include <ctime>
+
+#include "cloud/guard.h"
+#include "cloud/transfer.h"
+#include "cloud/transfer_slot.h"
+#include "core/error_cell.h"
+#include "core/handle.h"
+#include "core/json.h"
+#include "core/log.h"
+
+namespace ZYROCloud {
+
+using namespace ZYROVFS;
+
+namespace {
+
+/** What one of the two threads works on. Only that thread touches it until it has ended. */
+struct Side {
+    Cloud* cloud;
+    XferContext context;
+    XferData xfer;
+    Json::Value meta;
+    pthread_t thread;
+};
+
+/** Upload: the content length must be known, so it starts when the first data is there. */
+bool WaitForData(Side& side) {
+    const time_t deadline = SlotDeadline();
+    const SlotLock lock;
+    if (!lock.WaitWhile(kSlotEmpty, transfer.slot_full_cond, deadline)) {
+        LOG_ERROR("timeout");
+        side.cloud->SetError(VFS_ERR_TIMEOUT, "");
+        return false;
+    }
+    if (transfer.slot_state == kSlotAborted) {
+        // An upload without data would replace what stands at the target by an empty file.
+        side.cloud->SetError(VFS_ERR_TRANSFER_ABORTED, "");
+        return false;
+    }
+    // The source knows its size better than the caller.
+    side.meta["total_bytes"] = static_cast<Json::UInt64>(transfer.bytes_left);
+    return true;
+}
+
+bool UploadAll(Side& side) {
+    if (!WaitForData(side) || !side.cloud->Upload(&side.xfer, side.meta)) {
+        return false;
+    }
+    const SlotLock lock;
+    if (transfer.bytes_left != 0) {
+        LOG_ERROR("Upload left out %llu bytes", transfer.bytes_left);
+        side.cloud->SetError(VFS_ERR_TRANSFER_ABORTED, "");
+        return false;
+    }
+    return true;
+}
+
+void* UploadThread(void* argument) {
+    Side& side = *static_cast<Side*>(argument);
+    const bool done = Guard(*side.cloud, [&side] { return UploadAll(side); });
+    const SlotLock lock;
+    if (done) {
+        SetPlatformErr(0);
+    }
+    transfer.slot_state = done ? kUploadDone : kSlotAborted;
+    pthread_cond_signal(&transfer.slot_free_cond);
+    return nullptr;
+}
+
+void* DownloadThread(void* argument) {
+    Side& side = *static_cast<Side*>(argument);
+    const bool done =
+        Guard(*side.cloud, [&side] { return side.cloud->Download(&side.xfer, side.meta); });
+    const SlotLock lock;
+    if (done) {
+        SetPlatformErr(0);
+    }
+    if (!done) {
+        transfer.slot_state = kSlotAborted;
+    } else if (transfer.slot_state != kSlotAborted) {  // what has failed stays so
+        transfer.slot_state = kDownloadDone;
+    }
+    pthread_cond_signal(&transfer.slot_full_cond);
+    return nullptr;
+}
+
+bool Start(Side& side, void* (*body)(void*)) {
+    const int error = pthread_create(&side.thread, nullptr, body, &side);
+    if (error != 0) {
+        LOG_ERROR("Couldn't run thread, errno %d\n", error);
+    }
+    return error == 0;
+}
+
+/** Ends what waits in the slot. */
+void AbortSlot() {
+    const SlotLock lock;
+    transfer.slot_state = kSlotAborted;
+    pthread_cond_signal(&transfer.slot_full_cond);
+}
+
+bool RunBoth(Side& source, Side& target) {
+    if (!Start(target, UploadThread)) {
+        return false;
+    }
+    const bool started = Start(source, DownloadThread);
+    if (started) {
+        pthread_join(source.thread, nullptr);
+    } else {
+        // The upload has nothing to wait for; its objects are the caller's, so that it must not
+        // outlive this call.
+        AbortSlot();
+    }
+    pthread_join(target.thread, nullptr);
+    return started;
+}
+
+/** False, reported, when the driver has an error code. */
+bool Report(const Cloud& cloud, const char* text, SourceLine at = SourceLine::Here()) {
+    const __tag_vfs_err_ code = cloud.GetErrorCode();
+    if (code == VFS_ERR_NONE) {
+        return true;
+    }
+    SetPlatformErrorFromCode(code);
+    LOG_ERROR_AT(at, text, json::toString(cloud.GetError()).c_str(), YLIBCErrGet());
+    return false;
+}
+
+bool CopyBoth(Cloud& src, Cloud& dst, const std::string& src_uri, const std::string& dst_uri,
+              long long size) {
+    Side source{&src, {}, {CopyWriteCallback, 0, nullptr}, Json::objectValue, {}};
+    Side target{&dst, {}, {CopyReadCallback, 1, nullptr}, Json::objectValue, {}};
+    source.xfer.context = &source.context;
+    target.xfer.context = &target.context;
+    dst.GetMetaDataByURI(dst_uri, target.meta, "Upload");
+    target.meta["total_bytes"] = static_cast<Json::Int64>(size);
+    target.meta["filesize"] = static_cast<Json::Int64>(size);
+    src.GetMetaDataByURI(src_uri, source.meta, "Download");
+    const SlotInUse slot;
+    return RunBoth(source, target) && Report(src, "Download Failed, err:%s, zyroerr=%x") &&
+           Report(dst, "Upload Failed, err:%s, zyroerr=%x");
+}
+
+}  // namespace
+
+bool Cloud::CopyFile(Cloud* src, Cloud* dst, const std::string& src_uri, const std::string& dst_uri,
+                     long long size, ProgressCallback progress, CancelCallback cancel,
+                     SpeedCallback speed) {
+    if (src == nullptr || dst == nullptr || src == dst) {
+        LOG_ERROR("A copy needs two drivers");
+        return false;
+    }
+    BeginTransfer(static_cast<unsigned long long>(size), {progress, cancel, speed});
+    transfer.watched_pid = getpid();
+    return Guard(*dst, [&] { return CopyBoth(*src, *dst, src_uri, dst_uri, size); });
+}
+
+}  // namespace ZYROCloud

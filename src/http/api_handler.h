@@ -1,0 +1,204 @@
+/**
+ * One conversation with a service over one libcurl handle: HTTP, WebDAV, FTP or SFTP.
+ *
+ * A driver owns one APIHandler and uses it for request after request, so that connections stay
+ * open. For each request: Init(), then the description (URL, headers, parameters, method) and the
+ * direct options, then Process(), then GetResponse() or GetError(). What a failure means and
+ * whether it is worth a retry is the ErrorHandler's to say.
+ *
+ * Operations answer bool, true for success, unless stated otherwise. Values of the wrong type in a
+ * description make Process fail; it never throws. One thread at a time.
+ */
+#ifndef ZYROVFS_HTTP_API_HANDLER_H
+#define ZYROVFS_HTTP_API_HANDLER_H
+
+#include <curl/curl.h>
+#include <json/value.h>
+
+#include <string>
+#include <vector>
+
+#include "core/handle.h"
+#include "core/source_line.h"
+#include "http/error_handler.h"
+#include "zyrovfs/cloud.h"
+
+namespace ZYROCloud {
+
+/** What libcurl calls to go back in the bytes to send: CURL_SEEKFUNC_... */
+using SeekCallback = int (*)(void* context, curl_off_t offset, int origin);
+
+class APIHandler {
+  public:
+    /** `share`, not owned, gives handles a common store of names and TLS sessions; may be null. */
+    explicit APIHandler(CURLSH* share = nullptr);
+    APIHandler(const APIHandler&) = delete;
+    APIHandler& operator=(const APIHandler&) = delete;
+    ~APIHandler();
+
+    /**
+     * Forgets the last request and sets what all requests share. What SetReturnOnError said before
+     * is in force from here on. On failure the error handler knows of it.
+     */
+    bool Init();
+    /** Forgets the last request, its answer and all options. Open connections stay. */
+    void Reset();
+    /** The handle, null when there is none; owned by this object. */
+    CURL* GetCurlHandler() const { return curl_; }
+
+    // --- description of the request ------------------------------------------------------------
+
+    /** With `need_escape` each part of the path is escaped at Process. */
+    bool SetURL(const std::string& url, bool need_escape);
+    /**
+     * For URLs of users' own servers: dav and davs become http and https, with the certificate that
+     * the user trusts; sftp gets the user's known hosts; ftp, ftps and sftp go without a proxy.
+     * The answer is always false and means nothing.
+     */
+    bool SetVFSURL(const std::string& url);
+
+    /** All of a kind at once, in place of what was there. False when it is not an object. */
+    bool AddHeader(const Json::Value& headers);
+    bool AddGetParam(const Json::Value& params);
+    /** The body as JSON text. */
+    bool AddPostRawParam(const Json::Value& params);
+    /** The body as a form; wins over AddPostRawParam. */
+    bool AddPostParam(const Json::Value& params);
+
+    /** One more. False for an empty name or value; to drop a header of libcurl's own (Expect), give
+     * its empty value in the object form. */
+    bool AddHeader(const std::string& name, const std::string& value);
+    bool AddGetParam(const std::string& name, const std::string& value);
+    bool AddGetParam(const std::string& name, const char* value);
+    bool AddGetParam(const std::string& name, bool value);
+    /** A number would turn into a bool. */
+    template <typename T>
+    bool AddGetParam(const std::string& name, T value) = delete;
+    bool AddPostParam(const std::string& name, const std::string& value);
+
+    /** A method other than the one that follows from the body. False for "". */
+    bool SetReqMethod(const std::string& method);
+    /** A multipart body. Not owned, must outlive Process; null for none. */
+    bool SetFormUploadData(FormUploadData* form);
+    /** Before Init: whether libcurl fails a status of 400 or more, without its body. Default true,
+     * and stays set for later requests. */
+    bool SetReturnOnError(bool return_on_error);
+    /** Required before Process. Owned from here on; an earlier one is deleted. */
+    bool SetErrorHandler(ErrorHandler* handler);
+
+    // --- direct options: after Init. Failures are logged and known to the error handler ---------
+
+    /** Null leaves the function or the data as it is, here and in the next three. */
+    bool SetWriteFunAndData(CurlCallback function, void* data);
+    bool SetReadFunAndData(CurlCallback function, void* data);
+    bool SetHeaderFunAndData(CurlCallback function, void* data);
+    /**
+     * How to go back in what the read function gives: libcurl needs it when a kept connection dies
+     * in the middle of a body, or the body is asked for again. For sources that can seek; offset 0
+     * is the first byte of this body. The file part of a form uses the function, too, with the
+     * context of its XferData in place of `data`.
+     */
+    bool SetSeekFunAndData(SeekCallback function, void* data);
+
+    /** The body comes from the read function. `mute` throws the answer's body away. */
+    bool SetUploadOpt(bool mute);
+    bool SetUploadSize(long long size);
+    bool SetUserPwOpt(const std::string& user, const std::string& password);
+    /** FTP commands to send before the transfer; `*commands` stays the caller's and must outlive
+     * Process. The text is not read. */
+    bool SetCodePage(const std::string& code_page, curl_slist** commands);
+    bool SetFTPEPSV(bool on);
+    /** One CWD for the whole path, or one for each folder of it. */
+    bool SetFTPCWD(bool single);
+    /** "from-to" as in a Range header without its unit; "" does nothing. */
+    bool SetRange(const std::string& range);
+    bool SetNoBody(bool on);
+    /** In force from the next Init on. False when there is no handle or no share. */
+    bool SetShareCurlHandler(void* share);
+    /** How to trust the server of a davs URL; the answer is true only for a failure. */
+    bool SetSSLOpt(const std::string& url);
+
+    // --- the transfer and its results -----------------------------------------------------------
+
+    /**
+     * Performs the request, up to `retries` + 1 times (a negative number counts as 0), with the
+     * sleeps that the error handler asks for, also behind the last attempt. False leaves the cause
+     * in GetError(); a request that could not be set up leaves the earlier record.
+     */
+    bool Process(int retries);
+
+    /** The body of the last attempt's answer. */
+    std::string GetResponse() const { return response_; }
+    /** Name to text for each header line of the last attempt, redirects included. */
+    Json::Value GetHeaderResponse() const { return response_header_; }
+    /** The error handler's record, null without one. */
+    Json::Value GetError() const;
+    bool IsNeedRetry();
+    unsigned int GetRetrySleepTime();
+    void ResetRespString();
+    void ResetRespHeader();
+    /** Gives a libcurl result, with the status and body at hand, to the error handler. True when it
+     * counts as a success; false without a handler. */
+    bool ParseCurlError(CURLcode code);
+
+    // --- callbacks for libcurl -------------------------------------------------------------------
+
+    static size_t WriteToStrBuf(char* data, size_t size, size_t count, std::string* out) noexcept;
+    static size_t MutedWriteCallback(void* data, size_t size, size_t count, void*) noexcept;
+    /** Stores one header line. std::out_of_range for a name and a colon with nothing behind. */
+    static size_t WriteHeaderToJsonValue(char* line, size_t size, size_t count, Json::Value* out);
+    static int WriteToDebugStr(CURL* curl, curl_infotype type, char* text, size_t size,
+                               std::string* out);
+
+    /** Query or form text: "name=escaped&name=escaped". Names are not escaped. Json::Exception for
+     * a value that has no text. */
+    std::string BuildParamString(const Json::Value& params);
+    /** Text up to the first NUL, escaped for a URL; "" on failure. */
+    std::string EscapeURLString(const std::string& text);
+    /** Appends a line per header of the description; the caller frees the list in any case.
+     * Json::Exception for a value that has no text. */
+    bool BuildHeaderParam(curl_slist** list);
+
+  private:
+    bool SetBasicOpt();
+    /** Whether libcurl took an option; a refusal is logged in the name of `at`. */
+    static bool Taken(CURLcode code, const char* what,
+                      ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
+    /** Taken, and the error handler knows of a refusal. */
+    bool Accept(CURLcode code, const char* what,
+                ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
+    bool SetMember(const char* key, const Json::Value& object);
+    bool AddMember(const char* key, const std::string& name, const Json::Value& value);
+    void UsePinnedCertificate(const std::string& path);
+    std::string LoggableUrl() const;
+    bool SetHeaders(curl_slist** list);
+    bool SetTarget();
+    bool SetBody();
+    bool SetMethod();
+    bool SetForm(curl_mime** form);
+    bool SetUp(curl_slist** headers, curl_mime** form);
+    bool Perform(int attempts);
+    CURLcode Transfer();
+    bool CanSendAgain();
+    void AdaptTo(CURLcode code, int failed);
+
+    CURL* curl_;
+    std::string response_;
+    std::string spare_text_;  // no longer used; keeps the layout
+    Json::Value request_;
+    Json::Value response_header_;
+    Json::Value spare_value_;  // no longer used; keeps the layout
+    CURLSH* share_;
+    ErrorHandler* error_handler_ = nullptr;
+    bool return_on_error_ = true;
+    FormUploadData* form_data_ = nullptr;
+    char* cert_data_ = nullptr;
+    SeekCallback seek_function_ = nullptr;
+    void* seek_data_ = nullptr;
+    /** Connections that are still open may check against these once more. */
+    std::vector<ZYROVFS::UniqueCString> old_cert_data_;
+};
+
+}  // namespace ZYROCloud
+
+#endif

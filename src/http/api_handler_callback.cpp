@@ -1,0 +1,49 @@
+#include <algorithm>
+#include <stdexcept>
+
+#include "http/api_handler.h"
+
+namespace ZYROCloud {
+
+size_t APIHandler::WriteToStrBuf(char* data, size_t size, size_t count, std::string* out) noexcept {
+    try {
+        out->append(data, size * count);
+    } catch (const std::exception&) {
+        return 0;  // no memory for it: libcurl ends the transfer
+    }
+    return size * count;
+}
+
+size_t APIHandler::MutedWriteCallback(void*, size_t size, size_t count, void*) noexcept {
+    return size * count;
+}
+
+size_t APIHandler::WriteHeaderToJsonValue(char* line, size_t size, size_t count, Json::Value* out) {
+    constexpr size_t kLineEnd = 2;
+    const std::string whole(line, size * count);
+    const size_t colon = whole.find(':');
+    if (colon == std::string::npos) {
+        return whole.size();
+    }
+    const std::string text = whole.substr(0, whole.size() - std::min(whole.size(), kLineEnd));
+    // What follows the colon is a blank, and nobody asks.
+    (*out)[text.substr(0, colon)] = text.substr(colon + 2);
+    return whole.size();
+}
+
+int APIHandler::WriteToDebugStr(CURL*, curl_infotype type, char* text, size_t size,
+                                std::string* out) {
+    static constexpr const char* kLabels[] = {"<= Recv header", "=> Send header", "<= Recv data",
+                                              "=> Send data"};
+    if (type == CURLINFO_TEXT) {
+        out->append(text, size);
+    } else if (type >= CURLINFO_HEADER_IN && type <= CURLINFO_DATA_OUT) {
+        out->append(kLabels[type - CURLINFO_HEADER_IN]);
+    } else {
+        return 0;
+    }
+    out->append("\n");
+    return 0;
+}
+
+}  // namespace ZYROCloud

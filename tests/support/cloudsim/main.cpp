@@ -1,0 +1,324 @@
+/** Simulated clouds as a program, for the demo, benchmarks and clients that cannot link them. */
+#include <sys/resource.h>
+
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <exception>
+#include <filesystem>
+#include <fstream>
+#include <iostream>
+#include <sstream>
+#include <stdexcept>
+
+#include "support/cloudsim/cloudsim.h"
+#include "support/test_certs.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+const char kUsage[] = R"(cloudsim --box [OPTION]...
+cloudsim --make-tls FOLDER [NAME]...    makes ca.pem, cert.pem and key.pem for these names
+
+Serves a simulated cloud on loopback until it is told to end (SIGTERM, SIGINT), and prints how to
+reach it, as NAME=VALUE lines, the last of them "ready". Its exit status is 3 when a declared fault
+was not used.
+
+  --tls CERT KEY        PEM files of the server; without, plain HTTP
+  --port N              0, the default, takes any
+  --address HOST        one name or address for everything (127.0.0.1), instead of
+                        localhost, upload.localhost and dl.localhost
+  --hosts API UPLOAD DOWNLOAD
+                        these names instead
+  --account EMAIL       one more account; what follows is about it
+    --name NAME           of its user
+    --serve FOLDER        what lies there is its tree; changes are made there as well
+    --many N SIZE         N files in a folder "many", made of a pattern
+    --pattern NAME SIZE   one such file
+    --quota BYTES         --max-upload BYTES
+    --tokens FILE         the pair of tokens that it starts with, written there as JSON
+  --client ID:SECRET    of the token endpoint (client:secret unless given)
+  --token-life SECONDS  of all tokens given (3600)
+  --keep-refresh-tokens they can be used more than once
+  --max-offset N        of listings (10000)
+  --spool FOLDER        keeps uploads in unnamed files there (in memory unless given)
+  --sink                counts and sums up uploads, and keeps nothing of them
+  --no-sums             leaves out SHA-1 of bodies and uploads until somebody asks
+  --journal FILE        every request as one line of JSON
+  --fault TEXT          such as "GET /2.0/users/me after=1 times=2 answer=503 body=busy"; words:
+                        host= after= times= answer= status= body= header=NAME:VALUE line= raw=
+                        delay= rate= upload-rate= cut= cut-upload= close=before|after|effect reset
+                        close-after-answer range=ignore|start|short expire-token
+)";
+
+struct AccountPlan {
+    std::string email, name, served, tokens;
+    std::vector<std::pair<std::string, uint64_t>> patterns;
+    size_t many = 0;
+    uint64_t many_size = 0, quota = 0, max_upload = 0;
+};
+
+struct Plan {
+    cloudsim::BoxOptions options;
+    std::vector<AccountPlan> accounts;
+    std::vector<std::pair<std::string, std::string>> clients;
+    std::vector<cloudsim::Fault> faults;
+    int64_t token_life = 3600;
+    bool box = false, rotate = true;
+};
+
+std::string ReadAll(const std::string& path) {
+    std::ifstream file(path, std::ios::binary);
+    if (!file) {
+        throw std::runtime_error("cannot read " + path);
+    }
+    std::stringstream text;
+    text << file.rdbuf();
+    return text.str();
+}
+
+void WriteAll(const fs::path& path, const std::string& text) {
+    std::ofstream file(path, std::ios::binary);
+    if (!(file << text) || !file.flush()) {
+        throw std::runtime_error("cannot write " + path.string());
+    }
+}
+
+class Arguments {
+  public:
+    Arguments(int count, char** words) : next_(words + 1), end_(words + count) {}
+    bool Empty() const { return next_ == end_; }
+    std::string Word() {
+        return Empty() ? throw std::invalid_argument("a value is missing at the end") : *next_++;
+    }
+    uint64_t Number() {
+        const std::string word = Word();
+        const auto number = cloudsim::ParseNumber(word);
+        return number ? *number : throw std::invalid_argument("not a number: " + word);
+    }
+
+  private:
+    char** next_;
+    char** end_;
+};
+
+AccountPlan& LastAccount(Plan& plan) {
+    return plan.accounts.empty() ? throw std::invalid_argument("--account comes first")
+                                 : plan.accounts.back();
+}
+
+using Option = std::function<void(Plan&, Arguments&)>;
+
+const std::map<std::string, Option>& ServiceOptions() {
+    static const std::map<std::string, Option> options = {
+        {"--box", [](Plan& plan, Arguments&) { plan.box = true; }},
+        {"--tls",
+         [](Plan& plan, Arguments& in) {
+             plan.options.certificate = ReadAll(in.Word());
+             plan.options.key = ReadAll(in.Word());
+         }},
+        {"--port",
+         [](Plan& plan, Arguments& in) { plan.options.port = static_cast<int>(in.Number()); }},
+        {"--address",
+         [](Plan& plan, Arguments& in) {
+             plan.options.api_name = plan.options.upload_name = plan.options.download_name =
+                 in.Word();
+         }},
+        {"--hosts",
+         [](Plan& plan, Arguments& in) {
+             plan.options.api_name = in.Word();
+             plan.options.upload_name = in.Word();
+             plan.options.download_name = in.Word();
+         }},
+        {"--client",
+         [](Plan& plan, Arguments& in) {
+             const std::string pair = in.Word();
+             const size_t colon = pair.find(':');
+             if (colon == std::string::npos) {
+                 throw std::invalid_argument("--client ID:SECRET");
+             }
+             plan.clients.emplace_back(pair.substr(0, colon), pair.substr(colon + 1));
+         }},
+        {"--token-life",
+         [](Plan& plan, Arguments& in) { plan.token_life = static_cast<int64_t>(in.Number()); }},
+        {"--keep-refresh-tokens", [](Plan& plan, Arguments&) { plan.rotate = false; }},
+        {"--max-offset", [](Plan& plan, Arguments& in) { plan.options.max_offset = in.Number(); }},
+        {"--spool",
+         [](Plan& plan, Arguments& in) {
+             plan.options.storage = {cloudsim::Storage::Kind::kFolder, in.Word()};
+         }},
+        {"--sink",
+         [](Plan& plan, Arguments&) {
+             plan.options.storage.kind = cloudsim::Storage::Kind::kCountOnly;
+         }},
+        {"--no-sums",
+         [](Plan& plan, Arguments&) {
+             plan.options.journal_hashes = plan.options.hash_uploads = false;
+         }},
+        {"--journal", [](Plan& plan, Arguments& in) { plan.options.journal_file = in.Word(); }},
+        {"--fault",
+         [](Plan& plan, Arguments& in) { plan.faults.push_back(cloudsim::ParseFault(in.Word())); }},
+    };
+    return options;
+}
+
+const std::map<std::string, Option>& AccountOptions() {
+    static const std::map<std::string, Option> options = {
+        {"--account",
+         [](Plan& plan, Arguments& in) {
+             plan.accounts.emplace_back();
+             plan.accounts.back().email = in.Word();
+         }},
+        {"--name", [](Plan& plan, Arguments& in) { LastAccount(plan).name = in.Word(); }},
+        {"--serve", [](Plan& plan, Arguments& in) { LastAccount(plan).served = in.Word(); }},
+        {"--tokens", [](Plan& plan, Arguments& in) { LastAccount(plan).tokens = in.Word(); }},
+        {"--many",
+         [](Plan& plan, Arguments& in) {
+             LastAccount(plan).many = in.Number();
+             LastAccount(plan).many_size = in.Number();
+         }},
+        {"--pattern",
+         [](Plan& plan, Arguments& in) {
+             const std::string name = in.Word();
+             LastAccount(plan).patterns.emplace_back(name, in.Number());
+         }},
+        {"--quota", [](Plan& plan, Arguments& in) { LastAccount(plan).quota = in.Number(); }},
+        {"--max-upload",
+         [](Plan& plan, Arguments& in) { LastAccount(plan).max_upload = in.Number(); }},
+    };
+    return options;
+}
+
+Plan ReadPlan(Arguments in) {
+    Plan plan;
+    // Of a long-running server only the file keeps what came.
+    plan.options.keep_journal = false;
+    while (!in.Empty()) {
+        const std::string word = in.Word();
+        auto option = ServiceOptions().find(word);
+        if (option == ServiceOptions().end()) {
+            option = AccountOptions().find(word);
+            if (option == AccountOptions().end()) {
+                throw std::invalid_argument("unknown option " + word);
+            }
+        }
+        option->second(plan, in);
+    }
+    if (!plan.box || plan.accounts.empty()) {
+        throw std::invalid_argument("--box and at least one --account are needed");
+    }
+    return plan;
+}
+
+void MakeTls(Arguments in) {
+    const fs::path folder = in.Word();
+    tls::CertSpec spec;
+    spec.dns_names = {"localhost", "upload.localhost", "dl.localhost"};
+    while (!in.Empty()) {
+        spec.dns_names.push_back(in.Word());
+    }
+    const tls::Identity authority = tls::MakeAuthority("cloudsim test authority");
+    const tls::Identity server = tls::Make(spec, &authority);
+    fs::create_directories(folder);
+    WriteAll(folder / "ca.pem", authority.certificate);
+    WriteAll(folder / "cert.pem", server.certificate);
+    WriteAll(folder / "key.pem", server.key);
+}
+
+void Say(const std::string& name, const std::string& value) {
+    std::cout << name << '=' << value << '\n';
+}
+
+void Fill(cloudsim::BoxService& box, const AccountPlan& plan, int64_t life) {
+    cloudsim::Account& account = box.AddAccount(plan.email, plan.name);
+    if (plan.quota != 0) {
+        account.SetQuota(plan.quota);
+    }
+    if (plan.max_upload != 0) {
+        account.SetMaxUpload(plan.max_upload);
+    }
+    if (!plan.served.empty()) {
+        account.Serve(plan.served);
+    }
+    if (plan.many != 0) {
+        account.AddMany(account.AddFolder(account.Root(), "many"), plan.many, plan.many_size);
+    }
+    for (const auto& [name, size] : plan.patterns) {
+        account.AddPattern(account.Root(), name, size);
+    }
+    const cloudsim::Tokens tokens = account.IssueTokens(life);
+    Say("account", account.Email());
+    Say("access_token", tokens.access_token);
+    Say("refresh_token", tokens.refresh_token);
+    if (!plan.tokens.empty()) {
+        Json::Value document;
+        document["email"] = account.Email();
+        document["access_token"] = tokens.access_token;
+        document["refresh_token"] = tokens.refresh_token;
+        document["expire_time"] = Json::Int64(box.Now() + life);
+        WriteAll(plan.tokens, cloudsim::OneLine(document) + "\n");
+    }
+}
+
+/** An open descriptor for each file of a served folder. */
+void AllowManyFiles() {
+    rlimit limit{};
+    getrlimit(RLIMIT_NOFILE, &limit);
+    limit.rlim_cur = limit.rlim_max;
+    setrlimit(RLIMIT_NOFILE, &limit);
+}
+
+int Serve(const Plan& plan) {
+    sigset_t ends;
+    sigemptyset(&ends);
+    sigaddset(&ends, SIGTERM);
+    sigaddset(&ends, SIGINT);
+    pthread_sigmask(SIG_BLOCK, &ends, nullptr);
+    AllowManyFiles();
+
+    cloudsim::BoxService box(plan.options);
+    box.SetTokenLife(plan.token_life);
+    box.SetRotation(plan.rotate);
+    for (const auto& [id, secret] : plan.clients) {
+        box.AddClient(id, secret);
+    }
+    for (const cloudsim::Fault& fault : plan.faults) {
+        box.AddFault(fault);
+    }
+    Say("api", box.ApiHost());
+    Say("upload", box.UploadHost());
+    Say("download", box.DownloadHost());
+    for (const AccountPlan& account : plan.accounts) {
+        Fill(box, account, plan.token_life);
+    }
+    std::cout << "ready" << std::endl;
+
+    int signal = 0;
+    sigwait(&ends, &signal);
+    const std::vector<std::string> unused = box.UnusedFaults();
+    for (const std::string& fault : unused) {
+        std::cerr << "cloudsim: fault not used: " << fault << '\n';
+    }
+    return unused.empty() ? 0 : 3;
+}
+
+}  // namespace
+
+int main(int count, char** words) {
+    try {
+        const std::string first = count > 1 ? words[1] : "--help";
+        if (first == "--help") {
+            std::cout << kUsage;
+            return 0;
+        }
+        if (first == "--make-tls") {
+            MakeTls({count - 1, words + 1});
+            return 0;
+        }
+        return Serve(ReadPlan({count, words}));
+    } catch (const std::exception& error) {
+        std::cerr << "cloudsim: " << error.what() << '\n';
+        return 2;
+    }
+}

@@ -1,0 +1,57 @@
+#include "support/cloudsim/service.h"
+
+#include <ctime>
+#include <stdexcept>
+
+namespace cloudsim {
+namespace {
+
+Journal::Options JournalOptions(const ServerOptions& options) {
+    return {options.journal_body_limit, options.keep_journal, options.journal_file};
+}
+
+}  // namespace
+
+Service::Service(const ServerOptions& options, const std::string& root_id)
+    : options_(options),
+      journal_(JournalOptions(options)),
+      tokens_([this] { return Now(); }),
+      tree_([this] { return Now(); }, root_id) {}
+
+Service::~Service() = default;
+
+void Service::Start() {
+    ServerHooks hooks;
+    hooks.begin = [this](Request& request) { return Begin(request); };
+    hooks.role = [this](const Request& request) { return Role(request); };
+    hooks.expire_token = [this](const Request& request) { tokens_.Expire(request.BearerToken()); };
+    server_ = std::make_unique<Server>(options_, journal_, faults_, std::move(hooks));
+}
+
+std::string Service::Address(const std::string& name) const {
+    const bool usual = Port() == (Secure() ? 443 : 80);
+    return (Secure() ? "https://" : "http://") + name + (usual ? "" : ":" + std::to_string(Port()));
+}
+
+void Service::AddClient(const std::string& id, const std::string& secret) {
+    tokens_.AddClient(id, secret);
+}
+
+Account& Service::AddAccount(const std::string& email, const std::string& name) {
+    const std::string shown = name.empty() ? email.substr(0, email.find('@')) : name;
+    const std::lock_guard<std::mutex> lock(mutex_);
+    const std::string id = std::to_string(270000001 + accounts_.size());
+    accounts_.push_back(std::make_unique<Account>(*this, email, shown, id));
+    tree_.AddAccount(*accounts_.back());
+    return *accounts_.back();
+}
+
+int64_t Service::Now() const {
+    return time(nullptr) + ahead_;
+}
+
+std::unique_ptr<Sink> Service::NewSink() const {
+    return MakeSink(options_.storage, options_.hash_uploads);
+}
+
+}  // namespace cloudsim

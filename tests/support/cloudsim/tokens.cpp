@@ -1,0 +1,105 @@
+#include "support/cloudsim/tokens.h"
+
+#include "support/cloudsim/http.h"
+
+namespace cloudsim {
+namespace {
+
+constexpr int64_t kRefreshLife = 60 * 24 * 3600;
+
+}  // namespace
+
+void TokenStore::AddClient(const std::string& id, const std::string& secret) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    clients_[id] = secret;
+    if (first_client_.empty()) {
+        first_client_ = id;
+    }
+}
+
+bool TokenStore::IsClient(const std::string& id, const std::string& secret) const {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    if (clients_.empty()) {
+        return id == "client" && secret == "secret";
+    }
+    const auto found = clients_.find(id);
+    return found != clients_.end() && found->second == secret;
+}
+
+std::string TokenStore::FirstClient() const {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    return first_client_.empty() ? "client" : first_client_;
+}
+
+Tokens TokenStore::Make(Account& account, const std::string& client, int64_t token_life) {
+    Tokens tokens;
+    tokens.access_token = RandomText(32);
+    tokens.refresh_token = RandomText(64);
+    tokens.expires_in = token_life;
+    access_[tokens.access_token] = {&account, client, now_() + token_life};
+    refresh_[tokens.refresh_token] = {&account, client, now_() + kRefreshLife};
+    last_[&account] = tokens;
+    return tokens;
+}
+
+Tokens TokenStore::Issue(Account& account, const std::string& client, int64_t token_life) {
+    const std::string of = client.empty() ? FirstClient() : client;
+    const std::lock_guard<std::mutex> lock(mutex_);
+    return Make(account, of, token_life);
+}
+
+Tokens TokenStore::Last(const Account& account) const {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    const auto found = last_.find(&account);
+    return found == last_.end() ? Tokens() : found->second;
+}
+
+Account* TokenStore::Owner(const std::string& access_token) const {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    const auto found = access_.find(access_token);
+    return found != access_.end() && now_() < found->second.expires ? found->second.account
+                                                                    : nullptr;
+}
+
+void TokenStore::Expire(const std::string& access_token) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    access_.erase(access_token);
+}
+
+void TokenStore::Drop(Grants& grants, const Account& account) {
+    for (auto grant = grants.begin(); grant != grants.end();) {
+        grant = grant->second.account == &account ? grants.erase(grant) : std::next(grant);
+    }
+}
+
+void TokenStore::ExpireAll(const Account& account) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    Drop(access_, account);
+}
+
+void TokenStore::RevokeAll(const Account& account) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    Drop(refresh_, account);
+}
+
+bool TokenStore::Refresh(const std::string& refresh_token, const std::string& client,
+                         Tokens& tokens) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    const auto found = refresh_.find(refresh_token);
+    if (found == refresh_.end() || found->second.client != client ||
+        found->second.expires <= now_()) {
+        return false;
+    }
+    Account& account = *found->second.account;
+    if (rotate) {
+        refresh_.erase(found);
+        tokens = Make(account, client, life);
+        return true;
+    }
+    tokens = {RandomText(32), refresh_token, life};
+    access_[tokens.access_token] = {&account, client, now_() + life};
+    last_[&account] = tokens;
+    return true;
+}
+
+}  // namespace cloudsim

@@ -1,0 +1,172 @@
+/**
+ * A Box driver before the simulated service, with a profile, a mounted tree and a client of its
+ * own. Tokens and secrets must not reach the log, and every fault that a test declares must have
+ * happened when it ends.
+ */
+#ifndef ZYROVFS_TESTS_BOX_FIXTURE_H
+#define ZYROVFS_TESTS_BOX_FIXTURE_H
+
+#include <gmock/gmock.h>
+#include <sys/mman.h>
+#include <unistd.h>
+#include <zosplatform/error.h>
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "cloud/box/box.h"
+#include "core/handle.h"
+#include "core/json.h"
+#include "core/paths.h"
+#include "http/api_handler.h"
+#include "support/cloudsim/cloudsim.h"
+#include "support/profiles.h"
+#include "support/seams.h"
+#include "support/xattrtree/xattrtree.h"
+#include "zyrovfs/cloud_utils.h"
+
+namespace ZYROCloud {
+
+using namespace ZYROVFS;  // NOLINT(google-build-using-namespace)
+using cloudsim::Fault;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+inline constexpr const char* kServerId = "box://amy@example.com";
+
+inline Json::Value Object(const std::string& text) {
+    Json::Value value;
+    EXPECT_TRUE(json::fromString(value, text)) << text;
+    return value;
+}
+
+/** The text of an array's members under this key. */
+inline std::vector<std::string> Each(const Json::Value& items, const char* key) {
+    std::vector<std::string> texts;
+    for (const Json::Value& item : items) {
+        texts.push_back(item[key].asString());
+    }
+    return texts;
+}
+
+class BoxTest : public profiles::ProfileTest {
+  protected:
+    BoxTest() : amy(service.AddAccount("amy@example.com", "Amy Doe")), root(amy.Root()) {}
+
+    void SetUp() override {
+        ProfileTest::SetUp();
+        service.AddClient("mine", kSecret);
+        Json::Value document;
+        document["hosts"]["BoxApiHost"] = service.ApiHost();
+        document["hosts"]["BoxUploadHost"] = service.UploadHost();
+        std::filesystem::create_directories(paths::kConfigRoot);
+        ASSERT_TRUE(json::toFile(document, paths::kServiceConfig, 0640));
+        ASSERT_TRUE(Utils::AddClient("box", "mine", kSecret));
+        Json::Value connections;
+        connections[kServerId]["protocol"] = "box";
+        connections[kServerId]["path"] = tree.Folder();
+        profiles::Put(profiles::VFS_CONFIG_CONNECT, connections);
+        Renew();
+        seams::Reset();
+        YLIBCErrSetEx(0, "test", 1);
+    }
+
+    void TearDown() override {
+        EXPECT_THAT(service.UnusedFaults(), IsEmpty()) << service.Journal().Text();
+        std::vector<std::string> secrets = {kSecret, granted.access_token, granted.refresh_token};
+        if (!amy.LastTokens().access_token.empty()) {
+            secrets.push_back(amy.LastTokens().access_token);
+            secrets.push_back(amy.LastTokens().refresh_token);
+        }
+        for (const std::string& secret : secrets) {
+            EXPECT_FALSE(seams::LoggedPart(secret)) << seams::LogDump();
+        }
+    }
+
+    /** A driver with fresh tokens, whose life the profile may tell. */
+    void Renew(const std::string& expire_time = "") {
+        granted = amy.IssueTokens(3600, "mine");
+        Json::Value profile;
+        profile["access_token"] = granted.access_token;
+        profile["refresh_token"] = granted.refresh_token;
+        profile["expire_time"] = expire_time;
+        profile["client_id"] = "mine";
+        profile["server_id"] = kServerId;
+        box = std::make_unique<Box>(profiles::kUser, profile);
+    }
+
+    /** Makes the mounted tree know what the account has at this path. */
+    void Show(const std::string& path) {
+        const cloudsim::Item item = amy.Get(amy.Find(path));
+        tree.Set(path, "id::file", (item.folder ? "folders/" : "files/") + item.id);
+    }
+
+    /** "GET /2.0/users/me" for each request so far. */
+    std::vector<std::string> Requests() const {
+        std::vector<std::string> lines;
+        for (const cloudsim::JournalEntry& entry : service.Journal().All()) {
+            lines.push_back(entry.method + " " + entry.Path());
+        }
+        return lines;
+    }
+    cloudsim::JournalEntry Last() const { return service.Journal().All().back(); }
+
+    static constexpr const char* kSecret = "secret-of-mine";
+    cloudsim::BoxService service;
+    cloudsim::Account& amy;
+    const std::string root;
+    XattrTree tree{"/tmp/box_tree"};
+    cloudsim::Tokens granted;
+    std::unique_ptr<Box> box;
+};
+
+/** The bytes of one upload or download, and a callback that behaves as a test wants. */
+struct Bytes {
+    explicit Bytes(int direction, const std::string& content = "")
+        : file(memfd_create("bytes", 0)),
+          xfer{direction == 1 ? &Bytes::Read : &Bytes::Write, direction, &context} {
+        now = this;
+        EXPECT_EQ(write(file.Get(), content.data(), content.size()),
+                  static_cast<ssize_t>(content.size()));
+        lseek(file.Get(), 0, SEEK_SET);
+        context.fd = file.Get();
+    }
+
+    static size_t Read(char* data, size_t size, size_t count, void*) {
+        if (now->cancel_at >= 0 && now->calls++ >= now->cancel_at) {
+            YLIBCErrSetEx(0xa600, "test", 1);
+            return CURL_READFUNC_ABORT;
+        }
+        return static_cast<size_t>(read(now->file.Get(), data, size * count));
+    }
+
+    static size_t Write(char* data, size_t size, size_t count, void*) {
+        now->context.can_retry = false;
+        if (now->cancel_at >= 0 && now->calls++ >= now->cancel_at) {
+            YLIBCErrSetEx(0xa600, "test", 1);
+            return 0;
+        }
+        if (now->impatient != nullptr) {
+            // The next second of silence is one too many.
+            curl_easy_setopt(now->impatient, CURLOPT_LOW_SPEED_LIMIT, 1000L);
+            curl_easy_setopt(now->impatient, CURLOPT_LOW_SPEED_TIME, 1L);
+        }
+        now->received.append(data, size * count);
+        return size * count;
+    }
+
+    static inline Bytes* now = nullptr;
+    UniqueFd file;
+    std::string received;
+    XferContext context;
+    XferData xfer;
+    int cancel_at = -1;  ///< number of the call that the user's cancel meets
+    int calls = 0;
+    CURL* impatient = nullptr;
+};
+
+}  // namespace ZYROCloud
+
+#endif
