@@ -1,6 +1,6 @@
 #include "support/cloudsim/tree.h"
 
-#include <wctype.h>
+#include <cwctype>
 
 #include <algorithm>
 #include <clocale>
