@@ -1,9 +1,8 @@
 #include "support/cloudsim/tree.h"
 
-#include <cwctype>
-
 #include <algorithm>
 #include <clocale>
+#include <cwctype>
 
 namespace cloudsim {
 namespace {
