@@ -5,6 +5,7 @@
 #include <cstring>
 #include <memory>
 
+#include "fold.h"
 #include "support.h"
 
 namespace {
@@ -17,13 +18,15 @@ bool IsAscii(char c) {
     return static_cast<signed char>(c) >= 0;
 }
 
-/**
- * A text by whose bytes it sorts: its UTF-8 stretches folded, other bytes as they are. Comparing
- * such keys is an order also of texts of which some are no UTF-8; deciding by pairs whether to
- * fold would not be.
- */
-std::string SortKey(const char* text) {
+}  // namespace
+
+namespace zos {
+
+std::string FoldCase(const char* text) {
     std::string key;
+    for (; IsAscii(*text) && *text != '\0'; ++text) {
+        key += g_ascii_tolower(*text);
+    }
     while (*text != '\0') {
         const char* end = nullptr;
         g_utf8_validate(text, -1, &end);
@@ -37,7 +40,7 @@ std::string SortKey(const char* text) {
     return key;
 }
 
-}  // namespace
+}  // namespace zos
 
 char* YLIBCStrTok(char* text, const char* delimiters, char** rest) {
     if (delimiters == nullptr || rest == nullptr || (text == nullptr && *rest == nullptr)) {
@@ -57,5 +60,6 @@ int YLIBCUnicodeUTF8StrCaseCmp(const char* a, const char* b) {
             return order;
         }
     }
-    return zos::OrOutOfMemory(strcmp(a, b), [&] { return SortKey(a).compare(SortKey(b)); });
+    return zos::OrOutOfMemory(strcmp(a, b),
+                              [&] { return zos::FoldCase(a).compare(zos::FoldCase(b)); });
 }

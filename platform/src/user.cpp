@@ -6,6 +6,7 @@
 #include <cstring>
 #include <vector>
 
+#include "name_service.h"
 #include "support.h"
 
 namespace {
@@ -28,23 +29,21 @@ PZYROUSER Copy(const passwd& entry) {
     return user;
 }
 
-/** `look_up` is getpwnam_r or getpwuid_r with the key bound. */
-template <typename LookUp>
-int Get(LookUp look_up, PZYROUSER* user) {
+/** `call` is getpwnam_r or getpwuid_r with the key bound. */
+template <typename Call>
+int Get(Call call, PZYROUSER* user) {
     *user = nullptr;
     passwd entry{};
-    passwd* found = nullptr;
-    std::vector<char> texts(1024);
-    int error = 0;
-    while ((error = look_up(&entry, texts, &found)) == ERANGE) {
-        texts.resize(texts.size() * 2);
-    }
-    if (found == nullptr) {
-        // The directory services of a host report an unknown name in several ways.
-        const bool unknown = error == 0 || error == ENOENT || error == ESRCH || error == EPERM;
-        SET_PLATFORM_ERROR(
-            zos::CodeOfErrno(unknown ? 0 : error, unknown ? ZOS_ERR_NO_SUCH_USER : ZOS_ERR_SYSTEM));
-        return kFailed;
+    std::vector<char> texts;
+    switch (zos::LookUp(call, entry, texts)) {
+        case zos::Lookup::kUnknown:
+            SET_PLATFORM_ERROR(ZOS_ERR_NO_SUCH_USER);
+            return kFailed;
+        case zos::Lookup::kFailed:
+            SET_SYSTEM_ERROR(ZOS_ERR_SYSTEM);
+            return kFailed;
+        case zos::Lookup::kFound:
+            break;
     }
     *user = Copy(entry);
     if (*user == nullptr) {
@@ -62,11 +61,9 @@ int ZYROUserGet(const char* name, PZYROUSER* user) {
         return kFailed;
     }
     return zos::OrOutOfMemory(kFailed, [&] {
-        return Get(
-            [name](passwd* entry, std::vector<char>& texts, passwd** found) {
-                return getpwnam_r(name, entry, texts.data(), texts.size(), found);
-            },
-            user);
+        return Get([name](passwd* entry, char* texts, size_t size,
+                          passwd** found) { return getpwnam_r(name, entry, texts, size, found); },
+                   user);
     });
 }
 
@@ -76,11 +73,9 @@ int ZYROUserGetByUID(uid_t uid, PZYROUSER* user) {
         return kFailed;
     }
     return zos::OrOutOfMemory(kFailed, [&] {
-        return Get(
-            [uid](passwd* entry, std::vector<char>& texts, passwd** found) {
-                return getpwuid_r(uid, entry, texts.data(), texts.size(), found);
-            },
-            user);
+        return Get([uid](passwd* entry, char* texts, size_t size,
+                         passwd** found) { return getpwuid_r(uid, entry, texts, size, found); },
+                   user);
     });
 }
 

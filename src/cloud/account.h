@@ -12,10 +12,11 @@
 namespace ZYROCloud {
 
 /**
- * Asks with the plain-text credentials of `profile`. False leaves the driver's error record in
- * `error`, or a null `error` when there was no memory for the driver.
+ * Asks with the plain-text credentials of `profile`; tokens that had to be renewed on the way are
+ * written into it, since a refresh token works once. False leaves the driver's error record in
+ * `error`, or a null `error` when there was no driver.
  */
-bool AskAccount(_tag_cloud_type type, unsigned int uid, const Json::Value& profile,
+bool AskAccount(_tag_cloud_type type, unsigned int uid, Json::Value& profile,
                 const Json::Value& params, Json::Value& out, Json::Value& error);
 
 }  // namespace ZYROCloud

@@ -125,10 +125,8 @@ Json::Value Cloud::GetError() const {
 }
 
 __tag_vfs_err_ Cloud::GetErrorCode() const {
-    const Json::Value* code =
-        error.isObject() ? error.find("code", "code" + strlen("code")) : nullptr;
-    return code != nullptr && code->isInt() ? static_cast<__tag_vfs_err_>(code->asInt())
-                                            : VFS_ERR_NONE;
+    const Json::Value code = error.isObject() ? error["code"] : Json::Value();
+    return code.isInt() ? static_cast<__tag_vfs_err_>(code.asInt()) : VFS_ERR_NONE;
 }
 
 bool Cloud::IsNeedRetry() {

@@ -2,6 +2,7 @@
 
 #include <unistd.h>
 
+#include <atomic>
 #include <cstdlib>
 #include <utility>
 
@@ -11,13 +12,12 @@
 namespace ZYROVFS {
 namespace {
 
-struct ErrorCell {
-    __tag_vfs_err_ code;
-    const char* file;
-    int line;
-};
-
-ErrorCell cell{};
+/** One for the process; both threads of a copy may renew a token, which sets it. */
+struct {
+    std::atomic<__tag_vfs_err_> code{VFS_ERR_NONE};
+    std::atomic<const char*> file{nullptr};
+    std::atomic<int> line{0};
+} cell;
 
 Json::Value& Detail() {
     static Json::Value detail;
@@ -27,11 +27,13 @@ Json::Value& Detail() {
 }  // namespace
 
 void VFSSetErrEx(__tag_vfs_err_ code, const char* file, int line) {
-    cell = {code, file, line};
+    cell.code = code;
+    cell.file = file;
+    cell.line = line;
 }
 
 void ResetError() {
-    cell = {};
+    VFSSetErrEx(VFS_ERR_NONE, nullptr, 0);
 }
 
 __tag_vfs_err_ GetError() {

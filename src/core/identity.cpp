@@ -122,6 +122,28 @@ EffectiveUid::~EffectiveUid() {
     }
 }
 
+RootUid::RootUid(SourceLine at) : saved_(geteuid()), at_(at) {
+    if (saved_ != 0 && seteuid(0) != 0) {
+        LOG_ERROR_AT(at_, "Fail to seteuid(0).");
+    }
+}
+
+RootUid::~RootUid() {
+    if (saved_ != 0 && seteuid(saved_) != 0) {
+        LOG_ERROR_AT(at_, "Fail to seteuid(%u).", saved_);
+    }
+}
+
+RootUntilRestored::RootUntilRestored(SourceLine at) : saved_(geteuid()) {
+    if (saved_ != 0) {
+        SetUid(0, at);
+    }
+}
+
+bool RootUntilRestored::Restore() const {
+    return geteuid() == saved_ || setresuid(kUnchanged, saved_, kUnchanged) == 0;
+}
+
 UserWithRootGroup::UserWithRootGroup(uid_t uid, SourceLine at)
     : saved_uid_(geteuid()), saved_gid_(0), at_(at) {
     if (saved_uid_ != uid && seteuid(uid) != 0) {

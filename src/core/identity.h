@@ -82,6 +82,41 @@ class EffectiveUid {
 };
 
 /**
+ * Form 3 as the task registry needs it: root's effective uid where it is not in force already. A
+ * switch that fails is logged in the name of `at`, and the block runs all the same.
+ */
+class RootUid {
+  public:
+    explicit RootUid(SourceLine at = SourceLine::Here());
+    RootUid(const RootUid&) = delete;
+    RootUid& operator=(const RootUid&) = delete;
+    ~RootUid();
+
+  private:
+    uid_t saved_;
+    SourceLine at_;
+};
+
+/**
+ * Effective uid root for one step, without a change of group. Nothing is given back until the owner
+ * says so: a step that failed leaves its process at root. A switch to root that fails is logged,
+ * and the step runs with the identity that there is.
+ */
+class RootUntilRestored {
+  public:
+    explicit RootUntilRestored(SourceLine at = SourceLine::Here());
+    RootUntilRestored(const RootUntilRestored&) = delete;
+    RootUntilRestored& operator=(const RootUntilRestored&) = delete;
+
+    /** Back to the uid of before; false, with errno, when that fails. */
+    bool Restore() const;
+    uid_t Saved() const { return saved_; }
+
+  private:
+    uid_t saved_;
+};
+
+/**
  * Form 3 as the start of the daemons needs it: effective uid of the user, effective group root.
  * Failures while leaving are logged in the name of `at` and change nothing else.
  */

@@ -15,6 +15,18 @@ inline constexpr const char* kServersFile = "servers.conf";
 inline constexpr const char* kServiceConfig = "/usr/zyro/etc/zyrovfs/cloud.conf";
 inline constexpr const char* kConnectFile = "connect.conf";
 
+/** Who may use remote connections. */
+inline constexpr const char* kPolicyFile = "/usr/zyro/etc/zyrovfs/user.conf";
+/** What the platform's update of domain and LDAP entries leaves while it runs and when it is done.
+ */
+inline constexpr const char* kDomainUpdating = "/tmp/domain_updating";
+inline constexpr const char* kDomainUserPid = "/tmp/domain_user.pid";
+inline constexpr const char* kDomainGroupPid = "/tmp/domain_group.pid";
+inline constexpr const char* kLdapUserList = "/usr/zyro/etc/private/ldap_user";
+inline constexpr const char* kLdapGroupList = "/usr/zyro/etc/private/ldap_group";
+inline constexpr const char* kUserListLock = "/tmp/userlock";
+inline constexpr const char* kGroupListLock = "/tmp/grouplock";
+
 inline constexpr const char* kCatalogueDir = "/usr/share/gvfs/mounts";
 inline constexpr const char* kCaBundle = "/etc/ssl/certs/ca-certificates.crt";
 
@@ -56,6 +68,10 @@ inline std::string GvfsdFusePid(unsigned int uid) {
 }
 inline std::string FuseTree(unsigned int uid) {
     return RuntimeDir(uid) + "/gvfs";
+}
+/** Queues of background jobs, a folder for each type of job. */
+inline std::string TaskRoot(unsigned int uid) {
+    return RuntimeDir(uid) + "/zyrovfs/task";
 }
 
 inline std::string MountLock(unsigned int uid) {

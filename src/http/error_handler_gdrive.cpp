@@ -64,7 +64,7 @@ bool GDriveErrorHandler::ParseError(int response_code, __tag_vfs_err_* code) {
     }
     LOG_ERROR("google-drive response error code=%d", response_code);
     const auto reason = [this] {
-        const std::string text = ReasonOf(Message());
+        std::string text = ReasonOf(Message());
         SetMessage(text);
         return text;
     };

@@ -3,6 +3,7 @@
 #include "core/error_cell.h"
 #include "core/log.h"
 #include "zyrovfs/global.h"
+#include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"
 
@@ -27,6 +28,31 @@ bool FindLocalPath(unsigned int uid, const std::string& id, const std::string& u
     }
     LOG_ERROR_AT(at, "Failed to get the path by %s, uid %u", id.c_str(), uid);
     return Fail(VFS_ERR_FAILED, at);
+}
+
+bool WriteSecret(const char* key, const std::string& plain, bool encrypt, Json::Value& out,
+                 SourceLine at) {
+    if (!encrypt) {
+        out[key] = plain;
+        return true;
+    }
+    char cipher[4096];
+    if (!SzEncrypt(plain.c_str(), cipher, sizeof cipher)) {
+        LOG_ERROR_AT(at, "SzEncrypt failed, " ZYROERR_FORMAT, ZYROERR_ARGS);
+        return Fail(VFS_ERR_UNKNOWN, at);
+    }
+    out[key] = cipher;
+    return true;
+}
+
+bool DecipherSecret(const char* key, Json::Value& conf, SourceLine at) {
+    char plain[4097];
+    if (!SzDecrypt(conf[key].asCString(), plain, sizeof plain)) {
+        LOG_ERROR_AT(at, "SzDecrypt failed, " ZYROERR_FORMAT, ZYROERR_ARGS);
+        return Fail(VFS_ERR_FAILED, at);
+    }
+    conf[key] = plain;
+    return true;
 }
 
 std::string AccountNameOf(const std::string& email) {

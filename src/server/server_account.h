@@ -28,6 +28,13 @@ bool FindLocalPath(unsigned int uid, const std::string& id, const std::string& u
                    const std::string& codepage, std::string& remote, std::string& local,
                    SourceLine at = SourceLine::Here());
 
+/** Writes a credential, enciphered when asked for. False is logged: VFS_ERR_UNKNOWN. */
+bool WriteSecret(const char* key, const std::string& plain, bool encrypt, Json::Value& out,
+                 SourceLine at = SourceLine::Here());
+
+/** Deciphers a credential in place. False is logged: VFS_ERR_FAILED. */
+bool DecipherSecret(const char* key, Json::Value& conf, SourceLine at = SourceLine::Here());
+
 // --- types that are known by an e-mail --------------------------------------------------------
 
 /** The e-mail up to its last at sign; all of it when there is none. */

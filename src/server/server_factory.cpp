@@ -3,6 +3,7 @@
 #include <new>
 
 #include "core/log.h"
+#include "server/server_box.h"
 #include "server/server_sharing.h"
 #include "server/server_vfs.h"
 
@@ -15,7 +16,7 @@ std::unique_ptr<ServerBase> Make() {
 }
 
 std::unique_ptr<ServerBase> NotBuilt() {
-    LOG_ERROR("Clouds are not part of this build");
+    LOG_ERROR("This cloud is not part of this build");
     return nullptr;
 }
 
@@ -28,7 +29,7 @@ constexpr Row kTypes[] = {
     {"google", NotBuilt},
     {"dropbox", NotBuilt},
     {"onedrive", NotBuilt},
-    {"box", NotBuilt},
+    {"box", Make<BoxServer>},
     {"sharing", Make<SharingServer>},
 };
 

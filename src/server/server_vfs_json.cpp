@@ -5,24 +5,6 @@
 #include "server/server_vfs.h"
 
 namespace ZYROVFS::Server {
-namespace {
-
-bool WritePassword(const std::string& password, bool encrypt, Json::Value& out) {
-    if (!encrypt) {
-        out["password"] = password;
-        return true;
-    }
-    char cipher[4096];
-    if (!SzEncrypt(password.c_str(), cipher, sizeof cipher)) {
-        LOG_ERROR("SzEncrypt failed, " ZYROERR_FORMAT, ZYROERR_ARGS);
-        return Fail(VFS_ERR_UNKNOWN);
-    }
-    out["password"] = cipher;
-    return true;
-}
-
-}  // namespace
-
 bool VFSServer::CreateJsonObj(unsigned int uid, VFS_CONFIG_MODE mode, Json::Value& out,
                               bool encrypt) {
     return NoThrow(VFS_ERR_BAD_PARAM, [&] {
@@ -36,7 +18,7 @@ bool VFSServer::CreateJsonObj(unsigned int uid, VFS_CONFIG_MODE mode, Json::Valu
         out["uri_path"] = uri_path_;
         out["path"] = "";
         out["max_connection"] = max_connection_;
-        if (!WritePassword(password_, encrypt, out)) {
+        if (!WriteSecret("password", password_, encrypt, out)) {
             return false;
         }
         std::string id;
@@ -75,18 +57,8 @@ void VFSServer::WriteRemotePath(unsigned int uid, const std::string& id, Json::V
 }
 
 bool VFSServer::DecryptCredentials(unsigned int, VFS_CONFIG_MODE, Json::Value& conf) {
-    return NoThrow(VFS_ERR_FAILED, [&] {
-        if (!conf.isMember("password")) {
-            return true;
-        }
-        char plain[4097];
-        if (!SzDecrypt(conf["password"].asCString(), plain, sizeof plain)) {
-            LOG_ERROR("SzDecrypt failed, " ZYROERR_FORMAT, ZYROERR_ARGS);
-            return Fail(VFS_ERR_FAILED);
-        }
-        conf["password"] = plain;
-        return true;
-    });
+    return NoThrow(VFS_ERR_FAILED,
+                   [&] { return !conf.isMember("password") || DecipherSecret("password", conf); });
 }
 
 bool VFSServer::RemoveCredentials(unsigned int, VFS_CONFIG_MODE, Json::Value& conf) {

@@ -3,6 +3,7 @@
 #include <zosplatform/process.h>
 
 #include <cerrno>
+#include <cstdlib>
 #include <memory>
 
 #include "core/handle.h"
@@ -82,6 +83,9 @@ void RemoveFiles(unsigned int uid, bool removeProfiles, bool removeRuntime) {
 }
 
 void CleanUp(unsigned int uid, bool removeProfiles, bool removeRuntime) {
+    // A process that has acted for somebody else knows that user's bus, and would look there for
+    // this one's mounts, find none and take them for gone. Without an address this user's is read.
+    unsetenv("DBUS_SESSION_BUS_ADDRESS");
     InitGlobal(uid, true);
     if (!IsAnyDaemonDead()) {
         // A damaged list of connections must not keep the files in place.

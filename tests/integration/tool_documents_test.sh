@@ -48,17 +48,21 @@ check_command() {
 }
 
 count=0
-expect "$(commands_of | sort | xargs)" zyrovfs ""
-for group in $(commands_of); do
-  commands=$(commands_of "$group" | sort | xargs)
-  [ -z "$commands" ] || expect "$commands" zyrovfs "$group" ""
-  for command in ${commands:-""}; do
-    count=$((count + 1))
-    grep -q -e "$command" <<<"$page" || complain "the man page lacks '$group $command'"
-    check_command "$group" $command
-  done
-done
-[ $count = 18 ] || complain "found $count commands, not 18"
+# check_group WORD...: the commands of a group, and of the groups in it.
+check_group() {
+  local command commands
+  commands=$(commands_of "$@" | sort | xargs)
+  if [ -n "$commands" ]; then
+    expect "$commands" zyrovfs "$@" ""
+    for command in $commands; do check_group "$@" "$command"; done
+    return
+  fi
+  count=$((count + 1))
+  grep -q -e "${*: -1}" <<<"$page" || complain "the man page lacks '$*'"
+  check_command "$@"
+}
+check_group
+[ $count = 31 ] || complain "found $count commands, not 31"
 
 # Every command for a user that a document shows is one that the tool understands; there is no such
 # user here, so none does anything.
@@ -81,6 +85,12 @@ expect "" zyrovfs profile show --user amy x
 expect "" zyrovfs profile show ""
 expect "" zyrovfs connection delete --uid 4001 ""
 expect "amy" zyrovfs profile list --user amy
+zyrovfs task add copy job --pid $$ --user amy >/dev/null
+expect "copy" zyrovfs task clean --user amy ""
+expect "rmdir" zyrovfs task run copy --user amy -- rmdi
+expect "admin all" zyrovfs policy set --type a
+expect "amy" zyrovfs policy set --enable amy
+expect "sudo" zyrovfs policy set --enable-group sud
 expect "dav davs" zyrovfs profile list --protocol da
 [ $code != 0 ] || echo "man page and completion: ok"
 exit $code

@@ -76,7 +76,7 @@ inline void PlayMount(GMountOperation* operation) {
 
 inline void TakeSchemes() {
     setenv("GIO_USE_VFS", "local", 1);
-    for (const char* scheme : {"ftp", "sftp", "dav", "cifs", "sharing"}) {
+    for (const char* scheme : {"ftp", "sftp", "dav", "cifs", "sharing", "box"}) {
         scripted::Register(scheme);
     }
 }

@@ -86,6 +86,7 @@ struct Records {
     bool watch_children = false;
     std::function<void()> on_micro_sleep;
     std::optional<time_t> now;
+    std::function<void()> on_sleep;
 };
 
 Records& Get() {
@@ -181,6 +182,9 @@ extern "C" {
 
 unsigned sleep(unsigned seconds) {
     Keep({Entry::kSleep, static_cast<int>(seconds), ""});
+    if (Get().on_sleep) {
+        Get().on_sleep();
+    }
     return 0;
 }
 
@@ -305,6 +309,10 @@ void SetTime(time_t now) {
 
 void OnMicroSleep(std::function<void()> hook) {
     Get().on_micro_sleep = std::move(hook);
+}
+
+void OnSleep(std::function<void()> hook) {
+    Get().on_sleep = std::move(hook);
 }
 
 void PretendIdentity(bool on) {

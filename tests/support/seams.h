@@ -29,8 +29,9 @@ std::vector<unsigned> MicroSleeps();
 /** time() answers this from now on, until the next Reset; -1 is a clock that fails. */
 void SetTime(time_t now);
 
-/** Called by each usleep(), for a test in which something happens during a wait. */
+/** Called by each usleep() or sleep(), for a test in which something happens during a wait. */
 void OnMicroSleep(std::function<void()> hook);
+void OnSleep(std::function<void()> hook);
 
 struct LogLine {
     int priority;

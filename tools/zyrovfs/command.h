@@ -45,6 +45,10 @@ void AddProfileCommands(CLI::App& app, Session& session);
 void AddConnectionCommands(CLI::App& app, Session& session);
 void AddPathCommand(CLI::App& app, Session& session);
 void AddUserCommands(CLI::App& app, Session& session);
+void AddTransferCommands(CLI::App& app, Session& session);
+void AddCloudCommands(CLI::App& app, Session& session);
+void AddTaskCommands(CLI::App& app, Session& session);
+void AddPolicyCommands(CLI::App& app, Session& session);
 void AddHostCommands(CLI::App& app, Session& session);
 
 }  // namespace tool

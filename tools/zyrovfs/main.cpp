@@ -17,7 +17,11 @@ int Main(int argc, char** argv) {
     AddProfileCommands(app, session);
     AddConnectionCommands(app, session);
     AddPathCommand(app, session);
+    AddTransferCommands(app, session);
+    AddCloudCommands(app, session);
     AddUserCommands(app, session);
+    AddTaskCommands(app, session);
+    AddPolicyCommands(app, session);
     AddHostCommands(app, session);
     try {
         app.parse(argc, argv);

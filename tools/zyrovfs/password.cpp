@@ -140,14 +140,15 @@ bool ReadPassword(const PasswordOptions& options, std::string& password, std::st
     }
     const std::string path = options.from_stdin ? "/dev/stdin" : options.file;
     if (!ReadFile(path, password)) {
-        problem = "Reading the password from " + path + " failed: " + std::strerror(errno);
+        problem = std::string("Reading the ") + options.word + " from " + path +
+                  " failed: " + std::strerror(errno);
         return false;
     }
     if (!password.empty() && password.back() == '\n') {
         password.pop_back();
     }
     if (password.find('\0') != std::string::npos || password.find('\n') != std::string::npos) {
-        problem = "The password in " + path + " is not one line of text.";
+        problem = std::string("The ") + options.word + " in " + path + " is not one line of text.";
         return false;
     }
     return true;

@@ -11,6 +11,7 @@ struct PasswordOptions {
     bool ask = false;
     bool from_stdin = false;
     std::string file;
+    const char* word = "password";  ///< what it is, for sentences
 
     bool Given() const { return ask || from_stdin || !file.empty(); }
 };

@@ -6,6 +6,7 @@
 #include <memory>
 
 #include "command.h"
+#include "location.h"
 #include "report.h"
 #include "text.h"
 
@@ -13,15 +14,6 @@ namespace tool {
 namespace {
 
 using namespace ZYROVFS;
-
-/** Anything else GIO would take for the name of a local file. */
-bool IsUri(const std::string& text) {
-    const size_t colon = text.find("://");
-    return colon != std::string::npos && colon > 0 &&
-           text.find_first_not_of(
-               "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ"
-               "0123456789+-.") == colon;
-}
 
 int ShowPath(unsigned int uid, const std::string& uri, bool json) {
     ResetError();

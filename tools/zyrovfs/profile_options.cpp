@@ -27,6 +27,8 @@ constexpr Row kTexts[] = {
     {"--account", "account", "NAME", "Account on the server", "; anonymous if left out"},
     {"--codepage", "codepage", "NAME", "Character set of remote names", "; UTF-8 if left out"},
     {"--email", "email", "ADDRESS", "Account of a shared link"},
+    {"--client-id", "client_id", "ID", "Cloud: OAuth client that the tokens were given to"},
+    {"--expires-in", "expires_in", "SECONDS", "Cloud: life of the access token from now on"},
 };
 constexpr Row kPath = {"--path", "uri_path", "PATH", "Remote folder to connect, such as a share"};
 constexpr Row kNumbers[] = {
@@ -75,11 +77,38 @@ void FillIn(Json::Value& profile) {
         Default(profile, "alias", "");
         return;
     }
+    if (profile.isMember("access_token")) {
+        Default(profile, "alias", "");
+        Default(profile, "refresh_token", "");
+        return;
+    }
     Default(profile, "alias", profile["hostname"]);
     Default(profile, "port", 0);
     Default(profile, "account", "");
     Default(profile, "password", "");
     Default(profile, "codepage", "UTF-8");
+}
+
+PasswordOptions TokenIn(const std::string& file) {
+    PasswordOptions options;
+    options.from_stdin = file == "-";
+    options.file = options.from_stdin ? "" : file;
+    options.word = "token";
+    return options;
+}
+
+/** A secret that an option leads to; true when none was given. */
+bool ReadSecret(const PasswordOptions& options, const char* key, Json::Value& changes,
+                std::string& problem) {
+    std::string secret;
+    if (!options.Given()) {
+        return true;
+    }
+    if (!ReadPassword(options, secret, problem)) {
+        return false;
+    }
+    changes[key] = secret;
+    return true;
 }
 
 bool ShallAsk(const ProfileOptions& options, const Json::Value& profile) {
@@ -104,6 +133,14 @@ void AddProfileOptions(CLI::App& command, ProfileOptions& options, bool for_conn
     command.add_option("--from", options.from, "Read keys from a JSON file, - for standard input")
         ->type_name("FILE");
     AddPasswordOptions(command, options.password);
+    command
+        .add_option("--access-token-file", options.access_token_file,
+                    "Cloud: read the access token from a file, - for standard input")
+        ->type_name("FILE");
+    command
+        .add_option("--refresh-token-file", options.refresh_token_file,
+                    "Cloud: read the refresh token from a file, - for standard input")
+        ->type_name("FILE");
 }
 
 bool ReadChanges(const ProfileOptions& options, Json::Value& changes, std::string& problem) {
@@ -114,15 +151,9 @@ bool ReadChanges(const ProfileOptions& options, Json::Value& changes, std::strin
     for (const std::string& key : options.given.getMemberNames()) {
         changes[key] = options.given[key];
     }
-    if (!options.password.Given()) {
-        return true;
-    }
-    std::string password;
-    if (!ReadPassword(options.password, password, problem)) {
-        return false;
-    }
-    changes["password"] = password;
-    return true;
+    return ReadSecret(options.password, "password", changes, problem) &&
+           ReadSecret(TokenIn(options.access_token_file), "access_token", changes, problem) &&
+           ReadSecret(TokenIn(options.refresh_token_file), "refresh_token", changes, problem);
 }
 
 bool ReadProfile(const ProfileOptions& options, Json::Value& profile, std::string& problem) {

@@ -15,13 +15,19 @@ struct ProfileOptions {
     Json::Value given = Json::objectValue;  ///< what options named, by the profile's keys
     std::string from;                       ///< file with a profile as JSON
     PasswordOptions password;
+    std::string access_token_file;  ///< tokens of a cloud account, as a service gave them
+    std::string refresh_token_file;
 
-    /** Enough for a new profile: a protocol and a place, or a file. */
+    /** Enough for a new profile: a protocol and a place or a token, or a file. */
     bool Describes() const {
         return !from.empty() || (given.isMember("protocol") &&
-                                 (given.isMember("hostname") || given.isMember("email")));
+                                 (given.isMember("hostname") || given.isMember("email") ||
+                                  !access_token_file.empty()));
     }
-    bool Empty() const { return given.empty() && from.empty() && !password.Given(); }
+    bool Empty() const {
+        return given.empty() && from.empty() && !password.Given() && access_token_file.empty() &&
+               refresh_token_file.empty();
+    }
 };
 
 /**

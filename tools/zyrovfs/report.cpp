@@ -54,6 +54,26 @@ int PrintErrorObject(const Json::Value& error) {
     return kFailure;
 }
 
+Json::Value ErrorObject(const std::string& what, __tag_vfs_err_ code, const Json::Value& detail) {
+    Json::Value error;
+    error["what"] = what;
+    error["name"] = GetErrorName(code);
+    error["code"] = static_cast<int>(code);
+    error["meaning"] = GetErrorMeaning(code);
+    if (!detail.isNull()) {
+        error["detail"] = detail;
+    }
+    return error;
+}
+
+void PrintCode(const std::string& what, __tag_vfs_err_ code) {
+    std::cerr << "zyrovfs: " << Printable(what) << " failed: " << GetErrorName(code) << " ("
+              << static_cast<int>(code) << "): "
+              << (code == VFS_ERR_NONE ? "No cause was given; the system log may tell."
+                                       : GetErrorMeaning(code))
+              << "\n";
+}
+
 }  // namespace
 
 void PrintJson(const Json::Value& value) {
@@ -73,21 +93,9 @@ int ReportFailure(const std::string& what, bool json) {
         VFSGetJson(detail);
     }
     if (json) {
-        Json::Value error;
-        error["what"] = what;
-        error["name"] = GetErrorName(code);
-        error["code"] = static_cast<int>(code);
-        error["meaning"] = GetErrorMeaning(code);
-        if (!detail.isNull()) {
-            error["detail"] = detail;
-        }
-        return PrintErrorObject(error);
+        return PrintErrorObject(ErrorObject(what, code, detail));
     }
-    std::cerr << "zyrovfs: " << Printable(what) << " failed: " << GetErrorName(code) << " ("
-              << static_cast<int>(code) << "): "
-              << (code == VFS_ERR_NONE ? "No cause was given; the system log may tell."
-                                       : GetErrorMeaning(code))
-              << "\n";
+    PrintCode(what, code);
     if (detail.isObject()) {
         PrintDetail(detail);
     }
@@ -95,6 +103,19 @@ int ReportFailure(const std::string& what, bool json) {
         std::cerr << "If this is the right server, repeat the command with --accept.\n";
     }
     return kFailure;
+}
+
+int ReportCode(const std::string& what, __tag_vfs_err_ code, int status, bool json) {
+    if (json) {
+        PrintErrorObject(ErrorObject(what, code, Json::nullValue));
+        return status;
+    }
+    PrintCode(what, code);
+    if (code == VFS_ERR_UNAUTHORIZED || code == VFS_ERR_TOKEN_REVOKED) {
+        std::cerr << "The account no longer lets this connection in. Give it new tokens or a new "
+                     "password with `zyrovfs profile set`.\n";
+    }
+    return status;
 }
 
 int ReportProblem(const std::string& sentence, bool json) {

@@ -3,6 +3,7 @@
 #define ZYROVFS_TOOLS_REPORT_H
 
 #include <json/value.h>
+#include <zyrovfs/error.h>
 
 #include <string>
 
@@ -23,6 +24,9 @@ void Say(const std::string& sentence);
  * standard output. Answers kFailure.
  */
 int ReportFailure(const std::string& what, bool json);
+
+/** The same for a driver's code. Answers `status`. */
+int ReportCode(const std::string& what, ZYROVFS::__tag_vfs_err_ code, int status, bool json);
 
 /** A failure of the tool's own. */
 int ReportProblem(const std::string& sentence, bool json);

@@ -112,7 +112,11 @@ void Account::AddMany(const std::string& parent, size_t count, uint64_t size) {
 
 void Account::Remove(const std::string& id) {
     const Lock lock(service_.mutex_);
-    service_.tree_.Remove(At(id));
+    Node& node = At(id);
+    if (node.parent == nullptr) {
+        throw std::invalid_argument("the folder that holds all cannot be removed");
+    }
+    service_.tree_.Remove(node);
 }
 
 void Account::SetTimes(const std::string& id, int64_t created, int64_t modified) {

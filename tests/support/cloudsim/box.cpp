@@ -189,8 +189,7 @@ Node& BoxService::Find(const BoxCall& call, const std::string& id, bool folder) 
     Json::Value wrong;
     wrong["reason"] = "invalid_parameter";
     wrong["name"] = folder ? "folder" : "file";
-    wrong["message"] = "Invalid value '" + (folder ? "d_" : "f_" + id) + "'. '" +
-                       wrong["name"].asString() + "' with value '" + id + "' not found";
+    wrong["message"] = wrong["name"].asString() + " with value '" + id + "' not found";
     Json::Value context;
     context["errors"].append(std::move(wrong));
     throw box::Failure{box::Error(404, "not_found", "Not Found", context)};

@@ -69,6 +69,7 @@ class BoxService : public Service {
     Reply GetUser(const BoxCall& call);
     Reply GetFolder(const BoxCall& call);
     Reply ListFolder(const BoxCall& call);
+    Reply MakePage(const BoxCall& call);
     Reply GetFile(const BoxCall& call);
     Reply Search(const BoxCall& call);
 
@@ -102,6 +103,8 @@ class BoxService : public Service {
     const BoxOptions box_options_;
     std::map<std::string, ContentPtr> tickets_;
     std::deque<std::string> ticket_order_;
+    std::map<std::pair<std::string, std::string>, Reply> pages_;
+    uint64_t pages_version_ = 0;
 };
 
 }  // namespace cloudsim

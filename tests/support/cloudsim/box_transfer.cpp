@@ -21,14 +21,24 @@ Json::Value UploadUrl(const std::string& url) {
     return answer;
 }
 
-void SetDate(const Json::Value& attributes, const char* name, int64_t& time) {
-    if (!attributes[name].isNull()) {
-        const int64_t given = box::ParseDate(attributes[name].asString());
-        if (given < 0) {
-            throw box::Failure{box::Error(400, "bad_request", std::string("Bad Request: ") + name)};
-        }
-        time = given;
+/** What the uploader says of the file itself; -1 where nothing is said. */
+struct Dates {
+    int64_t created, modified;
+};
+
+int64_t ReadDate(const Json::Value& attributes, const char* name) {
+    if (attributes[name].isNull()) {
+        return -1;
     }
+    const int64_t given = box::ParseDate(attributes[name].asString());
+    return given >= 0 ? given
+                      : throw box::Failure{
+                            box::Error(400, "bad_request", std::string("Bad Request: ") + name)};
+}
+
+Dates ReadDates(const Json::Value& attributes) {
+    return {ReadDate(attributes, "content_created_at"),
+            ReadDate(attributes, "content_modified_at")};
 }
 
 }  // namespace
@@ -140,10 +150,11 @@ Node& BoxUpload::Store(const BoxCall& call) {
         throw box::Failure{box::Error(400, "bad_digest",
                                       "The specified content-md5 did not match what we received")};
     }
+    const Dates dates = ReadDates(call.body);
     Node& file =
         id_.empty() ? StoreNew(call, std::move(content)) : StoreVersion(call, std::move(content));
-    SetDate(call.body, "content_created_at", file.content_created);
-    SetDate(call.body, "content_modified_at", file.content_modified);
+    file.content_created = dates.created < 0 ? file.content_created : dates.created;
+    file.content_modified = dates.modified < 0 ? file.content_modified : dates.modified;
     return file;
 }
 

@@ -110,6 +110,9 @@ bool Exchange::Data(const char* data, size_t size) {
     if (wanted < size || (fault != nullptr && fault->cut_upload == received_)) {
         return Break(Effect::kCutUpload);
     }
+    if (fault != nullptr) {
+        PauseAt(fault->pause_upload, received_, Effect::kPauseUpload);
+    }
     if (fault != nullptr && fault->upload_rate != 0) {
         Happens(Effect::kUploadRate);
         server_.SleepUntil(After(
@@ -144,7 +147,19 @@ bool Exchange::Answer() {
     return NeedsRawAnswer() ? WriteRaw() : Queue();
 }
 
+void Exchange::PauseAt(const std::optional<uint64_t>& place, uint64_t done, Effect effect) {
+    if (place && !paused_ && done >= *place) {
+        paused_ = true;
+        Happens(effect);
+        server_.SleepUntil(After(steady_clock::now(), (*fault_)->pause));
+    }
+}
+
 void Exchange::SumBody() {
+    if (summed_) {
+        return;
+    }
+    summed_ = true;
     const std::string sum =
         received_ != 0 && server_.options.journal_hashes ? sum_.Hex() : std::string();
     server_.journal.Change(*entry_, [&](JournalEntry& entry) {
@@ -152,7 +167,6 @@ void Exchange::SumBody() {
         entry.body_size = received_;
         entry.body_sha1 = sum;
     });
-    body_.clear();
 }
 
 Reply Exchange::MakeReply() {
@@ -170,9 +184,7 @@ void Exchange::End() {
         return;
     }
     handler_.reset();
-    if (!body_.empty()) {
-        SumBody();
-    }
+    SumBody();
     server_.journal.Change(*entry_, [&](JournalEntry& entry) { entry.answer_size = sent_; });
     server_.journal.Finish(*entry_);
     if (fault_ != nullptr && (*fault_)->close_after_answer) {
@@ -181,9 +193,7 @@ void Exchange::End() {
 }
 
 bool Exchange::Break(Effect effect) {
-    if (!body_.empty()) {
-        SumBody();
-    }
+    SumBody();
     Happens(effect);
     if ((*fault_)->reset) {
         Reset();
@@ -213,6 +223,10 @@ ssize_t Exchange::Read(uint64_t position, char* to, size_t size) {
         return -1;
     }
     size = std::min<uint64_t>(size, cut_at_ - position);
+    if (fault_ != nullptr && (*fault_)->pause_answer) {
+        PauseAt((*fault_)->pause_answer, position, Effect::kPause);
+        size = paused_ ? size : std::min<uint64_t>(size, *(*fault_)->pause_answer - position);
+    }
     const uint64_t rate = fault_ == nullptr ? 0 : (*fault_)->answer_rate;
     if (rate != 0) {
         Happens(Effect::kRate);

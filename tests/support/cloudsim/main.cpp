@@ -48,7 +48,8 @@ was not used.
   --journal FILE        every request as one line of JSON
   --fault TEXT          such as "GET /2.0/users/me after=1 times=2 answer=503 body=busy"; words:
                         host= after= times= answer= status= body= header=NAME:VALUE line= raw=
-                        delay= rate= upload-rate= cut= cut-upload= close=before|after|effect reset
+                        delay= rate= upload-rate= pause=BYTES:SECONDS pause-upload=BYTES:SECONDS
+                        cut= cut-upload= close=before|after|effect reset
                         close-after-answer range=ignore|start|short expire-token
 )";
 

@@ -160,6 +160,9 @@ void Tree::Import(Node& folder, const std::string& path) {
     for (const fs::directory_entry& entry : fs::directory_iterator(path)) {
         const std::string name = entry.path().filename().string();
         Node* node = nullptr;
+        if (Child(folder, name) != nullptr) {
+            throw std::runtime_error("names that differ only in case: " + entry.path().string());
+        }
         if (entry.is_directory() && !entry.is_symlink()) {
             node = &Make(folder, name, true);
             Import(*node, entry.path().string());

@@ -155,6 +155,13 @@ TEST_F(DeleteUserTest, EveryConnectionOfALivingChainIsUnmounted) {
     EXPECT_FALSE(exists(kConnect));
 }
 
+TEST_F(DeleteUserTest, MountsAreLookedForOnTheUsersOwnBus) {
+    setenv("DBUS_SESSION_BUS_ADDRESS", "unix:path=/of/somebody/else", 1);
+    const LiveChain chain;
+    EXPECT_TRUE(Delete(Users({kUser}), false, false));
+    EXPECT_STREQ(getenv("DBUS_SESSION_BUS_ADDRESS"), "unix:path=/nowhere");
+}
+
 TEST_F(DeleteUserTest, ConnectionThatCannotBeUnmountedIsLoggedAndTheRestGoesOn) {
     Json::Value servers;
     servers["a text that is no uri"]["protocol"] = "ftp";

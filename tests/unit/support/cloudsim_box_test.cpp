@@ -223,6 +223,48 @@ TEST_F(BoxTest, TakesANewFileAndThenANewVersion) {
         Upload("/api/2.0/files/content", R"({"name":"A.bin","parent":{"id":"0"}})", "").status);
 }
 
+TEST_F(BoxTest, KeepsTheDatesThatTheUploaderTells) {
+    const auto attributes = [](const std::string& date) {
+        return R"({"name":"a","parent":{"id":"0"},"content_modified_at":")" + date + "\"}";
+    };
+    EXPECT_EQ(400, Upload("/api/2.0/files/content", attributes("yesterday"), "x").status);
+    EXPECT_FALSE(amy.Exists("/a"));
+    const Got got =
+        Upload("/api/2.0/files/content", attributes("2020-02-03T04:05:06.5+01:00"), "x");
+    EXPECT_EQ("2020-02-02T19:05:06-08:00",
+              got.Json()["entries"][0]["content_modified_at"].asString());
+}
+
+TEST_F(BoxTest, RefusesWhatTheUploadersSumContradicts) {
+    client.headers = {"Content-MD5: 0123456789012345678901234567890123456789"};
+    const Got got =
+        Upload("/api/2.0/files/content", R"({"name":"a","parent":{"id":"0"}})", "bytes");
+    EXPECT_EQ("bad_digest", Code(got));
+    EXPECT_FALSE(amy.Exists("/a"));
+}
+
+TEST_F(BoxTest, RefusesChangesOfAnotherVersionThanTheOneMeant) {
+    const std::string file = amy.AddFile("0", "a", "text");
+    client.headers = {"If-Match: 3"};
+    EXPECT_EQ(412, Send("PUT", "/2.0/files/" + file, R"({"name":"b"})").status);
+    EXPECT_EQ(412, Send("DELETE", "/2.0/files/" + file).status);
+    client.headers = {"If-Match: 0"};
+    EXPECT_EQ(200, Send("PUT", "/2.0/files/" + file, R"({"name":"b"})").status);
+}
+
+TEST_F(BoxTest, AListingShowsEveryChangeAtOnce) {
+    const std::string path = "/2.0/folders/0/items?fields=name";
+    EXPECT_THAT(Names(Get(path).Json()), IsEmpty());
+    const std::string file = amy.AddFile("0", "a", "text");
+    EXPECT_THAT(Names(Get(path).Json()), ElementsAre("a"));
+    Send("PUT", "/2.0/files/" + file, R"({"name":"b"})");
+    EXPECT_THAT(Names(Get(path).Json()), ElementsAre("b"));
+    cloudsim::Account& ben = box.AddAccount("ben@example.com");
+    client.UseToken(ben.IssueTokens().access_token);
+    EXPECT_THAT(Names(Get(path).Json()), IsEmpty());
+    EXPECT_EQ(404, Get("/2.0/files/" + file).status);
+}
+
 TEST_F(BoxTest, RefusesAttributesBehindTheFile) {
     const Got got =
         client.Upload(box.UploadHost() + "/api/2.0/files/content",

@@ -1,0 +1,374 @@
+#include "zyrovfs/task.h"
+
+#include <sys/stat.h>
+#include <unistd.h>
+#include <zosplatform/file.h>
+#include <zosplatform/process.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstring>
+#include <memory>
+#include <new>
+#include <optional>
+
+#include "core/error_cell.h"
+#include "core/identity.h"
+#include "core/log.h"
+#include "task/task_file.h"
+#include "zyrovfs/utils.h"
+
+namespace ZYROVFS {
+
+struct TaskMgrPrivate {
+    uint64_t max_task;
+};
+
+namespace {
+
+using task::Entry;
+using task::QueueFiles;
+using task::QueueLock;
+using task::QueueReader;
+
+constexpr unsigned kDefaultMaxTask = 3;
+
+/** A job, and what its caller knows of the others. */
+struct Job {
+    const char* name;
+    const char* id;
+    pid_t pid;
+    TaskMgr::Check check;
+    void* data;
+};
+
+bool IsEmpty(const char* text) {
+    return text == nullptr || *text == '\0';
+}
+
+/** Nothing leaves an operation by exception; `fault` is its answer when memory runs out. */
+template <typename Result, typename Body>
+Result OrOnFault(Result fault, Body body, SourceLine at = SourceLine::Here()) noexcept {
+    try {
+        return body();
+    } catch (const std::exception& e) {
+        LOG_ERROR_AT(at, "Unexpected failure, %s", e.what());
+        return fault;
+    }
+}
+
+// --- adding -----------------------------------------------------------------------------------
+
+bool MakeFolder(const std::string& folder) {
+    constexpr unsigned kLeaveAlone = static_cast<unsigned>(-1);
+    constexpr unsigned kOpenToAll = 0777;
+    if (YLIBCFileCheckDir(folder.c_str()) != 0 ||
+        Utils::MkdirP(folder.c_str(), nullptr, 1, kLeaveAlone, kLeaveAlone, kOpenToAll) == 0) {
+        return true;
+    }
+    LOG_ERROR("Failed to mkdir %s" PLATFORM_ERROR_FORMAT ", %m", folder.c_str(), ZYROERR_ARGS);
+    return false;
+}
+
+UniqueFd OpenWithin10Seconds(const std::string& path) {
+    constexpr int kAttempts = 10;
+    for (int attempt = 0; attempt < kAttempts; ++attempt) {
+        UniqueFd fd = task::OpenForAppend(path);
+        if (fd) {
+            return fd;
+        }
+        LOG_ERROR("Failed to open %s (%s).", path.c_str(), strerror(errno));
+        sleep(1);
+    }
+    LOG_ERROR("Failed to wiret data");
+    return UniqueFd();
+}
+
+/** In one piece. What a full disk let through of it goes again: it would spoil the next line. */
+bool Append(int fd, const std::string& line, const std::string& path) {
+    struct stat before {};
+    const bool can_undo = fstat(fd, &before) == 0;
+    errno = ENOSPC;
+    const ssize_t written = write(fd, line.data(), line.size());
+    if (written == static_cast<ssize_t>(line.size())) {
+        return true;
+    }
+    LOG_ERROR("Failed to write %s. (%s)", path.c_str(), strerror(errno));
+    if (written > 0 && can_undo && ftruncate(fd, before.st_size) != 0) {
+        LOG_ERROR("Failed to truncate %s, %m", path.c_str());
+    }
+    return false;
+}
+
+bool AddLine(const QueueFiles& files, const char* id, pid_t pid) {
+    if (strpbrk(id, "\t\n") != nullptr) {
+        LOG_ERROR("A task id with a tab or a newline in it");
+        return false;
+    }
+    if (!MakeFolder(files.folder)) {
+        return false;
+    }
+    const QueueLock lock(files, true);
+    if (!lock) {
+        LOG_ERROR("Failed to lock %s" PLATFORM_ERROR_FORMAT ", %m", files.lock.c_str(),
+                  ZYROERR_ARGS);
+        return false;
+    }
+    const UniqueFd fd = OpenWithin10Seconds(files.queue);
+    const std::string process = std::to_string(static_cast<unsigned>(pid));
+    return fd && Append(fd.Get(), std::string(id) + "\t" + process + "\n", files.queue);
+}
+
+// --- asking -----------------------------------------------------------------------------------
+
+/** Place of the job, 0 beyond the limit, -1 as the check said; nothing for a job without a line. */
+std::optional<int64_t> FindPlace(QueueReader& reader, const Job& job, const std::string& process,
+                                 uint64_t limit) {
+    uint64_t place = 1;
+    Entry entry{};
+    while (reader.Next(entry)) {
+        if (strcmp(entry.id, job.id) == 0 && process == entry.process) {
+            return static_cast<int64_t>(place);
+        }
+        // Other jobs of the same process wait for each other by its own means.
+        if (entry.pid == job.pid || YLIBCProcAlive(entry.pid) == 0) {
+            continue;
+        }
+        const int verdict =
+            job.check == nullptr ? 1 : job.check(job.name, entry.id, entry.pid, job.data);
+        if (verdict == -1) {
+            return -1;
+        }
+        if (verdict == 0) {
+            continue;
+        }
+        if (place >= limit) {
+            return 0;
+        }
+        ++place;
+    }
+    return std::nullopt;
+}
+
+int64_t AskForTurn(const QueueFiles& files, const Job& job, uint64_t limit) {
+    if (YLIBCFileExist(files.queue.c_str()) == 0 && !AddLine(files, job.id, job.pid)) {
+        return 0;
+    }
+    QueueLock lock(files, false);
+    if (!lock) {
+        LOG_ERROR("Failed to lock %s " PLATFORM_ERROR_FORMAT ", %m", files.lock.c_str(),
+                  ZYROERR_ARGS);
+        return 0;
+    }
+    QueueReader reader;
+    if (!reader.Open(files.queue)) {
+        LOG_ERROR("Failed to open %s, %m", files.queue.c_str());
+        return 0;
+    }
+    const std::string process = std::to_string(static_cast<unsigned>(job.pid));
+    const std::optional<int64_t> place = FindPlace(reader, job, process, limit);
+    if (place) {
+        return *place;
+    }
+    if (!reader.AtEnd()) {
+        LOG_ERROR("Failed to read %s, %m", files.queue.c_str());
+        return 0;
+    }
+    lock.Release();
+    reader.Close();
+    LOG_ERROR("Failed to find %s, pid %s", job.id, process.c_str());
+    AddLine(files, job.id, job.pid);
+    return 0;
+}
+
+/** Whether fewer living entries than the limit are of other processes than `pid`. */
+bool HasRoom(QueueReader& reader, pid_t pid, uint64_t limit) {
+    uint64_t count = 1;
+    Entry entry{};
+    while (reader.Next(entry)) {
+        if (entry.pid == pid || YLIBCProcAlive(entry.pid) == 0) {
+            continue;
+        }
+        if (count >= limit) {
+            return false;
+        }
+        ++count;
+    }
+    return true;
+}
+
+bool AskForRoom(const QueueFiles& files, pid_t pid, uint64_t limit) {
+    if (YLIBCFileExist(files.queue.c_str()) == 0) {
+        return true;
+    }
+    // Before the lock is taken: a process without memory keeps nobody waiting.
+    const std::unique_ptr<QueueReader> reader(new (std::nothrow) QueueReader);
+    if (reader == nullptr) {
+        SetPlatformErr(ZOS_ERR_OUT_OF_MEMORY);
+        LOG_ERROR("Out of memory" PLATFORM_ERROR_FORMAT, ZYROERR_ARGS);
+        return true;
+    }
+    const QueueLock lock(files, true);
+    if (!lock) {
+        LOG_ERROR("Failed to lock %s, %m" PLATFORM_ERROR_FORMAT, files.lock.c_str(), ZYROERR_ARGS);
+        return true;
+    }
+    if (!reader->Open(files.queue)) {
+        LOG_ERROR("Failed to open %s, %m", files.queue.c_str());
+        return true;
+    }
+    return HasRoom(*reader, pid, limit);
+}
+
+// --- cleaning ---------------------------------------------------------------------------------
+
+/** Whether the entry stays in the queue when `job` cleans it. */
+bool Stays(const Entry& entry, const Job& job, const std::string& process) {
+    const bool meant =
+        job.id != nullptr && strcmp(entry.id, job.id) == 0 && process == entry.process;
+    if (meant || entry.pid == job.pid || YLIBCProcAlive(entry.pid) == 0) {
+        return false;
+    }
+    return job.check == nullptr || job.check(job.name, entry.id, entry.pid, job.data) != 0;
+}
+
+bool CopyStaying(QueueReader& reader, FILE* fresh, const QueueFiles& files, const Job& job) {
+    const std::string process = std::to_string(static_cast<unsigned>(job.pid));
+    Entry entry{};
+    while (reader.Next(entry)) {
+        if (Stays(entry, job, process) && fprintf(fresh, "%s\t%s\n", entry.id, entry.process) < 0) {
+            LOG_ERROR("Failed to save %s to %s, %m", entry.id, files.fresh.c_str());
+            return false;
+        }
+    }
+    if (!reader.AtEnd() || fflush(fresh) != 0) {
+        LOG_ERROR("Failed to save data to %s, %m", files.fresh.c_str());
+        return false;
+    }
+    return true;
+}
+
+bool Rewrite(const QueueFiles& files, const Job& job) {
+    UniqueFile fresh = task::CreateFresh(files.fresh);
+    if (fresh == nullptr) {
+        SetPlatformErr(ZOS_ERR_OPEN_FAILED);
+        return false;
+    }
+    QueueReader reader;
+    if (!reader.Open(files.queue)) {
+        LOG_ERROR("Failed to open %s, %m", files.queue.c_str());
+        return false;
+    }
+    if (!CopyStaying(reader, fresh.get(), files, job)) {
+        return false;
+    }
+    if (fclose(fresh.release()) != 0) {
+        LOG_ERROR("Failed to close %s, %m", files.fresh.c_str());
+        return false;
+    }
+    if (rename(files.fresh.c_str(), files.queue.c_str()) != 0) {
+        LOG_ERROR("Failed to rename %s, %m", files.fresh.c_str());
+        return false;
+    }
+    return true;
+}
+
+bool CleanNow(const QueueFiles& files, const Job& job) {
+    const QueueLock lock(files, true);
+    if (!lock) {
+        LOG_ERROR("Failed to lock %s, " PLATFORM_ERROR_FORMAT ", %m", files.lock.c_str(),
+                  ZYROERR_ARGS);
+        return false;
+    }
+    if (task::JustCleaned(files.stamp)) {
+        return true;
+    }
+    // Jobs that are about to end do so in the meantime, and go with this clean-up.
+    sleep(3);
+    // Gone before the lock is: without it, the file could be another clean-up's.
+    const ScopeExit remove_fresh([&files] { unlink(files.fresh.c_str()); });
+    if (!Rewrite(files, job)) {
+        return false;
+    }
+    YLIBCFileTouch(files.stamp.c_str());
+    return true;
+}
+
+bool CleanOrHandOver(const QueueFiles& files, const Job& job, bool background) {
+    if (YLIBCFileExist(files.queue.c_str()) == 0 || task::JustCleaned(files.stamp)) {
+        return true;
+    }
+    const pid_t child = background ? YLIBCProcFork() : -1;
+    if (child > 0) {
+        return true;
+    }
+    const bool cleaned = OrOnFault(false, [&] { return CleanNow(files, job); });
+    if (child == 0) {
+        _exit(0);
+    }
+    return cleaned;
+}
+
+uint64_t LimitOf(const TaskMgrPrivate* self) {
+    return self == nullptr ? kDefaultMaxTask : self->max_task;
+}
+
+}  // namespace
+
+TaskMgr::TaskMgr(unsigned int maxTask) : private_(new (std::nothrow) TaskMgrPrivate{maxTask}) {}
+
+TaskMgr::~TaskMgr() {
+    delete private_;
+}
+
+void TaskMgr::SetMaxTask(unsigned int n) {
+    if (private_ != nullptr) {
+        private_->max_task = n == 0 ? kDefaultMaxTask : n;
+    }
+}
+
+bool TaskMgr::GetTaskPath(const char* name, std::string& path) {
+    return !IsEmpty(name) && OrOnFault(false, [&] {
+        path = task::FilesOf(name).folder;
+        return true;
+    });
+}
+
+bool TaskMgr::Add(const char* name, const char* taskID, int pid) {
+    return !IsEmpty(name) && !IsEmpty(taskID) && OrOnFault(false, [&] {
+        const QueueFiles files = task::FilesOf(name);
+        const RootUid as_root;
+        return AddLine(files, taskID, pid);
+    });
+}
+
+int64_t TaskMgr::IsRunnable(const char* name, const char* taskID, int pid, Check check,
+                            void* data) {
+    if (IsEmpty(name) || IsEmpty(taskID)) {
+        return 0;
+    }
+    return OrOnFault(int64_t{0}, [&] {
+        const QueueFiles files = task::FilesOf(name);
+        const RootUid as_root;
+        return AskForTurn(files, {name, taskID, pid, check, data}, LimitOf(private_));
+    });
+}
+
+bool TaskMgr::IsAddable(const char* name, int pid) {
+    return IsEmpty(name) || OrOnFault(true, [&] {
+               const QueueFiles files = task::FilesOf(name);
+               const RootUid as_root;
+               return AskForRoom(files, pid, LimitOf(private_));
+           });
+}
+
+bool TaskMgr::Clean(const char* name, const char* taskID, int pid, Check check, void* data,
+                    bool background) {
+    return !IsEmpty(name) && OrOnFault(false, [&] {
+        const QueueFiles files = task::FilesOf(name);
+        const RootUid as_root;
+        return CleanOrHandOver(files, {name, taskID, pid, check, data}, background);
+    });
+}
+
+}  // namespace ZYROVFS
