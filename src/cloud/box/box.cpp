@@ -49,7 +49,7 @@ Box::Box(unsigned int owner, const Json::Value& profile) : PublicCloud(owner, pr
 
 bool Box::Init() {
     // Refusals are told apart by the body of the answer.
-    return SetAPIErrorHandler(api) && api->SetReturnOnError(false);
+    return Box::SetAPIErrorHandler(api) && api->SetReturnOnError(false);
 }
 
 bool Box::SetAPIErrorHandler(APIHandler* handler) {

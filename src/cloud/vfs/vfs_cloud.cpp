@@ -197,10 +197,6 @@ bool VFSCloud::UploadProcess(XferData* xfer, const Json::Value& meta) {
             if (total >= 1) {
                 api->SetUploadSize(total);
             }
-            if (!body.IsFile()) {
-                // The server's question for a password has to come before the first byte.
-                api->AddHeader("Expect", "100-continue");
-            }
         }
         return Send(url);
     });
