@@ -7,7 +7,7 @@
 
 namespace {
 
-constexpr const char* kFolder = "@eaDir";
+constexpr const char* kFolder = "@ZyroEA";
 constexpr const char* kStreams[] = {"@ZyroResource", "@ZyroEAStream"};
 
 bool EndsWith(const char* text, const char* end) {

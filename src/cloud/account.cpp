@@ -2,6 +2,7 @@
 
 #include <memory>
 
+#include "cloud/guard.h"
 #include "cloud/public_cloud.h"
 #include "zyrovfs/cloud_utils.h"
 
@@ -14,7 +15,7 @@ bool AskAccount(_tag_cloud_type type, unsigned int uid, Json::Value& profile,
     if (cloud == nullptr) {
         return false;
     }
-    const bool answered = cloud->GetAccountInfo(params, out);
+    const bool answered = Guard(*cloud, [&] { return cloud->GetAccountInfo(params, out); });
     error = cloud->GetError();
     const auto* account = dynamic_cast<const PublicCloud*>(cloud.get());
     if (account != nullptr && profile["access_token"] != account->Token().access_token) {

@@ -1,82 +1,82 @@
-#include <memory>
+#include <cstring>
 #include <new>
 
 #include "cloud/box/box.h"
 #include "cloud/vfs/vfs_cloud.h"
 #include "core/log.h"
-#include "core/no_throw.h"
 #include "zyrovfs/cloud_utils.h"
 
 namespace ZYROCloud::Utils {
+
+using namespace ZYROVFS;
+
 namespace {
 
+using Make = Cloud* (*)(unsigned int uid, const Json::Value& config);
+
 template <typename Driver>
-Cloud* Make(unsigned int uid, const Json::Value& config) {
+Cloud* New(unsigned int uid, const Json::Value& config) {
     return new (std::nothrow) Driver(uid, config);
 }
 
-Cloud* NotBuilt(unsigned int, const Json::Value&) {
-    LOG_ERROR("This cloud is not part of this build");
+/** A service that the library has no driver for says so in the log. */
+Cloud* NoDriver(unsigned int, const Json::Value& config) {
+    const Json::Value id = config.isObject() ? config.get("server_id", "") : Json::Value("");
+    LOG_ERROR("No driver for %s", id.isString() ? id.asCString() : "");
     return nullptr;
 }
 
-/** The classifier knows these names, and no driver was ever made for them. */
-Cloud* WithoutDriver(unsigned int, const Json::Value&) {
+/** Kinds that are known and that no connection has. */
+Cloud* Nothing(unsigned int, const Json::Value&) {
     return nullptr;
 }
 
-struct Row {
+/** A new driver needs its row here, and nothing else here. */
+constexpr struct {
     _tag_cloud_type type;
-    Cloud* (*make)(unsigned int uid, const Json::Value& config);
-};
-
-constexpr Row kDrivers[] = {
-    {CLOUD_TYPE_VFS, Make<VFSCloud>},
-    {CLOUD_TYPE_GOOGLE, NotBuilt},
-    {CLOUD_TYPE_DROPBOX, NotBuilt},
-    {CLOUD_TYPE_ONEDRIVE, NotBuilt},
-    {CLOUD_TYPE_ONEDRIVE_SHORT, WithoutDriver},
-    {CLOUD_TYPE_BOX, Make<Box>},
-    {CLOUD_TYPE_HUBIC, WithoutDriver},
-    {CLOUD_TYPE_AWSS3, WithoutDriver},
+    Make make;
+} kDrivers[] = {
+    {CLOUD_TYPE_VFS, New<VFSCloud>}, {CLOUD_TYPE_GOOGLE, NoDriver},
+    {CLOUD_TYPE_DROPBOX, NoDriver},  {CLOUD_TYPE_ONEDRIVE, NoDriver},
+    {CLOUD_TYPE_BOX, New<Box>},      {CLOUD_TYPE_ONEDRIVE_SHORT, Nothing},
+    {CLOUD_TYPE_HUBIC, Nothing},     {CLOUD_TYPE_AWSS3, Nothing},
 };
 
 }  // namespace
 
-Cloud* CreateCloudByConfig(_tag_cloud_type type, unsigned int uid, const Json::Value& config) {
-    for (const Row& row : kDrivers) {
-        if (row.type == type) {
-            Cloud* cloud = nullptr;
-            ZYROVFS::NoThrow(ZYROVFS::VFS_ERR_FAILED, [&] {
-                cloud = row.make(uid, config);
-                return true;
-            });
-            return cloud;
+Cloud* CreateCloudByConfig(_tag_cloud_type type, unsigned int uid, const Json::Value& config) try {
+    for (const auto& driver : kDrivers) {
+        if (driver.type == type) {
+            return driver.make(uid, config);
         }
     }
-    LOG_ERROR("Unknown cloud type, uri: %d", type);
+    LOG_ERROR("Unknown cloud type, uri: %d", static_cast<int>(type));
+    return nullptr;
+} catch (const std::exception& e) {
+    LOG_ERROR("Failed to make a driver, %s", e.what());
     return nullptr;
 }
 
 Cloud* CreateCloudByServerID(unsigned int uid, const std::string& server_id,
-                             ZYROVFS::Server::VFS_CONFIG_MODE mode) {
+                             Server::VFS_CONFIG_MODE mode) {
+    const _tag_cloud_type type = GetCloudTypeFromURI(server_id);
     Json::Value profile;
-    if (!ZYROVFS::Server::Get(uid, mode, server_id.c_str(), true, false, profile)) {
-        LOG_ERROR("Failed to get config by serverID:%s, from mode:%d", server_id.c_str(), mode);
+    if (!Server::Get(uid, mode, server_id.c_str(), true, false, profile) || !profile.isObject()) {
+        LOG_ERROR("Failed to get config by serverID:%s, from mode:%d", server_id.c_str(),
+                  static_cast<int>(mode));
         return nullptr;
     }
     profile["server_id"] = server_id;
-    return CreateCloudByConfig(GetCloudTypeFromURI(server_id), uid, profile);
+    return CreateCloudByConfig(type, uid, profile);
 }
 
-Cloud* CreateCloudByURI(unsigned int uid, const std::string& uri,
-                        ZYROVFS::Server::VFS_CONFIG_MODE mode) {
+Cloud* CreateCloudByURI(unsigned int uid, const std::string& uri, Server::VFS_CONFIG_MODE mode) {
     const size_t scheme = uri.find("://");
     if (scheme == std::string::npos) {
         LOG_ERROR("Failed to get serverID from %s", uri.c_str());
         return nullptr;
     }
-    return CreateCloudByServerID(uid, uri.substr(0, uri.find('/', scheme + 3)), mode);
+    return CreateCloudByServerID(uid, uri.substr(0, uri.find('/', scheme + strlen("://"))), mode);
 }
 
 }  // namespace ZYROCloud::Utils

@@ -274,7 +274,7 @@ size_t CopyReadCallback(char* data, size_t size, size_t count, void* opaque) {
     size_t total = 0;
     bool more = true;
     // Several chunks, as long as they come without a sleep: libcurl then sends them at once.
-    while (more && (total == 0 || AwaitShortly(kSlotEmpty))) {
+    while (more && (total == 0 || (AwaitShortly(kSlotEmpty) && transfer.slot_state == kSlotFull))) {
         const size_t n = TakeChunk(*context, data + total, room - total, deadline, more);
         if (n == CURL_READFUNC_ABORT) {
             return n;

@@ -317,10 +317,16 @@ bool APIHandler::Perform(int attempts) {
         LOG_ERROR("Retry times: %d/%d, err: %d, url: %s", failed, attempts, static_cast<int>(code),
                   LoggableUrl().c_str());
         sleep(GetRetrySleepTime());
-        if (failed == attempts) {
+        if (failed == attempts || !CanStartOver()) {
             return false;
         }
     }
+}
+
+/** The next attempt sends the whole body, or none is made. */
+bool APIHandler::CanStartOver() {
+    return seek_function_ == nullptr || form_data_ != nullptr ||
+           seek_function_(seek_data_, 0, SEEK_SET) == CURL_SEEKFUNC_OK;
 }
 
 /** Another way to the server, for the attempts to come. */

@@ -180,6 +180,7 @@ class APIHandler {
     bool Perform(int attempts);
     CURLcode Transfer();
     bool CanSendAgain();
+    bool CanStartOver();
     void AdaptTo(CURLcode code, int failed);
 
     CURL* curl_;

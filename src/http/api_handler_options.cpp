@@ -19,11 +19,12 @@ constexpr long kKeepAliveTime = 30;
 constexpr long kDnsCacheTime = 269;
 constexpr long kMostRedirects = 30;
 
-// Fewer, larger reads of the socket: a download to a file takes a sixth less of the processor than
-// with 128 KiB, and less than half of what libcurl's own 16 KiB take.
+// Measured over loopback into a file: a quarter less of the processor than libcurl's own 16 KiB,
+// and a twelfth less than 128 KiB; more gives nothing.
 constexpr long kReceiveBuffer = 512 * 1024;
-// A read function may put 128 KiB at once into this buffer, whatever room it was told; framing of
-// the upload stands in front of them. One of libcurl's own 64 KiB would be written over its end.
+// A read function may put 128 KiB at once into this buffer, whatever room it was told, and framing
+// stands in front of them: libcurl's own 64 KiB would be written over. It costs a third less of the
+// processor than those, too, and more gives nothing.
 constexpr long kUploadBuffer = 256 * 1024;
 
 /** Every method but the one for old Internet Explorers. */

@@ -8,7 +8,7 @@ extern "C" {
 
 /**
  * 1 when a file of this name belongs to the box and not to a user, else 0 (null too). Beside a
- * user's files the box keeps folders named "@eaDir" with what indexing found out; in them, and
+ * user's files the box keeps folders named "@ZyroEA" with what it keeps about them; in them, and
  * where a file's streams travel as files, stand "NAME@ZyroResource" (a resource fork) and
  * "NAME@ZyroEAStream" (its other attributes). `name` is one component of a path; case counts.
  */

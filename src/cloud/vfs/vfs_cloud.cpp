@@ -10,9 +10,9 @@
 #include "cloud/attempt.h"
 #include "cloud/fuse_attr.h"
 #include "cloud/guard.h"
+#include "cloud/vfs/upload_body.h"
 #include "core/handle.h"
 #include "core/json.h"
-#include "core/log.h"
 #include "http/api_handler.h"
 #include "zyrovfs/server.h"
 
@@ -23,25 +23,31 @@ using namespace ZYROVFS;
 namespace {
 
 constexpr int kUploadRetries = 3;
-constexpr size_t kDescriptionLength = 32;
-/** What the mount's root says of a server that refuses extended passive mode. */
-constexpr int kNoExtendedPassive = 2;
+constexpr const char* kUtf8 = "UTF-8";
+/** A refusal of what stands behind an asterisk is ignored. */
+constexpr const char* kUtf8Command = "*OPTS UTF8 ON";
+constexpr size_t kDescriptionSize = 32;
+/** What the mounted tree says of a server that stumbles over extended passive mode. */
+constexpr int64_t kNoExtendedPassive = 2;
 
-using UniqueCommands = std::unique_ptr<curl_slist, FreeWith<curl_slist_free_all>>;
-
-bool StartsWith(const std::string& text, const char* start) {
+bool StartsWithCaseless(const std::string& text, const char* start) {
     return strncasecmp(text.c_str(), start, strlen(start)) == 0;
 }
 
-/** What the profile is expected to hold as text; anything else counts as missing. */
-std::string TextIn(const Json::Value& config, const char* key, const char* otherwise) {
-    const Json::Value value = config.isObject() ? config.get(key, otherwise) : Json::Value();
-    return value.isString() ? value.asString() : otherwise;
+bool IsDav(const std::string& text) {
+    return StartsWithCaseless(text, "dav");
 }
 
-bool Missing(const char* what, SourceLine at = SourceLine::Here()) {
-    LOG_ERROR_AT(at, "VFSCloud not implement %s", what);
-    return false;
+/** Text of a member. What has no text is logged and counts as missing. */
+std::string TextOf(const Json::Value& config, const char* key, const char* missing = "") {
+    if (!config.isObject() || !config.isMember(key)) {
+        return missing;
+    }
+    if (!config[key].isConvertibleTo(Json::stringValue)) {
+        LOG_ERROR("Wrong type of %s in a profile", key);
+        return missing;
+    }
+    return config[key].asString();
 }
 
 }  // namespace
@@ -51,11 +57,11 @@ VFSCloud::VFSCloud() {
 }
 
 VFSCloud::VFSCloud(unsigned int owner, const Json::Value& config)
-    : Cloud(owner, TextIn(config, "server_id", "test")),
-      account_(TextIn(config, "account", "")),
-      password_(TextIn(config, "password", "")),
-      code_page_(TextIn(config, "codepage", "")),
-      protocol_(TextIn(config, "protocol", "")) {
+    : Cloud(owner, TextOf(config, "server_id", "test")),
+      account_(TextOf(config, "account")),
+      password_(TextOf(config, "password")),
+      code_page_(TextOf(config, "codepage")),
+      protocol_(TextOf(config, "protocol")) {
     VFSCloud::Init();
 }
 
@@ -67,14 +73,10 @@ bool VFSCloud::SetAPIErrorHandler(APIHandler* handler) {
     if (handler == nullptr) {
         return false;
     }
-    if (StartsWith(protocol_, "dav")) {
-        return handler->SetErrorHandler(new (std::nothrow) DavErrorHandler);
-    }
-    return handler->SetErrorHandler(new (std::nothrow) FTPErrorHandler);
-}
-
-_tag_cloud_type VFSCloud::GetCloudType() {
-    return CLOUD_TYPE_VFS;
+    ErrorHandler* errors = IsDav(protocol_)
+                               ? static_cast<ErrorHandler*>(new (std::nothrow) DavErrorHandler)
+                               : new (std::nothrow) FTPErrorHandler;
+    return errors != nullptr && handler->SetErrorHandler(errors);
 }
 
 bool VFSCloud::GetMetaDataByURI(const std::string& uri, Json::Value& out, const std::string&) {
@@ -90,33 +92,78 @@ bool VFSCloud::GetMetaDataByURI(const std::string& uri, Json::Value& out, const 
     });
 }
 
-bool VFSCloud::isSetFTPEPSV(const std::string&) {
-    std::string folder;
-    std::string text;
-    if (!GetFullPathByURI(server_id, folder) ||
-        !fuse_attr::ReadDescription(folder + "/", kDescriptionLength, text)) {
-        return true;
-    }
-    return strtol(text.c_str(), nullptr, 10) != kNoExtendedPassive;
+// Everything but contents goes through the mount.
+
+bool VFSCloud::GetAccountInfo(const Json::Value&, Json::Value&) {
+    LOG_ERROR("VFSCloud not implement get account info");
+    return false;
 }
 
-/** A local step that failed. */
-bool VFSCloud::Check(bool step) {
-    if (!step) {
-        SetError(VFS_ERR_CLOUD_FAILED, "");
-    }
-    return step;
+bool VFSCloud::GetFileInfo(const std::string&, const Json::Value&, Json::Value&) {
+    LOG_ERROR("VFSCloud not implement get file info");
+    return false;
+}
+
+bool VFSCloud::ListFolder(const std::string&, const Json::Value&, Json::Value&) {
+    LOG_ERROR("VFSCloud not implement list operation");
+    return false;
+}
+
+bool VFSCloud::CreateFolder(const std::string&, const std::string&, const Json::Value&) {
+    LOG_ERROR("VFSCloud not implement create folder operation");
+    return false;
+}
+
+bool VFSCloud::Delete(const std::string&) {
+    LOG_ERROR("VFSCloud not implement delete operation");
+    return false;
+}
+
+bool VFSCloud::Rename(const std::string&, const std::string&) {
+    LOG_ERROR("VFSCloud not implement rename operation");
+    return false;
+}
+
+bool VFSCloud::Copy(const std::string&, const std::string&) {
+    LOG_ERROR("VFSCloud not implement copy operation");
+    return false;
+}
+
+bool VFSCloud::Move(const std::string&, const std::string&) {
+    LOG_ERROR("VFSCloud not implement move operation");
+    return false;
+}
+
+// --- contents ---------------------------------------------------------------------------------
+
+bool VFSCloud::FailLocally() {
+    SetError(VFS_ERR_CLOUD_FAILED, "");
+    return false;
+}
+
+bool VFSCloud::isSetFTPEPSV(const std::string&) {
+    std::string path;
+    std::string text;
+    int64_t description = 0;
+    return !(GetFullPathByURI(GetServerID(), path) &&
+             fuse_attr::ReadDescription(path + "/", kDescriptionSize, text) &&
+             json::toInt64(Json::Value(text), description) && description == kNoExtendedPassive);
+}
+
+bool VFSCloud::Prepare(XferData* xfer) {
+    const bool ready = api != nullptr && api->Init() && InitXferData(xfer) &&
+                       api->SetUserPwOpt(account_, password_);
+    return ready || FailLocally();
 }
 
 bool VFSCloud::SetUpFTP(const std::string& url, curl_slist** commands) {
-    if (!StartsWith(url, "ftp://") && !StartsWith(url, "ftps://")) {
+    if (!StartsWithCaseless(url, "ftp://") && !StartsWithCaseless(url, "ftps://")) {
         return true;
     }
-    if (code_page_ == "UTF-8") {
-        // The star: a server that does not know the command has always spoken UTF-8.
-        *commands = curl_slist_append(nullptr, "*OPTS UTF8 ON");
-        if (!Check(*commands != nullptr && api->SetCodePage(code_page_, commands))) {
-            return false;
+    if (code_page_ == kUtf8) {
+        *commands = curl_slist_append(nullptr, kUtf8Command);
+        if (*commands == nullptr || !api->SetCodePage(code_page_, commands)) {
+            return FailLocally();
         }
     }
     if (!isSetFTPEPSV(url)) {
@@ -126,103 +173,72 @@ bool VFSCloud::SetUpFTP(const std::string& url, curl_slist** commands) {
     return true;
 }
 
-/** What both directions begin with. */
-bool VFSCloud::Prepare(XferData& xfer, const std::string& url, const Json::Value* range,
-                       curl_slist** commands) {
-    if (!Check(api != nullptr && api->Init() && InitXferData(&xfer)) ||
-        !Check(api->SetUserPwOpt(account_, password_))) {
-        return false;
-    }
-    if (range != nullptr) {
-        SetRange(*this, *range);
-    }
-    api->SetVFSURL(url);  // tells nothing: a URL that could not be set shows when it is asked for
-    return SetUpFTP(url, commands);
-}
-
 bool VFSCloud::UploadProcess(XferData* xfer, const Json::Value& meta) {
-    if (xfer == nullptr) {
-        return false;
-    }
     return Guard(*this, [&] {
-        const std::string url = meta.get("url", "").asString();
-        curl_slist* list = nullptr;
-        const bool prepared = Prepare(*xfer, url, nullptr, &list);
-        const UniqueCommands commands(list);
-        if (!prepared) {
+        if (xfer == nullptr) {
             return false;
         }
-        LetCurlRewind(*this, *xfer);
+        const std::string url = meta.get("url", "").asString();
+        curl_slist* commands = nullptr;
+        const ScopeExit free_commands([&commands] { curl_slist_free_all(commands); });
+        if (!Prepare(xfer)) {
+            return false;
+        }
+        UploadBody body(*xfer);
+        body.GiveTo(*api);
+        api->SetVFSURL(url);
+        if (!SetUpFTP(url, &commands)) {
+            return false;
+        }
         api->SetUploadOpt(true);
-        if (StartsWith(url, "dav")) {
-            const Json::Int64 total = meta.get("total_bytes", -1).asInt64();
+        if (IsDav(url)) {
+            int64_t total = -1;
+            json::toInt64(meta["total_bytes"], total);
             if (total >= 1) {
                 api->SetUploadSize(total);
             }
         }
-        if (api->Process(kUploadRetries)) {
-            return true;
-        }
-        SetError(api->GetError());
-        LOG_ERROR("Failed to process curl %s, err:%s", url.c_str(), json::toString(error).c_str());
-        return false;
+        return Send(url);
     });
+}
+
+bool VFSCloud::Send(const std::string& url) {
+    if (api->Process(kUploadRetries)) {
+        return true;
+    }
+    SetError(api->GetError());
+    LOG_ERROR(kRequestFailed, url.c_str(), json::toString(GetError()).c_str());
+    return false;
 }
 
 bool VFSCloud::DownloadProcess(XferData* xfer, const Json::Value& meta) {
     return Guard(*this, [&] {
         const std::string url = meta.get("url", "").asString();
-        if (xfer == nullptr || xfer->context == nullptr) {
+        curl_slist* commands = nullptr;
+        const ScopeExit free_commands([&commands] { curl_slist_free_all(commands); });
+        if (xfer == nullptr || !Prepare(xfer)) {
             return false;
         }
-        curl_slist* list = nullptr;
-        const bool prepared = Prepare(*xfer, url, &meta, &list);
-        const UniqueCommands commands(list);
-        if (!prepared) {
-            return false;
+        if (!SetRange(*this, meta)) {
+            return FailLocally();
         }
-        AttemptPlan plan;
-        plan.send = [this] { return api->Process(0); };
-        plan.judge = [this, xfer](__tag_vfs_err_) { return JudgeDownload(*this, *xfer->context); };
-        plan.copy = CopyError::kAtEnd;
-        plan.retry = "Retry Download";
-        plan.refused = kRequestFailed;
-        plan.exhausted = kRequestFailed;
-        plan.what = &url;
-        return RunAttempts(*this, plan);
+        api->SetVFSURL(url);
+        return SetUpFTP(url, &commands) && Receive(xfer, url);
     });
 }
 
-bool VFSCloud::GetAccountInfo(const Json::Value&, Json::Value&) {
-    return Missing("get account info");
-}
-
-bool VFSCloud::GetFileInfo(const std::string&, const Json::Value&, Json::Value&) {
-    return Missing("get file info");
-}
-
-bool VFSCloud::ListFolder(const std::string&, const Json::Value&, Json::Value&) {
-    return Missing("list operation");
-}
-
-bool VFSCloud::CreateFolder(const std::string&, const std::string&, const Json::Value&) {
-    return Missing("create folder operation");
-}
-
-bool VFSCloud::Delete(const std::string&) {
-    return Missing("delete operation");
-}
-
-bool VFSCloud::Rename(const std::string&, const std::string&) {
-    return Missing("rename operation");
-}
-
-bool VFSCloud::Copy(const std::string&, const std::string&) {
-    return Missing("copy operation");
-}
-
-bool VFSCloud::Move(const std::string&, const std::string&) {
-    return Missing("move operation");
+bool VFSCloud::Receive(XferData* xfer, const std::string& url) {
+    AttemptPlan plan;
+    plan.send = [this] { return api->Process(0); };
+    plan.judge = [this, xfer](__tag_vfs_err_) {
+        return xfer->context == nullptr ? NextStep::GiveUp() : JudgeDownload(*this, *xfer->context);
+    };
+    plan.copy = CopyError::kAtEnd;
+    plan.retry = "Retry Download";
+    plan.refused = kRequestFailed;
+    plan.exhausted = kRequestFailed;
+    plan.what = &url;
+    return RunAttempts(*this, plan);
 }
 
 }  // namespace ZYROCloud

@@ -1,31 +1,31 @@
-/** File contents of FTP, SFTP and WebDAV servers through libcurl, past the mounted tree. */
-#ifndef ZYROVFS_CLOUD_VFS_VFS_CLOUD_H
-#define ZYROVFS_CLOUD_VFS_VFS_CLOUD_H
+/**
+ * Driver for servers of a standard protocol. It moves the content of one file straight through
+ * libcurl, past the mounted tree; listing and changing such a server is the mount's job, so the
+ * other operations log a line and fail.
+ */
+#ifndef ZYROVFS_CLOUD_VFS_CLOUD_H
+#define ZYROVFS_CLOUD_VFS_CLOUD_H
 
 #include <json/value.h>
 
 #include <string>
 
-#include "core/source_line.h"
 #include "zyrovfs/cloud.h"
 
 struct curl_slist;
 
 namespace ZYROCloud {
 
-/**
- * Uploads and downloads one file. All else that a driver offers happens through the mount for these
- * servers; the operations are there to fill the interface, and fail.
- */
 class VFSCloud : public Cloud {
   public:
     VFSCloud();
-    /** "account", "password", "codepage" and "protocol" of a connection, and its "server_id". */
+    /** Takes "account", "password", "codepage", "protocol" and "server_id" from a profile. */
     VFSCloud(unsigned int uid, const Json::Value& config);
 
+    /** Sets "url" to the server's own address of a location below a live connection. */
     bool GetMetaDataByURI(const std::string& uri, Json::Value& out,
                           const std::string& operation) override;
-    _tag_cloud_type GetCloudType() override;
+    _tag_cloud_type GetCloudType() override { return CLOUD_TYPE_VFS; }
     bool GetAccountInfo(const Json::Value& params, Json::Value& out) override;
     bool GetFileInfo(const std::string& id, const Json::Value& params, Json::Value& out) override;
     bool ListFolder(const std::string& id, const Json::Value& params, Json::Value& out) override;
@@ -38,16 +38,19 @@ class VFSCloud : public Cloud {
     bool UploadProcess(XferData* xfer, const Json::Value& meta) override;
     bool DownloadProcess(XferData* xfer, const Json::Value& meta) override;
     bool Init() override;
+    /** False for null and when memory ran out. */
     bool SetAPIErrorHandler(APIHandler* handler) override;
 
-    /** Whether the server takes extended passive mode; true unless the mount says otherwise. */
+    /** Whether the server can do extended passive mode: true unless the mounted tree knows better.
+     * `url` is not read. */
     bool isSetFTPEPSV(const std::string& url);
 
   private:
-    bool Prepare(XferData& xfer, const std::string& url, const Json::Value* range,
-                 curl_slist** commands);
+    bool Prepare(XferData* xfer);
     bool SetUpFTP(const std::string& url, curl_slist** commands);
-    bool Check(bool step);
+    bool Send(const std::string& url);
+    bool Receive(XferData* xfer, const std::string& url);
+    bool FailLocally();
 
     std::string account_;
     std::string password_;

@@ -110,6 +110,9 @@ bool Exchange::Data(const char* data, size_t size) {
     if (wanted < size || (fault != nullptr && fault->cut_upload == received_)) {
         return Break(Effect::kCutUpload);
     }
+    if (fault != nullptr) {
+        PauseAt(fault->pause_upload, received_, Effect::kPauseUpload);
+    }
     if (fault != nullptr && fault->upload_rate != 0) {
         Happens(Effect::kUploadRate);
         server_.SleepUntil(After(
@@ -142,6 +145,14 @@ bool Exchange::Answer() {
     }
     answer_began_ = steady_clock::now();
     return NeedsRawAnswer() ? WriteRaw() : Queue();
+}
+
+void Exchange::PauseAt(const std::optional<uint64_t>& place, uint64_t done, Effect effect) {
+    if (place && !paused_ && done >= *place) {
+        paused_ = true;
+        Happens(effect);
+        server_.SleepUntil(After(steady_clock::now(), (*fault_)->pause));
+    }
 }
 
 void Exchange::SumBody() {
@@ -194,7 +205,7 @@ bool Exchange::Break(Effect effect) {
 void Exchange::Reset() {
     sockaddr nobody{};
     nobody.sa_family = AF_UNSPEC;
-    connect(SocketOf(connection_), &nobody, sizeof nobody);
+    (void)connect(SocketOf(connection_), &nobody, sizeof nobody);
 }
 
 void Exchange::Happens(Effect effect) {
@@ -212,6 +223,10 @@ ssize_t Exchange::Read(uint64_t position, char* to, size_t size) {
         return -1;
     }
     size = std::min<uint64_t>(size, cut_at_ - position);
+    if (fault_ != nullptr && (*fault_)->pause_answer) {
+        PauseAt((*fault_)->pause_answer, position, Effect::kPause);
+        size = paused_ ? size : std::min<uint64_t>(size, *(*fault_)->pause_answer - position);
+    }
     const uint64_t rate = fault_ == nullptr ? 0 : (*fault_)->answer_rate;
     if (rate != 0) {
         Happens(Effect::kRate);

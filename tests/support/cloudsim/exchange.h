@@ -40,6 +40,8 @@ class Exchange : public std::enable_shared_from_this<Exchange> {
     bool Break(Effect effect);
     void Reset();
     void Happens(Effect effect);
+    /** Waits once, when `done` has reached the place of a declared pause. */
+    void PauseAt(const std::optional<uint64_t>& place, uint64_t done, Effect effect);
     void SumBody();
 
     Reply MakeReply();
@@ -61,7 +63,7 @@ class Exchange : public std::enable_shared_from_this<Exchange> {
     std::unique_ptr<Handler> handler_;
     std::shared_ptr<JournalEntry> entry_;
     std::string body_;  ///< beginning of the request's
-    bool summed_ = false;
+    bool summed_ = false, paused_ = false;
     uint64_t received_ = 0, sent_ = 0;
     Sha1 sum_;
     Server::Time began_, answer_began_;

@@ -73,6 +73,18 @@ Fault& Fault::ThrottleUpload(uint64_t bytes_a_second) {
     return *this;
 }
 
+Fault& Fault::Pause(uint64_t body_bytes, double seconds) {
+    pause_answer = body_bytes;
+    pause = seconds;
+    return *this;
+}
+
+Fault& Fault::PauseUpload(uint64_t body_bytes, double seconds) {
+    pause_upload = body_bytes;
+    pause = seconds;
+    return *this;
+}
+
 Fault& Fault::CutAnswer(uint64_t body_bytes) {
     cut_answer = body_bytes;
     return *this;

@@ -68,6 +68,9 @@ struct Fault {
     Fault& Delay(double seconds);              ///< before the answer
     Fault& Throttle(uint64_t bytes_a_second);  ///< body of the answer
     Fault& ThrottleUpload(uint64_t bytes_a_second);
+    /** Nothing moves for so long when so many bytes of the answer's (the request's) body went. */
+    Fault& Pause(uint64_t body_bytes, double seconds);
+    Fault& PauseUpload(uint64_t body_bytes, double seconds);
     Fault& CutAnswer(uint64_t body_bytes);  ///< closes behind so many bytes of the answer's body
     Fault& CutUpload(uint64_t body_bytes);  ///< closes when so many bytes of the request's came
     Fault& Reset();                         ///< what closes or cuts sends a reset
@@ -90,6 +93,8 @@ struct Fault {
     std::optional<std::string> raw;
     double delay = 0;
     uint64_t answer_rate = 0, upload_rate = 0;
+    std::optional<uint64_t> pause_answer, pause_upload;
+    double pause = 0;
     std::optional<uint64_t> cut_answer, cut_upload;
     bool reset = false;
     Break close = Break::kNone;
@@ -104,10 +109,10 @@ struct Fault {
 /**
  * "GET /2.0/users/me after=1 times=2 status=503 header=Retry-After:1 body=... delay=0.5". The
  * words: host= after= times= (a number or "forever") answer=STATUS status=STATUS body=TEXT
- * header=NAME:VALUE line=TEXT raw=TEXT delay= rate= upload-rate= cut= cut-upload=
- * close=(before|after|effect) close-after-answer reset range=(ignore|start|short) expire-token. In
- * TEXT "\r", "\n", "\s" (blank),
- * "\\" and "\xHH" stand for themselves. Throws std::invalid_argument.
+ * header=NAME:VALUE line=TEXT raw=TEXT delay= rate= upload-rate= pause=BYTES:SECONDS
+ * pause-upload=BYTES:SECONDS cut= cut-upload= close=(before|after|effect) close-after-answer reset
+ * range=(ignore|start|short) expire-token. In TEXT "\r", "\n", "\s" (blank), "\\" and "\xHH" stand
+ * for themselves. Throws std::invalid_argument.
  */
 Fault ParseFault(const std::string& text);
 

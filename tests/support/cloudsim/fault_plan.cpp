@@ -30,6 +30,7 @@ int Effects(const Fault& fault) {
            (fault.cut_upload ? Use::kCutUpload : 0) |
            (fault.close != Break::kNone ? Use::kClose : 0) |
            (fault.range != RangeFault::kNone ? Use::kRange : 0) |
+           (fault.pause_answer ? Use::kPause : 0) | (fault.pause_upload ? Use::kPauseUpload : 0) |
            (fault.expire_token ? Use::kToken : 0);
 }
 

@@ -37,7 +37,9 @@ class FaultPlan {
             kCutUpload = 32,
             kClose = 64,
             kRange = 128,
-            kToken = 256
+            kToken = 256,
+            kPause = 512,
+            kPauseUpload = 1024
         };
         /** This part of the fault takes place now; when it is the last one, the fault is used. */
         void Happens(Effect effect);

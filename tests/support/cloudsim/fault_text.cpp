@@ -86,6 +86,15 @@ std::string Escape(const std::string& plain) {
     return text;
 }
 
+std::string Before(const std::string& pair) {
+    return pair.substr(0, pair.find(':'));
+}
+
+std::string Behind(const std::string& pair) {
+    const size_t colon = pair.find(':');
+    return colon == std::string::npos ? "" : pair.substr(colon + 1);
+}
+
 using Setter = std::function<void(Fault&, const std::string&)>;
 
 const std::map<std::string, Setter>& Setters() {
@@ -103,15 +112,19 @@ const std::map<std::string, Setter>& Setters() {
         {"body", [](Fault& f, const std::string& v) { f.Body(Unescape(v)); }},
         {"header",
          [](Fault& f, const std::string& v) {
-             const size_t colon = v.find(':');
-             f.Header(Unescape(v.substr(0, colon)),
-                      colon == std::string::npos ? "" : Unescape(v.substr(colon + 1)));
+             f.Header(Unescape(Before(v)), Unescape(Behind(v)));
          }},
         {"line", [](Fault& f, const std::string& v) { f.HeaderLine(Unescape(v)); }},
         {"raw", [](Fault& f, const std::string& v) { f.Raw(Unescape(v)); }},
         {"delay", [](Fault& f, const std::string& v) { f.Delay(std::stod(v)); }},
         {"rate", [](Fault& f, const std::string& v) { f.Throttle(Number(v)); }},
         {"upload-rate", [](Fault& f, const std::string& v) { f.ThrottleUpload(Number(v)); }},
+        {"pause",
+         [](Fault& f, const std::string& v) { f.Pause(Number(Before(v)), std::stod(Behind(v))); }},
+        {"pause-upload",
+         [](Fault& f, const std::string& v) {
+             f.PauseUpload(Number(Before(v)), std::stod(Behind(v)));
+         }},
         {"cut", [](Fault& f, const std::string& v) { f.CutAnswer(Number(v)); }},
         {"cut-upload", [](Fault& f, const std::string& v) { f.CutUpload(Number(v)); }},
         {"close", [](Fault& f, const std::string& v) { f.Close(Choice(kBreaks, v)); }},
@@ -147,6 +160,12 @@ void AddAnswer(std::ostream& text, const Fault& fault) {
 }
 
 void AddBreaks(std::ostream& text, const Fault& fault) {
+    if (fault.pause_answer) {
+        text << " pause=" << *fault.pause_answer << ':' << fault.pause;
+    }
+    if (fault.pause_upload) {
+        text << " pause-upload=" << *fault.pause_upload << ':' << fault.pause;
+    }
     if (fault.cut_answer) {
         text << " cut=" << *fault.cut_answer;
     }

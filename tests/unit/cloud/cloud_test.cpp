@@ -63,7 +63,7 @@ TEST(CloudHidden, APathOf4097BytesIsHiddenOneOf4096IsNot) {
 }
 
 TEST(CloudHidden, NamesOfTheBoxQuotesAndSlashes) {
-    for (const char* name : {"@eaDir", "a@ZyroEAStream", "a@ZyroResource", "\"", "'",
+    for (const char* name : {"@ZyroEA", "a@ZyroEAStream", "a@ZyroResource", "\"", "'",
                              ".ZyrotechWorkingDirectory", "a/b", "/"}) {
         EXPECT_TRUE(Cloud::IsHiddenFilePath("/x", name)) << name;
     }

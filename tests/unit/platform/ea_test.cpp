@@ -3,14 +3,14 @@
 #include <gtest/gtest.h>
 
 TEST(HiddenFile, FoldersAndStreamsOfTheBox) {
-    EXPECT_EQ(1, ZYROEAIsHiddenFile("@eaDir"));
+    EXPECT_EQ(1, ZYROEAIsHiddenFile("@ZyroEA"));
     EXPECT_EQ(1, ZYROEAIsHiddenFile("photo.jpg@ZyroResource"));
     EXPECT_EQ(1, ZYROEAIsHiddenFile("photo.jpg@ZyroEAStream"));
     EXPECT_EQ(1, ZYROEAIsHiddenFile("@ZyroEAStream"));
 }
 
 TEST(HiddenFile, NamesOfUsersAreShown) {
-    for (const char* name : {"", "photo.jpg", "@eadir", "@eaDir2", "my@eaDir", "eaDir", "@", "a@b",
+    for (const char* name : {"", "photo.jpg", "@eadir", "@ZyroEA2", "my@ZyroEA", "eaDir", "@", "a@b",
                              "photo@ZyroResource.jpg", "photo@zyroeastream", ".hidden"}) {
         EXPECT_EQ(0, ZYROEAIsHiddenFile(name)) << name;
     }

@@ -133,6 +133,18 @@ TEST_P(Faults, TakesAnUploadNoFasterThanDeclared) {
     EXPECT_GE(std::chrono::steady_clock::now() - began, std::chrono::milliseconds(390));
 }
 
+TEST_P(Faults, StandsStillInTheMiddleOfABody) {
+    const std::string file = amy.AddPattern("0", "a", 300000);
+    box.AddFault(Fault::On("GET", "/d/").Pause(100000, 0.3));
+    box.AddFault(Fault::On("POST", "/api/2.0/files/content").PauseUpload(100000, 0.3));
+    const auto began = std::chrono::steady_clock::now();
+    EXPECT_EQ(amy.Bytes(file), GetContent(file).body);
+    const auto middle = std::chrono::steady_clock::now();
+    EXPECT_GE(middle - began, std::chrono::milliseconds(300));
+    EXPECT_EQ(201, Upload("b", std::string(200000, 'b')).status);
+    EXPECT_GE(std::chrono::steady_clock::now() - middle, std::chrono::milliseconds(300));
+}
+
 TEST_P(Faults, CutsAnAnswerBehindTheDeclaredBytes) {
     const std::string file = amy.AddPattern("0", "a", 300000);
     box.AddFault(Fault::On("GET", "/d/").CutAnswer(200001));
@@ -312,7 +324,8 @@ TEST_P(Faults, ServesManyClientsAtOnce) {
 TEST(FaultText, ReadsWhatItWrites) {
     for (const char* text :
          {"GET /2.0/users/me after=1 times=2 answer=503 body=not\\x20yet header=Retry-After:1",
-          "* *content host=upload times=forever delay=0.5 rate=1000 upload-rate=7 cut=4 "
+          "* *content host=upload times=forever delay=0.5 rate=1000 upload-rate=7 pause=1:2.5 "
+          "cut=4 "
           "cut-upload=5 close=effect range=short reset close-after-answer expire-token",
           "GET / raw=HTTP/1.1\\x20200\\x0d\\x0a line=no\\x20colon status=207"}) {
         const std::string first = cloudsim::ParseFault(text).Text();
