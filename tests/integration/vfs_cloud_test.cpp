@@ -1,31 +1,23 @@
 // Contents of files to and from real servers of standard protocols, past the mounted tree, through
 // the shipped library: what arrives is compared byte for byte.
-#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <filesystem>
-#include <fstream>
 #include <memory>
-#include <random>
 
-#include "support/machine.h"
+#include "support/vfs_cloud_remote.h"
 #include "support/xattrtree/xattrtree.h"
-#include "zyrovfs/zyrovfs_netdrive.h"
 
 namespace {
 
-using namespace ZYROVFS;
+using namespace remote_side;
 using machine::Must;
 using testing::HasSubstr;
 using testing::Not;
-using ZYROCloud::Cloud;
 namespace fs = std::filesystem;
 
-constexpr unsigned kAmy = 4001;
-constexpr const char* kPassword = "first-secret";
 constexpr const char* kFtpLog = "/run/remote/ftp-dialogue.log";
-const std::string kRemote = "/srv/remote/";
 
 class RemoteSide : public testing::Environment {
     void SetUp() override {
@@ -43,75 +35,6 @@ class RemoteSide : public testing::Environment {
 
 const auto* const kRemoteSide = testing::AddGlobalTestEnvironment(new RemoteSide);
 
-/** Bytes without a pattern, the same for each run. */
-std::string Noise(size_t size, unsigned seed = 1) {
-    std::mt19937 random(seed);
-    std::string bytes(size, '\0');
-    for (char& byte : bytes) {
-        byte = static_cast<char>(random());
-    }
-    return bytes;
-}
-
-void PutFile(const std::string& path, const std::string& bytes) {
-    std::ofstream(path, std::ios::binary) << bytes;
-    fs::permissions(path, fs::perms(0644));
-}
-
-/** A local file that a transfer reads or writes through its descriptor. */
-class LocalFile {
-  public:
-    explicit LocalFile(const std::string& bytes = "")
-        : fd_(open(kPath, O_RDWR | O_CREAT | O_TRUNC, 0600)) {
-        EXPECT_EQ(write(fd_, bytes.data(), bytes.size()), static_cast<ssize_t>(bytes.size()));
-        lseek(fd_, 0, SEEK_SET);
-    }
-    LocalFile(const LocalFile&) = delete;
-    LocalFile& operator=(const LocalFile&) = delete;
-    ~LocalFile() { close(fd_); }
-    int Fd() const { return fd_; }
-    static std::string Bytes() { return machine::Read(kPath); }
-
-  private:
-    static constexpr const char* kPath = "/tmp/local-file";
-    int fd_;
-};
-
-struct Location {
-    const char* protocol;
-    const char* host;
-    unsigned port;
-    const char* uri_path;
-    __tag_vfs_err_ wrong_password;
-};
-
-std::ostream& operator<<(std::ostream& out, const Location& l) {
-    return out << l.protocol;
-}
-
-// An ssh server has no status that would tell a refused password from another failure.
-const Location kFtp = {"ftp", "127.0.0.1", 2121, "", VFS_ERR_PERMISSION_DENIED};
-const Location kDav = {"dav", "127.0.0.1", 8080, "", VFS_ERR_PERMISSION_DENIED};
-const Location kDavs = {"davs", "localhost", 8443, "", VFS_ERR_PERMISSION_DENIED};
-const Location kSftp = {"sftp", "127.0.0.1", 2222, "srv/remote", VFS_ERR_UNKNOWN};
-
-std::string Connect(const Location& l) {
-    Json::Value profile;
-    profile["protocol"] = l.protocol;
-    profile["hostname"] = l.host;
-    profile["port"] = l.port;
-    profile["alias"] = std::string("My ") + l.protocol;
-    profile["account"] = "remo";
-    profile["password"] = kPassword;
-    profile["codepage"] = "UTF-8";
-    profile["uri_path"] = l.uri_path;
-    std::string id;
-    Json::Value stored;
-    EXPECT_TRUE(Server::Add(kAmy, Server::VFS_CONFIG_CONNECT, id, profile, false, stored))
-        << GetErrorName(GetError());
-    return id;
-}
-
 /** Members of the live connection's record, as somebody with an editor would change them. */
 void Change(const std::string& id, const Json::Value& members) {
     Json::Value record;
@@ -123,40 +46,7 @@ void Change(const std::string& id, const Json::Value& members) {
     ASSERT_TRUE(Server::CfgSetByID(kAmy, Server::VFS_CONFIG_CONNECT, id, same, record));
 }
 
-class VfsCloud : public testing::TestWithParam<Location> {
-  protected:
-    void SetUp() override {
-        machine::Remote(std::string("password ") + kPassword);
-        id_ = Connect(GetParam());
-        Open();
-    }
-    void TearDown() override {
-        Server::Delete(kAmy, Server::VFS_CONFIG_CONNECT, id_.c_str());
-        Must("rm -rf /srv/remote/new");
-    }
-
-    /** A driver as the connection stands now. */
-    void Open() {
-        cloud_.reset(
-            ZYROCloud::Utils::CreateCloudByURI(kAmy, id_ + "/any", Server::VFS_CONFIG_CONNECT));
-        ASSERT_NE(cloud_, nullptr);
-        ASSERT_EQ(cloud_->GetCloudType(), ZYROCloud::CLOUD_TYPE_VFS);
-    }
-    bool Upload(const std::string& name, const std::string& bytes) {
-        const LocalFile file(bytes);
-        return Cloud::UploadFile(cloud_.get(), id_ + "/" + name, file.Fd(),
-                                 static_cast<long long>(bytes.size()), nullptr, nullptr, nullptr);
-    }
-    bool Download(const std::string& name, long long size) {
-        const LocalFile file;
-        return Cloud::DownloadFile(cloud_.get(), id_ + "/" + name, file.Fd(), size, nullptr,
-                                   nullptr, nullptr);
-    }
-    std::string Cause() const { return cloud_->GetError().toStyledString(); }
-
-    std::string id_;
-    std::unique_ptr<Cloud> cloud_;
-};
+class VfsCloud : public ConnectionTest {};
 
 TEST_P(VfsCloud, WholeFilesArriveAsTheyWere) {
     for (const size_t size : {0, 1, 23, 16384, 3 * 1024 * 1024 + 7}) {
@@ -329,54 +219,6 @@ TEST_P(FtpCloud, AReadOnlyFolderRefusesAnUpload) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Servers, FtpCloud, testing::Values(kFtp),
-                         [](const auto& param) { return std::string(param.param.protocol); });
-
-/** A davs server whose certificate nobody but this user trusts. */
-class PinnedCloud : public VfsCloud {
-  protected:
-    static void SelfSign() {
-        Must(
-            "cd /srv/tls && openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:P-256 -nodes"
-            " -days 2 -subj /CN=localhost -keyout self.key -out self.crt 2>/dev/null &&"
-            " cp -n server.pem by-the-ca.pem; cat self.key self.crt >server.pem");
-        machine::Remote("restart dav");
-    }
-    void TearDown() override {
-        Must("cp /srv/tls/by-the-ca.pem /srv/tls/server.pem");
-        machine::Remote("restart dav");
-        Must("rm -rf /usr/zyro/etc/zyrovfs/4001/ssl");
-        VfsCloud::TearDown();
-    }
-    static bool Trust() {
-        return Utils::SSLVerifyPeer("remo", kPassword, "davs://localhost:8443/", true);
-    }
-};
-
-TEST_P(PinnedCloud, AServerWithAnUntrustedCertificateGetsAndGivesNothing) {
-    SelfSign();
-    PutFile(kRemote + "secret.txt", "secret");
-    EXPECT_FALSE(Download("secret.txt", 6));
-    EXPECT_EQ(LocalFile::Bytes(), "");
-    EXPECT_FALSE(Upload("new.txt", "secret"));
-    EXPECT_FALSE(fs::exists(kRemote + "new.txt"));
-    fs::remove(kRemote + "secret.txt");
-}
-
-TEST_P(PinnedCloud, ACertificateThatTheUserTrustsIsEnoughUntilItIsRenewed) {
-    SelfSign();
-    ASSERT_TRUE(Trust()) << GetErrorName(GetError());
-    const std::string bytes = Noise(100000, 5);
-    ASSERT_TRUE(Upload("pinned.bin", bytes)) << Cause();
-    EXPECT_TRUE(machine::Read(kRemote + "pinned.bin") == bytes);
-    ASSERT_TRUE(Download("pinned.bin", 100000)) << Cause();
-    EXPECT_TRUE(LocalFile::Bytes() == bytes);
-    SelfSign();
-    EXPECT_FALSE(Download("pinned.bin", 100000));
-    EXPECT_EQ(LocalFile::Bytes(), "");
-    fs::remove(kRemote + "pinned.bin");
-}
-
-INSTANTIATE_TEST_SUITE_P(Servers, PinnedCloud, testing::Values(kDavs),
                          [](const auto& param) { return std::string(param.param.protocol); });
 
 }  // namespace
