@@ -221,12 +221,15 @@ TEST_F(BoxUpload, CancelledBeforeItsRequestIsNotSent) {
     EXPECT_THAT(Requests(), IsEmpty());
 }
 
-TEST_F(BoxUpload, OnAConnectionThatDiedMeanwhileIsSentOnANewOne) {
-    service.AddFault(Fault::On("POST", kUploadPath).CloseAfterAnswer());
-    const std::string content(1 << 20, 'y');
+TEST_F(BoxUpload, OnAKeptConnectionThatDiesInTheMiddleIsSentAgainOnANewOne) {
+    service.AddFault(Fault::On("POST", kUploadPath).After(1).CutUpload(100000).Reset());
+    const std::string content(8 << 20, 'y');
     EXPECT_TRUE(Upload("first", "/first"));
     EXPECT_TRUE(Upload(content, "/second")) << seams::LogDump();
     EXPECT_TRUE(Stored("/second") == content);
+    // libcurl does it by itself: no attempt of the driver's is used up.
+    EXPECT_EQ(service.Journal().Count("POST", kUploadPath), 3U);
+    EXPECT_FALSE(seams::LoggedPart("Retry directly upload")) << seams::LogDump();
 }
 
 TEST_F(BoxUpload, WithAPieceOfItsDescriptionMissingFails) {
