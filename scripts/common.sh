@@ -14,13 +14,13 @@ RUN_PACKAGES=(
 # The servers that demo and tests mount, and what the private view of the machine needs.
 SERVER_PACKAGES=(
   vsftpd openssh-server lighttpd lighttpd-mod-webdav lighttpd-mod-openssl samba glib-networking
-  iproute2 util-linux openssl procps libmicrohttpd-dev libgnutls28-dev
+  iproute2 util-linux openssl procps libmicrohttpd-dev libgnutls28-dev libfuse3-dev
 )
 TEST_PACKAGES=(
-  libgtest-dev libgmock-dev libfuse3-dev clang clang-tidy clang-format libclang-rt-14-dev python3
+  libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev python3
   man-db groff-base bsdextrautils rclone
 )
-BENCH_PACKAGES=(libbenchmark-dev python3 libmicrohttpd-dev libgnutls28-dev)
+BENCH_PACKAGES=(libbenchmark-dev python3 libmicrohttpd-dev libgnutls28-dev libfuse3-dev)
 
 need_root() {
   [ "$(id -u)" = 0 ] || { echo "$0: root is needed: sudo $0" >&2; exit 2; }

@@ -55,8 +55,7 @@ class Attempts {
             return false;
         }
         LOG_ERROR_AT(at_, "%s: %d/%d", plan_.retry, plan_.first_number + number, kMostAttempts);
-        sleep(next.seconds < 0 ? cloud_.GetRetrySleepTime()
-                                  : static_cast<unsigned>(next.seconds));
+        sleep(next.seconds < 0 ? cloud_.GetRetrySleepTime() : static_cast<unsigned>(next.seconds));
         return true;
     }
 

@@ -4,12 +4,14 @@
 
 #include <json/value.h>
 
+#include <algorithm>
 #include <utility>
 
 namespace ZYROCloud {
 
 /** Moves the items of `page[member]` that `keep` accepts to the end of the array `out`. A page
- * without the member has no items; throws Json::LogicError when it is no array. */
+ * without the member has no items; throws Json::LogicError when it is no array. `keep` may be asked
+ * twice about an item. */
 template <typename Keep>
 void MoveItems(Json::Value& page, const char* member, Json::Value& out, Keep keep) {
     Json::Value items;
@@ -18,6 +20,14 @@ void MoveItems(Json::Value& page, const char* member, Json::Value& out, Keep kee
     }
     if (!items.isNull() && !items.isArray()) {
         Json::throwLogicError("the items of a page are no array");
+    }
+    const auto is_kept = [&keep](const Json::Value& item) { return keep(item); };
+    if (out.empty() && std::all_of(items.begin(), items.end(), is_kept)) {
+        // Most folders are one page of visible items: nothing needs to be moved one by one.
+        if (!items.empty()) {
+            out.swap(items);
+        }
+        return;
     }
     for (Json::Value& item : items) {
         if (keep(static_cast<const Json::Value&>(item))) {

@@ -36,7 +36,7 @@ std::string UserName(unsigned int uid) {
     if (ZYROUserGetByUID(uid, &user) < 0) {
         return "";
     }
-    const std::string name = user->name;
+    std::string name = user->name;
     ZYROUserFree(user);
     return name;
 }

@@ -4,6 +4,7 @@
 #include <ctime>
 #include <limits>
 #include <new>
+#include <string_view>
 
 #include "cloud/box/box_api.h"
 #include "cloud/guard.h"
@@ -21,6 +22,8 @@ using namespace ZYROVFS;
 using namespace box;
 
 namespace {
+
+constexpr std::string_view kName = "name";
 
 Json::Value WithFields(const Json::Value& params, const char* fields) {
     Json::Value query = params;
@@ -49,7 +52,7 @@ Box::Box(unsigned int owner, const Json::Value& profile) : PublicCloud(owner, pr
 
 bool Box::Init() {
     // Refusals are told apart by the body of the answer.
-    return SetAPIErrorHandler(api) && api->SetReturnOnError(false);
+    return Box::SetAPIErrorHandler(api) && api->SetReturnOnError(false);
 }
 
 bool Box::SetAPIErrorHandler(APIHandler* handler) {
@@ -103,7 +106,8 @@ bool Box::ListFolder(const std::string& id, const Json::Value& params, Json::Val
     unsigned int offset = 0;
     const auto fetch = [&](Json::Value& page) { return ListFolder(id, params, page, &offset); };
     const auto keep = [](const Json::Value& item) {
-        return !IsHiddenFilePath("", item.get("name", "").asString());
+        const Json::Value* name = item.find(kName.data(), kName.data() + kName.size());
+        return name == nullptr || !IsHiddenFilePath("", name->asString());
     };
     const auto more = [&](const Json::Value& page) {
         return page.isMember("total_count") && offset < page["total_count"].asUInt();

@@ -20,10 +20,9 @@ class UploadBody {
 
     /** Must outlive the request. */
     void GiveTo(APIHandler& api);
-    /** Whether the body can be sent again after some of it went. */
-    bool IsFile() const { return start_ >= 0; }
 
   private:
+    bool IsFile() const { return start_ >= 0; }
     static size_t Read(char* data, size_t size, size_t count, void* body);
     static int Seek(void* body, curl_off_t offset, int origin);
 

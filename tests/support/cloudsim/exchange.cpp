@@ -205,7 +205,7 @@ bool Exchange::Break(Effect effect) {
 void Exchange::Reset() {
     sockaddr nobody{};
     nobody.sa_family = AF_UNSPEC;
-    connect(SocketOf(connection_), &nobody, sizeof nobody);
+    (void)connect(SocketOf(connection_), &nobody, sizeof nobody);
 }
 
 void Exchange::Happens(Effect effect) {

@@ -151,7 +151,7 @@ std::string Exchange::RawHead() const {
         head += line + "\r\n";
     }
     for (const auto& [name, value] : reply_.headers) {
-        head += name + ": " + value + "\r\n";
+        head.append(name).append(": ").append(value).append("\r\n");
     }
     return head + "Content-Length: " + std::to_string(reply_.length) +
            "\r\nConnection: close\r\n\r\n";

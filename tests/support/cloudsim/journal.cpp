@@ -32,7 +32,7 @@ Json::Value ToJson(const JournalEntry& entry) {
     line["target"] = Printable(entry.target);
     line["headers"] = Json::arrayValue;
     for (const auto& [name, value] : entry.headers) {
-        line["headers"].append(Printable(name + ": " + value));
+        line["headers"].append(Printable(name).append(": ").append(Printable(value)));
     }
     line["body"] = Printable(entry.body);
     line["body_size"] = Json::UInt64(entry.body_size);

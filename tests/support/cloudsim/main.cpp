@@ -8,10 +8,12 @@
 #include <filesystem>
 #include <fstream>
 #include <iostream>
+#include <memory>
 #include <sstream>
 #include <stdexcept>
 
 #include "support/cloudsim/cloudsim.h"
+#include "support/cloudsim/main_mount.h"
 #include "support/test_certs.h"
 
 namespace {
@@ -37,6 +39,7 @@ was not used.
     --many N SIZE         N files in a folder "many", made of a pattern
     --pattern NAME SIZE   one such file
     --quota BYTES         --max-upload BYTES
+    --mount FOLDER        shows its names and ids there, as a mounted backend would
     --tokens FILE         the pair of tokens that it starts with, written there as JSON
   --client ID:SECRET    of the token endpoint (client:secret unless given)
   --token-life SECONDS  of all tokens given (3600)
@@ -54,7 +57,7 @@ was not used.
 )";
 
 struct AccountPlan {
-    std::string email, name, served, tokens;
+    std::string email, name, served, tokens, mounted;
     std::vector<std::pair<std::string, uint64_t>> patterns;
     size_t many = 0;
     uint64_t many_size = 0, quota = 0, max_upload = 0;
@@ -173,6 +176,7 @@ const std::map<std::string, Option>& AccountOptions() {
          }},
         {"--name", [](Plan& plan, Arguments& in) { LastAccount(plan).name = in.Word(); }},
         {"--serve", [](Plan& plan, Arguments& in) { LastAccount(plan).served = in.Word(); }},
+        {"--mount", [](Plan& plan, Arguments& in) { LastAccount(plan).mounted = in.Word(); }},
         {"--tokens", [](Plan& plan, Arguments& in) { LastAccount(plan).tokens = in.Word(); }},
         {"--many",
          [](Plan& plan, Arguments& in) {
@@ -231,7 +235,7 @@ void Say(const std::string& name, const std::string& value) {
     std::cout << name << '=' << value << '\n';
 }
 
-void Fill(cloudsim::BoxService& box, const AccountPlan& plan, int64_t life) {
+cloudsim::Account& Fill(cloudsim::BoxService& box, const AccountPlan& plan, int64_t life) {
     cloudsim::Account& account = box.AddAccount(plan.email, plan.name);
     if (plan.quota != 0) {
         account.SetQuota(plan.quota);
@@ -260,6 +264,7 @@ void Fill(cloudsim::BoxService& box, const AccountPlan& plan, int64_t life) {
         document["expire_time"] = Json::Int64(box.Now() + life);
         WriteAll(plan.tokens, cloudsim::OneLine(document) + "\n");
     }
+    return account;
 }
 
 /** An open descriptor for each file of a served folder. */
@@ -268,6 +273,17 @@ void AllowManyFiles() {
     getrlimit(RLIMIT_NOFILE, &limit);
     limit.rlim_cur = limit.rlim_max;
     setrlimit(RLIMIT_NOFILE, &limit);
+}
+
+/** Until a signal ends the program. */
+void Wait(const sigset_t& ends, std::vector<std::unique_ptr<cloudsim::MountedAccount>>& mounted) {
+    const timespec interval{0, 100000000};
+    while (mounted.empty() ? sigwaitinfo(&ends, nullptr) < 0
+                           : sigtimedwait(&ends, nullptr, &interval) < 0) {
+        for (const auto& account : mounted) {
+            account->Refresh();
+        }
+    }
 }
 
 int Serve(const Plan& plan) {
@@ -290,13 +306,16 @@ int Serve(const Plan& plan) {
     Say("api", box.ApiHost());
     Say("upload", box.UploadHost());
     Say("download", box.DownloadHost());
+    std::vector<std::unique_ptr<cloudsim::MountedAccount>> mounted;
     for (const AccountPlan& account : plan.accounts) {
-        Fill(box, account, plan.token_life);
+        const cloudsim::Account& made = Fill(box, account, plan.token_life);
+        if (!account.mounted.empty()) {
+            mounted.push_back(std::make_unique<cloudsim::MountedAccount>(made, account.mounted));
+            mounted.back()->Refresh();
+        }
     }
     std::cout << "ready" << std::endl;
-
-    int signal = 0;
-    sigwait(&ends, &signal);
+    Wait(ends, mounted);
     const std::vector<std::string> unused = box.UnusedFaults();
     for (const std::string& fault : unused) {
         std::cerr << "cloudsim: fault not used: " << fault << '\n';

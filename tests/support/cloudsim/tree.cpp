@@ -1,9 +1,8 @@
 #include "support/cloudsim/tree.h"
 
-#include <wctype.h>
-
 #include <algorithm>
 #include <clocale>
+#include <cwctype>
 
 namespace cloudsim {
 namespace {

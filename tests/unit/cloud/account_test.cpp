@@ -11,23 +11,36 @@ namespace {
 
 class AskAccountTest : public BoxTest {
   protected:
-    Json::Value Profile() const {
-        Json::Value profile;
+    void SetUp() override {
+        BoxTest::SetUp();
         profile["access_token"] = granted.access_token;
         profile["refresh_token"] = granted.refresh_token;
         profile["client_id"] = "mine";
         profile["server_id"] = kServerId;
-        return profile;
     }
-    Json::Value out, error;
+    bool Ask(_tag_cloud_type type) {
+        return AskAccount(type, profiles::kUser, profile, Json::Value(), out, error);
+    }
+    Json::Value profile, out, error;
 };
 
 TEST_F(AskAccountTest, GivesWhatTheServiceSays) {
     error = "before";
-    EXPECT_TRUE(AskAccount(CLOUD_TYPE_BOX, profiles::kUser, Profile(), Json::Value(), out, error))
-        << seams::LogDump();
+    EXPECT_TRUE(Ask(CLOUD_TYPE_BOX)) << seams::LogDump();
     EXPECT_EQ(out["login"].asString(), "amy@example.com");
-    EXPECT_TRUE(error.isNull());
+    EXPECT_EQ(json::toString(error), "{}");
+    EXPECT_EQ(profile["access_token"], granted.access_token) << "still the same";
+}
+
+TEST_F(AskAccountTest, WithATokenAtItsEndHandsTheNewOneBack) {
+    profile["expire_time"] = "1";
+    profile["expires_in"] = 3600;
+    EXPECT_TRUE(Ask(CLOUD_TYPE_BOX)) << seams::LogDump();
+    EXPECT_NE(profile["access_token"], granted.access_token);
+    EXPECT_EQ(profile["access_token"], amy.LastTokens().access_token);
+    EXPECT_EQ(profile["refresh_token"], amy.LastTokens().refresh_token);
+    EXPECT_NE(profile["expire_time"], "1");
+    EXPECT_FALSE(profile.isMember("expires_in"));
 }
 
 TEST_F(AskAccountTest, OfAnAddressWhereNobodyListensLeavesTheDriversRecord) {
@@ -35,7 +48,7 @@ TEST_F(AskAccountTest, OfAnAddressWhereNobodyListensLeavesTheDriversRecord) {
     ASSERT_TRUE(json::fromFile(document, paths::kServiceConfig));
     document["hosts"]["BoxApiHost"] = "http://127.0.0.1:1";
     ASSERT_TRUE(json::toFile(document, paths::kServiceConfig, 0640));
-    EXPECT_FALSE(AskAccount(CLOUD_TYPE_BOX, profiles::kUser, Profile(), Json::Value(), out, error));
+    EXPECT_FALSE(Ask(CLOUD_TYPE_BOX));
     EXPECT_EQ(error["code"].asInt(), VFS_ERR_CONNECT_FAILED) << json::toString(error);
 }
 
@@ -43,14 +56,14 @@ TEST_F(AskAccountTest, OfAServiceWithoutADriverFailsWithoutARecord) {
     for (const _tag_cloud_type type : {CLOUD_TYPE_GOOGLE, CLOUD_TYPE_DROPBOX, CLOUD_TYPE_ONEDRIVE,
                                        CLOUD_TYPE_UNKNOWN, CLOUD_TYPE_HUBIC}) {
         error = "before";
-        EXPECT_FALSE(AskAccount(type, profiles::kUser, Profile(), Json::Value(), out, error));
+        EXPECT_FALSE(Ask(type));
         EXPECT_TRUE(error.isNull());
     }
     EXPECT_TRUE(seams::Logged("No driver for box://amy@example.com")) << seams::LogDump();
 }
 
 TEST_F(AskAccountTest, OfAServerOfAStandardProtocolFails) {
-    EXPECT_FALSE(AskAccount(CLOUD_TYPE_VFS, profiles::kUser, Profile(), Json::Value(), out, error));
+    EXPECT_FALSE(Ask(CLOUD_TYPE_VFS));
     EXPECT_EQ(json::toString(error), "{}");
     EXPECT_TRUE(seams::Logged("VFSCloud not implement get account info"));
 }

@@ -2,8 +2,6 @@
 
 #include <memory>
 
-#include "support/catalogue.h"
-#include "support/catalogue_test.h"
 #include "support/profiles.h"
 #include "support/seams.h"
 #include "zyrovfs/cloud_utils.h"

@@ -23,7 +23,8 @@ void Plant(APIHandler& api) {
 
 std::string WithSecrets(const std::string& url) {
     const size_t host = url.find("://") + 3;
-    return url.substr(0, host) + "canary-user:canary-pw%40x@" + url.substr(host) + "?sig=canary-url";
+    return url.substr(0, host) + "canary-user:canary-pw%40x@" + url.substr(host) +
+           "?sig=canary-url";
 }
 
 class Secrets : public testing::Test {

@@ -64,11 +64,12 @@ class BoxTest : public profiles::ProfileTest {
         std::filesystem::create_directories(paths::kConfigRoot);
         ASSERT_TRUE(json::toFile(document, paths::kServiceConfig, 0640));
         ASSERT_TRUE(Utils::AddClient("box", "mine", kSecret));
+        Renew();
         Json::Value connections;
-        connections[kServerId]["protocol"] = "box";
+        connections[kServerId] = Stored();
+        profiles::Put(profiles::VFS_CONFIG_SERVER, connections);
         connections[kServerId]["path"] = tree.Folder();
         profiles::Put(profiles::VFS_CONFIG_CONNECT, connections);
-        Renew();
         seams::Reset();
         YLIBCErrSetEx(0, "test", 1);
     }
@@ -95,6 +96,24 @@ class BoxTest : public profiles::ProfileTest {
         profile["client_id"] = "mine";
         profile["server_id"] = kServerId;
         box = std::make_unique<Box>(profiles::kUser, profile);
+    }
+
+    /** The profile as it stands in a file. */
+    Json::Value Stored() const {
+        Json::Value profile;
+        profile["protocol"] = "box";
+        profile["alias"] = profile["email"] = "amy@example.com";
+        profile["account_info"] = "{}";
+        profile["client_id"] = "mine";
+        profile["expire_time"] = "500";
+        profile["path"] = "";
+        for (const auto& [key, token] : {std::pair("access_token", granted.access_token),
+                                         std::pair("refresh_token", granted.refresh_token)}) {
+            char cipher[4096] = "";
+            EXPECT_NE(Server::SzEncrypt(token.c_str(), cipher, sizeof cipher), 0);
+            profile[key] = cipher;
+        }
+        return profile;
     }
 
     /** Makes the mounted tree know what the account has at this path. */

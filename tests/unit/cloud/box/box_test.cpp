@@ -75,6 +75,23 @@ TEST_F(BoxAccount, OfABusyServiceIsAskedSevenTimesInAll) {
         << seams::LogDump();
 }
 
+TEST_F(BoxAccount, IsWrittenIntoBothProfiles) {
+    EXPECT_TRUE(box->UpdateAccountInfo()) << seams::LogDump();
+    EXPECT_EQ(Last().Query("fields"), "id,name,login,space_used,space_amount,max_upload_size");
+    for (const auto mode : {profiles::VFS_CONFIG_CONNECT, profiles::VFS_CONFIG_SERVER}) {
+        const Json::Value stored = profiles::Stored(mode)[kServerId];
+        EXPECT_EQ(Object(stored["account_info"].asString())["login"], "amy@example.com") << mode;
+    }
+}
+
+TEST_F(BoxAccount, OfALostConnectionCannotBeWritten) {
+    profiles::Put(profiles::VFS_CONFIG_CONNECT, Object("{}"));
+    EXPECT_FALSE(box->UpdateAccountInfo());
+    EXPECT_EQ(box->GetErrorCode(), VFS_ERR_PROFILE_UPDATE);
+    EXPECT_TRUE(seams::Logged("Failed to update connection config")) << seams::LogDump();
+    EXPECT_TRUE(seams::LoggedPart("box.cpp:"));
+}
+
 TEST_F(BoxListing, AFolderOf2500VisibleItemsTakesThreeRequests) {
     const std::string many = amy.AddFolder(root, "many");
     amy.AddMany(many, 2500, 1);
@@ -220,6 +237,7 @@ TEST_F(BoxToken, ThatIsRefusedIsRenewedOnceAndTheRequestRepeated) {
     EXPECT_EQ(box->Token().access_token, amy.LastTokens().access_token);
     EXPECT_EQ(box->Token().refresh_token, amy.LastTokens().refresh_token);
     EXPECT_NE(box->Token().refresh_token, granted.refresh_token);
+    EXPECT_NE(profiles::Stored(profiles::VFS_CONFIG_CONNECT)[kServerId]["expire_time"], "500");
 }
 
 TEST_F(BoxToken, ThatHasEndedIsRenewedBeforeTheRequest) {

@@ -121,14 +121,29 @@ TEST_F(BoxUpload, IsRefusedForWhatTheServiceDoesNotTake) {
 }
 
 TEST_F(BoxUpload, ThatTheServiceRefusesAtItsEndHasItsCode) {
-    service.AddFault(
-        Fault::On("POST", kUploadPath).Answer(403, R"({"code":"storage_limit_exceeded"})"));
-    EXPECT_FALSE(Upload("hello"));
-    EXPECT_EQ(box->GetErrorCode(), VFS_ERR_QUOTA_EXCEEDED);
-    EXPECT_TRUE(
-        seams::LoggedPart("Failed to process  " + service.UploadHost() + kUploadPath + ", err: {"))
-        << seams::LogDump();
+    struct {
+        int status;
+        const char* body;
+        __tag_vfs_err_ code;
+    } rows[] = {
+        {403, R"({"code":"storage_limit_exceeded"})", VFS_ERR_QUOTA_EXCEEDED},
+        {403, R"({"code":"file_size_limit_exceeded"})", VFS_ERR_FILE_TOO_LARGE},
+        {400, R"({"code":"item_name_invalid"})", VFS_ERR_INVALID_NAME},
+        {404, "{}", VFS_ERR_NOT_FOUND},
+        {409, R"({"context_info":{"conflicts":{"type":"file","id":"1"}}})", VFS_ERR_CONFLICT},
+        {409, R"({"context_info":{"conflicts":{"type":"folder","id":"1"}}})", VFS_ERR_CONFLICT},
+        {412, "", VFS_ERR_BAD_REQUEST}};
+    for (const auto& row : rows) {
+        seams::Reset();
+        service.AddFault(Fault::On("POST", kUploadPath).Answer(row.status, row.body));
+        EXPECT_FALSE(Upload("hello")) << row.body;
+        EXPECT_EQ(box->GetErrorCode(), row.code) << row.body;
+        EXPECT_TRUE(seams::LoggedPart("Failed to process  " + service.UploadHost() + kUploadPath +
+                                      ", err: {"))
+            << seams::LogDump();
+    }
     EXPECT_FALSE(amy.Exists("/a.txt"));
+    EXPECT_EQ(service.Journal().Count("DELETE", "/"), 0U);
 }
 
 TEST_F(BoxUpload, RefusedWithStatus401FailsAndTheNextCallWorks) {
@@ -206,12 +221,15 @@ TEST_F(BoxUpload, CancelledBeforeItsRequestIsNotSent) {
     EXPECT_THAT(Requests(), IsEmpty());
 }
 
-TEST_F(BoxUpload, OnAConnectionThatDiedMeanwhileIsSentOnANewOne) {
-    service.AddFault(Fault::On("POST", kUploadPath).CloseAfterAnswer());
-    const std::string content(1 << 20, 'y');
+TEST_F(BoxUpload, OnAKeptConnectionThatDiesInTheMiddleIsSentAgainOnANewOne) {
+    service.AddFault(Fault::On("POST", kUploadPath).After(1).CutUpload(100000).Reset());
+    const std::string content(8 << 20, 'y');
     EXPECT_TRUE(Upload("first", "/first"));
     EXPECT_TRUE(Upload(content, "/second")) << seams::LogDump();
     EXPECT_TRUE(Stored("/second") == content);
+    // libcurl does it by itself: no attempt of the driver's is used up.
+    EXPECT_EQ(service.Journal().Count("POST", kUploadPath), 3U);
+    EXPECT_FALSE(seams::LoggedPart("Retry directly upload")) << seams::LogDump();
 }
 
 TEST_F(BoxUpload, WithAPieceOfItsDescriptionMissingFails) {
