@@ -161,6 +161,21 @@ TEST_F(Callbacks, AFileThatIsReadAgainFromItsStartIsSentWhole) {
     EXPECT_EQ(Read(2000), 0U);
 }
 
+TEST_F(Callbacks, ReadsGetOutOfStepWithABufferThatBeginsJustBehindAPage) {
+    Put("source", Pattern(100000));
+    const UniqueFd fd = Open("source");
+    context_.fd = fd.Get();
+    transfer.source_end = 100000;
+    alignas(4096) static char page[40960];
+    EXPECT_EQ(FileReadCallback(page + 16, 1, 32768, &context_), 32768U - 2048U);
+    EXPECT_EQ(FileReadCallback(page + 16, 1, 32768, &context_), 32768U);
+    EXPECT_EQ(FileReadCallback(page + 16, 1, 8192, &context_), 8192U);
+    lseek(fd.Get(), 0, SEEK_SET);
+    EXPECT_EQ(FileReadCallback(page, 1, 32768, &context_), 32768U);
+    EXPECT_EQ(FileReadCallback(page + 16, 1, 8192, &context_), 8192U) << "too short for that";
+    EXPECT_EQ(std::string(page + 16, 8192), Pattern(100000).substr(32768, 8192));
+}
+
 TEST_F(Callbacks, APipeHasNoEndThatIsKnown) {
     int ends[2];
     ASSERT_EQ(pipe(ends), 0);
