@@ -20,7 +20,7 @@ TEST_PACKAGES=(
   libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev python3
   man-db groff-base bsdextrautils rclone
 )
-BENCH_PACKAGES=(libbenchmark-dev python3 libmicrohttpd-dev libgnutls28-dev libfuse3-dev)
+BENCH_PACKAGES=(libbenchmark-dev python3 libmicrohttpd-dev libgnutls28-dev libfuse3-dev nginx curl rclone)
 
 need_root() {
   [ "$(id -u)" = 0 ] || { echo "$0: root is needed: sudo $0" >&2; exit 2; }

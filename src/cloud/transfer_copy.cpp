@@ -1,13 +1,9 @@
-#include <sched.h>
 #include <unistd.h>
-
-#include <ctime>
 
 #include "cloud/guard.h"
 #include "cloud/transfer.h"
 #include "cloud/transfer_slot.h"
 #include "core/error_cell.h"
-#include "core/handle.h"
 #include "core/json.h"
 #include "core/log.h"
 

@@ -3,7 +3,6 @@
 #include <sched.h>
 
 #include <algorithm>
-#include <cerrno>
 #include <cstdlib>
 #include <cstring>
 
