@@ -48,7 +48,8 @@ cmake --build by-cmake >/dev/null
 expect "0 profiles" "$(by-cmake/caller)"
 echo "by the CMake package: ok"
 
-sed -n '/^```cpp$/,/^```$/p' "$source/docs/callers-guide.md" | sed '1d;$d' |
+sed '1,/^## A complete program$/d' "$source/docs/callers-guide.md" |
+  sed -n '/^```cpp$/,/^```$/p' | sed '1d;$d' |
   diff - "$source/docs/example/example.cpp" >&2 || {
   echo "the guide shows another program than docs/example" >&2
   exit 1

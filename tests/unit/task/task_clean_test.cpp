@@ -17,7 +17,6 @@
 
 namespace {
 
-time_t the_time = 0;  ///< what time() answers, if set
 bool no_fork = false;
 pid_t forked = 0;
 bool no_close = false;
@@ -40,14 +39,6 @@ void Call(const std::function<void()>& hook) {
 }  // namespace
 
 extern "C" {
-
-time_t time(time_t* out) noexcept {
-    const time_t now = the_time != 0 ? the_time : Real<time_t(time_t*)>("time")(nullptr);
-    if (out != nullptr) {
-        *out = now;
-    }
-    return now;
-}
 
 int fclose(FILE* file) {
     Call(before_close);
@@ -100,7 +91,6 @@ constexpr pid_t kNobody = 0;
 class TaskClean : public TaskTest {
   protected:
     void TearDown() override {
-        the_time = 0;
         no_fork = false;
         forked = 0;
         no_close = false;
@@ -238,10 +228,11 @@ TEST_F(TaskClean, OfTwoCleansWithinTwoSecondsTheSecondIsTrueAndDoesNothing) {
 }
 
 TEST_F(TaskClean, AStampWithinTwoSecondsOnEitherSideKeepsTheQueue) {
-    the_time = 1700000000;
+    constexpr time_t kNow = 1700000000;
+    seams::SetTime(kNow);
     for (const int distance : {-3, -2, -1, 0, 1, 2, 3}) {
         PutThree();
-        PutStamp(the_time + distance);
+        PutStamp(kNow + distance);
         const bool just_cleaned = distance >= -2 && distance <= 2;
         EXPECT_TRUE(Clean());
         EXPECT_EQ(Queue() == Staying(), !just_cleaned) << distance;
