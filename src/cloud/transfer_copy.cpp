@@ -54,12 +54,19 @@ bool UploadAll(Side& side) {
     return true;
 }
 
+/** Behind what went through: a failure that the driver overcame by itself, such as a name in the
+ * way or a token that had ended, is no failure of the copy. */
+void Succeed(Side& side) {
+    SetPlatformErr(0);
+    side.cloud->SetError(VFS_ERR_NONE, "");
+}
+
 void* UploadThread(void* argument) {
     Side& side = *static_cast<Side*>(argument);
     const bool done = Guard(*side.cloud, [&side] { return UploadAll(side); });
     SlotLock lock;
     if (done) {
-        SetPlatformErr(0);
+        Succeed(side);
     }
     transfer.slot_state = done ? kUploadDone : kSlotAborted;
     lock.Signal(transfer.slot_free_cond);
@@ -72,7 +79,7 @@ void* DownloadThread(void* argument) {
         Guard(*side.cloud, [&side] { return side.cloud->Download(&side.xfer, side.meta); });
     SlotLock lock;
     if (done) {
-        SetPlatformErr(0);
+        Succeed(side);
     }
     if (!done) {
         transfer.slot_state = kSlotAborted;

@@ -10,8 +10,8 @@ TEST(HiddenFile, FoldersAndStreamsOfTheBox) {
 }
 
 TEST(HiddenFile, NamesOfUsersAreShown) {
-    for (const char* name : {"", "photo.jpg", "@eadir", "@ZyroEA2", "my@ZyroEA", "eaDir", "@", "a@b",
-                             "photo@ZyroResource.jpg", "photo@zyroeastream", ".hidden"}) {
+    for (const char* name : {"", "photo.jpg", "@zyroea", "@ZyroEA2", "my@ZyroEA", "ZyroEA", "@",
+                             "a@b", "photo@ZyroResource.jpg", "photo@zyroeastream", ".hidden"}) {
         EXPECT_EQ(0, ZYROEAIsHiddenFile(name)) << name;
     }
 }
