@@ -97,6 +97,18 @@ NextStep JudgeDownload(Cloud& cloud, const XferContext& context) {
     return NextStep::RetryIf(context.can_retry && cloud.IsNeedRetry());
 }
 
+AttemptPlan DownloadPlan(Cloud& cloud, const XferData& xfer, const std::string& url) {
+    AttemptPlan plan;
+    plan.judge = [&cloud, &xfer](__tag_vfs_err_) {
+        return xfer.context == nullptr ? NextStep::GiveUp() : JudgeDownload(cloud, *xfer.context);
+    };
+    plan.retry = "Retry Download";
+    plan.refused = kRequestFailed;
+    plan.exhausted = kRequestFailed;
+    plan.what = &url;
+    return plan;
+}
+
 bool SeekSource(int fd, off64_t offset, const char* text, SourceLine at) {
     if (lseek64(fd, offset, SEEK_SET) >= 0) {
         return true;

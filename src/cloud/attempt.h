@@ -85,6 +85,12 @@ NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured = fals
 /** A download is repeated from its start, so only before the first byte was written. */
 NextStep JudgeDownload(Cloud& cloud, const XferContext& context);
 
+/**
+ * What all downloads of an item by its URL have in common; `send` and `copy` are the driver's to
+ * add. `xfer` and `url` must outlive the loop.
+ */
+AttemptPlan DownloadPlan(Cloud& cloud, const XferData& xfer, const std::string& url);
+
 /** lseek64 to `offset`; a failure logs `text`, a format that may end in "%m". */
 bool SeekSource(int fd, off64_t offset, const char* text,
                 ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());

@@ -32,15 +32,24 @@ constexpr __tag_vfs_err_ kFinal[] = {
     VFS_ERR_RATE_LIMITED, VFS_ERR_PERMISSION_DENIED, VFS_ERR_NOT_FOUND,
 };
 
-using UniqueContext = std::unique_ptr<XferContext>;
-
-/** Null, known to the driver, when there is no memory for it. */
-UniqueContext MakeContext(Cloud& cloud) {
-    UniqueContext context(new (std::nothrow) XferContext);
-    if (!context) {
-        cloud.SetError(VFS_ERR_CLOUD_FAILED, "");
+/** A transfer's own context for `body`, which answers bool; false when there is no memory for it.
+ */
+template <typename Body>
+bool WithContext(Cloud* cloud, Body body, SourceLine at = SourceLine::Here()) {
+    if (cloud == nullptr) {
+        return false;
     }
-    return context;
+    return Guard(
+        *cloud,
+        [&] {
+            const std::unique_ptr<XferContext> context(new (std::nothrow) XferContext);
+            if (context == nullptr) {
+                cloud->SetError(VFS_ERR_CLOUD_FAILED, "");
+                return false;
+            }
+            return body(*context);
+        },
+        at);
 }
 
 /** What a driver is to know of a whole file. What the metadata lacks shows when it is used. */
@@ -257,16 +266,9 @@ bool Cloud::Download(XferData* xfer, const Json::Value& meta) {
 
 bool Cloud::UploadFile(Cloud* cloud, const std::string& uri, int fd, long long size,
                        ProgressCallback progress, CancelCallback cancel, SpeedCallback speed) {
-    if (cloud == nullptr) {
-        return false;
-    }
-    return Guard(*cloud, [&] {
-        const UniqueContext context = MakeContext(*cloud);
-        if (!context) {
-            return false;
-        }
-        context->fd = fd;
-        XferData xfer{FileReadCallback, 1, context.get()};
+    return WithContext(cloud, [&](XferContext& context) {
+        context.fd = fd;
+        XferData xfer{FileReadCallback, 1, &context};
         BeginTransfer(static_cast<unsigned long long>(size), {progress, cancel, speed});
         transfer.source_end = SourceEnd(fd, size);
         return cloud->Upload(&xfer, DescribeFile(*cloud, uri, size, "Upload"));
@@ -275,16 +277,9 @@ bool Cloud::UploadFile(Cloud* cloud, const std::string& uri, int fd, long long s
 
 bool Cloud::DownloadFile(Cloud* cloud, const std::string& uri, int fd, long long size,
                          ProgressCallback progress, CancelCallback cancel, SpeedCallback speed) {
-    if (cloud == nullptr) {
-        return false;
-    }
-    return Guard(*cloud, [&] {
-        const UniqueContext context = MakeContext(*cloud);
-        if (!context) {
-            return false;
-        }
-        context->fd = fd;
-        XferData xfer{FileWriteCallback, 0, context.get()};
+    return WithContext(cloud, [&](XferContext& context) {
+        context.fd = fd;
+        XferData xfer{FileWriteCallback, 0, &context};
         BeginTransfer(static_cast<unsigned long long>(size), {progress, cancel, speed});
         Json::Value meta = DescribeFile(*cloud, uri, size, "Download");
         return Passes(*cloud, xfer, meta, size).Run();
@@ -294,16 +289,12 @@ bool Cloud::DownloadFile(Cloud* cloud, const std::string& uri, int fd, long long
 bool Cloud::DownloadFileToBuffer(Cloud* cloud, const std::string& uri, char* buffer, long long from,
                                  long long len, long long* got, ProgressCallback progress,
                                  CancelCallback cancel, SpeedCallback speed) {
-    if (cloud == nullptr || got == nullptr || from < 0 || len < 0) {
+    if (got == nullptr || from < 0 || len < 0) {
         return false;
     }
-    return Guard(*cloud, [&] {
-        const UniqueContext context = MakeContext(*cloud);
-        if (!context) {
-            return false;
-        }
-        context->buffer = buffer;
-        XferData xfer{FileWriteCallback, 0, context.get()};
+    return WithContext(cloud, [&](XferContext& context) {
+        context.buffer = buffer;
+        XferData xfer{FileWriteCallback, 0, &context};
         BeginTransfer(static_cast<unsigned long long>(len), {progress, cancel, speed});
         Json::Value meta(Json::objectValue);
         meta["url"] = uri;
@@ -312,7 +303,7 @@ bool Cloud::DownloadFileToBuffer(Cloud* cloud, const std::string& uri, char* buf
         if (!cloud->Download(&xfer, meta)) {
             return false;
         }
-        *got = static_cast<long long>(context->buffer_used);
+        *got = static_cast<long long>(context.buffer_used);
         return true;
     });
 }

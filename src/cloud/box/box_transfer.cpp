@@ -146,14 +146,9 @@ bool Box::ReceiveContent(XferData* xfer, const Json::Value& meta, const std::str
         SetError(VFS_ERR_CLOUD_FAILED, "");
         return false;
     }
-    AttemptPlan plan;
+    AttemptPlan plan = DownloadPlan(*this, *xfer, url);
     plan.send = [&] { return api->SetURL(url, true) && DoAPIRequest(0); };
-    plan.judge = [&](__tag_vfs_err_) { return JudgeDownload(*this, *xfer->context); };
     plan.copy = CopyError::kAfterCancelTest;
-    plan.retry = "Retry Download";
-    plan.refused = kRequestFailed;
-    plan.exhausted = kRequestFailed;
-    plan.what = &url;
     return RunAttempts(*this, plan);
 }
 

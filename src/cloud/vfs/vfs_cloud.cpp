@@ -229,16 +229,9 @@ bool VFSCloud::DownloadProcess(XferData* xfer, const Json::Value& meta) {
 }
 
 bool VFSCloud::Receive(XferData* xfer, const std::string& url) {
-    AttemptPlan plan;
+    AttemptPlan plan = DownloadPlan(*this, *xfer, url);
     plan.send = [this] { return api->Process(0); };
-    plan.judge = [this, xfer](__tag_vfs_err_) {
-        return xfer->context == nullptr ? NextStep::GiveUp() : JudgeDownload(*this, *xfer->context);
-    };
     plan.copy = CopyError::kAtEnd;
-    plan.retry = "Retry Download";
-    plan.refused = kRequestFailed;
-    plan.exhausted = kRequestFailed;
-    plan.what = &url;
     return RunAttempts(*this, plan);
 }
 
