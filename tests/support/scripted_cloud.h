@@ -10,6 +10,7 @@
 
 #include "http/api_handler.h"
 #include "http/error_handler.h"
+#include "support/bare_driver.h"
 #include "zyrovfs/cloud.h"
 
 /** How one request ends; VFS_ERR_NONE is a success. */
@@ -32,7 +33,7 @@ class ScriptedErrors : public ZYROCloud::ErrorHandler {
     Outcome now;
 };
 
-class ScriptedCloud : public ZYROCloud::Cloud {
+class ScriptedCloud : public bare::Driver<ZYROCloud::Cloud> {
   public:
     explicit ScriptedCloud(std::deque<Outcome> script = {}) : script_(std::move(script)) {
         api->SetErrorHandler(errors_);
@@ -59,21 +60,6 @@ class ScriptedCloud : public ZYROCloud::Cloud {
         return false;
     }
 
-    ZYROCloud::_tag_cloud_type GetCloudType() override { return ZYROCloud::CLOUD_TYPE_UNKNOWN; }
-    bool GetAccountInfo(const Json::Value&, Json::Value&) override { return false; }
-    bool GetFileInfo(const std::string&, const Json::Value&, Json::Value&) override {
-        return false;
-    }
-    bool ListFolder(const std::string&, const Json::Value&, Json::Value&) override { return false; }
-    bool CreateFolder(const std::string&, const std::string&, const Json::Value&) override {
-        return false;
-    }
-    bool Delete(const std::string&) override { return false; }
-    bool Rename(const std::string&, const std::string&) override { return false; }
-    bool Copy(const std::string&, const std::string&) override { return false; }
-    bool Move(const std::string&, const std::string&) override { return false; }
-    bool UploadProcess(ZYROCloud::XferData*, const Json::Value&) override { return false; }
-    bool DownloadProcess(ZYROCloud::XferData*, const Json::Value&) override { return false; }
     bool Init() override { return true; }
     bool SetAPIErrorHandler(ZYROCloud::APIHandler*) override { return true; }
 

@@ -5,6 +5,7 @@
 
 #include "core/json.h"
 #include "http/api_handler.h"
+#include "support/bare_driver.h"
 #include "support/seams.h"
 #include "support/wire_server.h"
 
@@ -29,30 +30,12 @@ Json::Value Profile(const std::string& expire_time) {
     return profile;
 }
 
-class TestCloud : public PublicCloud {
+class TestCloud : public bare::Driver<PublicCloud> {
   public:
-    explicit TestCloud(const std::string& expire_time = "")
-        : PublicCloud(1234, Profile(expire_time)) {
+    explicit TestCloud(const std::string& expire_time = "") : Driver(1234, Profile(expire_time)) {
         api->SetErrorHandler(new BoxErrorHandler);
         api->SetReturnOnError(false);
     }
-    _tag_cloud_type GetCloudType() override { return CLOUD_TYPE_UNKNOWN; }
-    bool GetAccountInfo(const Json::Value&, Json::Value&) override { return false; }
-    bool GetFileInfo(const std::string&, const Json::Value&, Json::Value&) override {
-        return false;
-    }
-    bool ListFolder(const std::string&, const Json::Value&, Json::Value&) override { return false; }
-    bool CreateFolder(const std::string&, const std::string&, const Json::Value&) override {
-        return false;
-    }
-    bool Delete(const std::string&) override { return false; }
-    bool Rename(const std::string&, const std::string&) override { return false; }
-    bool Copy(const std::string&, const std::string&) override { return false; }
-    bool Move(const std::string&, const std::string&) override { return false; }
-    bool UploadProcess(XferData*, const Json::Value&) override { return false; }
-    bool DownloadProcess(XferData*, const Json::Value&) override { return false; }
-    bool Init() override { return true; }
-    bool SetAPIErrorHandler(APIHandler*) override { return true; }
     bool SetRefreshTokenParam(APIHandler*) override { return false; }
 };
 
