@@ -204,7 +204,7 @@ bool CloudServer::CreateJsonObj(unsigned int uid, VFS_CONFIG_MODE mode, Json::Va
 bool CloudServer::DecryptCredentials(unsigned int, VFS_CONFIG_MODE, Json::Value& conf) {
     return NoThrow(VFS_ERR_FAILED, [&] {
         for (const char* key : kTokens) {
-            if (conf.isMember(key) && conf[key] != "" && !DecipherSecret(key, conf)) {
+            if (conf.isMember(key) && !conf[key].asString().empty() && !DecipherSecret(key, conf)) {
                 return false;
             }
         }

@@ -7,6 +7,7 @@
 #include <atomic>
 #include <cerrno>
 #include <chrono>
+#include <cmath>
 #include <cstdio>
 #include <cstdlib>
 #include <iterator>
@@ -154,8 +155,7 @@ std::string HumanBytes(double bytes) {
 }
 
 std::string HumanTime(double seconds) {
-    const long long whole =
-        seconds < 1e9 ? static_cast<long long>(std::max(seconds, 0.0) + 0.5) : 999999999LL;
+    const long long whole = seconds < 1e9 ? std::llround(std::max(seconds, 0.0)) : 999999999LL;
     char text[48];
     if (whole >= 3600) {
         std::snprintf(text, sizeof text, "%lld:%02lld:%02lld", whole / 3600, whole / 60 % 60,
