@@ -1,5 +1,6 @@
 #include "cloud/transfer.h"
 
+#include <strings.h>
 #include <unistd.h>
 
 #include <climits>
@@ -104,12 +105,21 @@ int LastCurlCode(APIHandler* api) {
     return code.isInt() ? code.asInt() : 0;
 }
 
-/** Whether a connection broke before the service had answered an upload: 100 is no answer. */
-bool IsUnanswered(CURL* curl) {
-    constexpr long kFirstFinalStatus = 200;
-    long status = kFirstFinalStatus;
+/**
+ * Whether the server had taken an upload for whole before libcurl failed. An interim status says
+ * nothing of the kind, nor does a redirection, and in FTP each command before has its own reply.
+ */
+bool WasTaken(CURL* curl) {
+    constexpr long kFtpTransferComplete = 226;
+    constexpr long kFtpActionDone = 250;
+    long status = 0;
+    const char* scheme = "";
     curl_easy_getinfo(curl, CURLINFO_RESPONSE_CODE, &status);
-    return status < kFirstFinalStatus;
+    curl_easy_getinfo(curl, CURLINFO_SCHEME, &scheme);
+    if (scheme != nullptr && strncasecmp(scheme, "ftp", 3) == 0) {
+        return status == kFtpTransferComplete || status == kFtpActionDone;
+    }
+    return status / 100 == 2;
 }
 
 bool IsCut(const Answer& answer) {
@@ -237,8 +247,8 @@ bool Cloud::Upload(XferData* xfer, const Json::Value& meta) {
     if (!UploadProcess(xfer, meta)) {
         return false;
     }
-    if (mark.IsWiped() && LastCurlCode(api) != CURLE_OK && IsUnanswered(curl)) {
-        // A status below 400 counts as a success, also one that only invites to go on.
+    if (mark.IsWiped() && LastCurlCode(api) != CURLE_OK && !WasTaken(curl)) {
+        // A status below 400 counts as a success for the handler, whatever it says.
         SetError(VFS_ERR_TRANSFER_ABORTED, "");
         return false;
     }

@@ -330,5 +330,43 @@ TEST_F(Wires, AnUploadWhoseServerDiesBehindItsContinueIsNoSuccess) {
     EXPECT_NE(driver_.GetErrorCode(), VFS_ERR_NONE);
 }
 
+TEST_F(Wires, AnFtpServerThatGoesBeforeItHasTheFileIsNoSuccess) {
+    Put("source", std::string(1000, 'x'));
+    Put("empty", "");
+    for (const char* name : {"source", "empty"}) {
+        SCOPED_TRACE(name);
+        const WireServer data({{wire::ReadAll()}});
+        wire::Script script = {Send("220 ready\r\n")};
+        const std::string passive = "229 Entering (|||" + std::to_string(data.Port()) + "|)";
+        for (const std::string& reply :
+             {std::string("331 password?"), std::string("230 in"), std::string("257 \"/\""),
+              passive, std::string("200 binary")}) {
+            script.push_back(wire::ReadLine());
+            script.push_back(Send(reply + "\r\n"));
+        }
+        script.push_back(wire::ReadLine());  // STOR, and no answer
+        const WireServer server({script});
+        const UniqueFd fd = Open(name);
+        const off_t size = lseek(fd.Get(), 0, SEEK_END);
+        lseek(fd.Get(), 0, SEEK_SET);
+        WireDriver driver;
+        EXPECT_FALSE(Cloud::UploadFile(&driver, server.Url("/file", "ftp"), fd.Get(), size, nullptr,
+                                       nullptr, nullptr));
+        EXPECT_THAT(server.ReceivedText(), HasSubstr("STOR file"));
+        EXPECT_NE(driver.GetErrorCode(), VFS_ERR_NONE);
+    }
+}
+
+TEST_F(Wires, AnUploadThatWasSentElsewhereAndBrokeThereIsNoSuccess) {
+    Put("source", std::string(1000, 'x'));
+    const UniqueFd fd = Open("source");
+    const WireServer other({{wire::ReadHead(), wire::Reset()}});
+    const WireServer server(
+        {{ReadRequest(), Send(Answer(307, "", "Location: " + other.Url() + "\r\n"))}});
+    EXPECT_FALSE(
+        Cloud::UploadFile(&driver_, server.Url(), fd.Get(), 1000, nullptr, nullptr, nullptr));
+    EXPECT_NE(driver_.GetErrorCode(), VFS_ERR_NONE);
+}
+
 }  // namespace
 }  // namespace ZYROCloud
