@@ -54,11 +54,11 @@ install_packages() {
   rm -f /tmp/zyrovfs-apt.log
 }
 
-# build PRESET: configures and builds, silent unless it fails.
+# build PRESET [TARGET]...: configures and builds, silent unless it fails.
 build() {
   local log
   log=$(mktemp)
-  if ! { cmake --preset "$1" && cmake --build --preset "$1"; } >"$log" 2>&1; then
+  if ! { cmake --preset "$1" && cmake --build --preset "$1" ${2:+--target "${@:2}"}; } >"$log" 2>&1; then
     tail -n 60 "$log" >&2
     rm -f "$log"
     echo "The build ($1) failed." >&2
