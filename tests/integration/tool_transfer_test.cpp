@@ -273,6 +273,7 @@ TEST_F(Transfer, LocalFilesAreTheUsersBusiness) {
     EXPECT_THAT(ForAmy("cp /home " + kBox + "/").output, HasSubstr("/home is no file."));
     std::ofstream("/tmp/roots-own") << "secret";
     Must("chmod 600 /tmp/roots-own");
+    Must("chmod 640 /tmp/roots-own");  // for the group of root, who runs the command
     const Outcome refused = ForAmy("cp /tmp/roots-own " + kBox + "/");
     EXPECT_EQ(refused.status, 1);
     EXPECT_THAT(refused.output, HasSubstr("Permission denied"));
@@ -283,6 +284,7 @@ TEST_F(Transfer, LocalFilesAreTheUsersBusiness) {
 TEST_F(Transfer, WhatCannotBeMeantIsSaid) {
     EXPECT_EQ(ForAmy("cp /tmp/a /tmp/b").status, 2);
     EXPECT_EQ(ForAmy("cat /tmp/a").status, 2);
+    EXPECT_EQ(ForAmy("cp " + kBox + "/folder/ /tmp").status, 2);
     EXPECT_EQ(ForAmy("cp /tmp/a " + kBox + "/a --limit-rate fast").status, 2);
     EXPECT_EQ(ForAmy("cp /tmp/a " + kBox + "/a --limit-rate 0").status, 2);
     const Outcome unknown = ForAmy("cp /tmp/password box://bob@example.com/x");

@@ -1,9 +1,15 @@
 #include "location.h"
 
+#include <grp.h>
 #include <sys/fsuid.h>
 #include <unistd.h>
+#include <zosplatform/user.h>
 #include <zyrovfs/cloud_utils.h>
 #include <zyrovfs/server.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <stdexcept>
 
 namespace tool {
 namespace {
@@ -12,6 +18,28 @@ using namespace ZYROVFS;
 
 /** Group of all users of the box. */
 constexpr gid_t kUsers = 100;
+
+std::vector<gid_t> OwnGroups() {
+    std::vector<gid_t> groups(static_cast<size_t>(std::max(getgroups(0, nullptr), 0)));
+    groups.resize(static_cast<size_t>(
+        std::max(getgroups(static_cast<int>(groups.size()), groups.data()), 0)));
+    return groups;
+}
+
+/** Groups of a user; of one who is not in the password file, only that of all users. */
+std::vector<gid_t> GroupsOf(unsigned int uid) {
+    PZYROUSER user = nullptr;
+    if (ZYROUserGetByUID(uid, &user) < 0) {
+        return {kUsers};
+    }
+    int count = 0;
+    getgrouplist(user->name, kUsers, nullptr, &count);
+    std::vector<gid_t> groups(static_cast<size_t>(std::max(count, 1)), kUsers);
+    count = static_cast<int>(groups.size());
+    getgrouplist(user->name, kUsers, groups.data(), &count);
+    ZYROUserFree(user);
+    return groups;
+}
 
 }  // namespace
 
@@ -48,12 +76,21 @@ std::unique_ptr<ZYROCloud::Cloud> OpenLocation(unsigned int uid, const std::stri
     return nullptr;
 }
 
-AsUser::AsUser(unsigned int uid)
-    : uid_(static_cast<uid_t>(setfsuid(uid))), gid_(static_cast<gid_t>(setfsgid(kUsers))) {}
+AsUser::AsUser(unsigned int uid) : groups_(OwnGroups()) {
+    const std::vector<gid_t> groups = GroupsOf(uid);
+    if (setgroups(groups.size(), groups.data()) != 0) {
+        throw std::runtime_error("The groups of the user cannot be taken.");
+    }
+    gid_ = static_cast<gid_t>(setfsgid(kUsers));
+    uid_ = static_cast<uid_t>(setfsuid(uid));
+}
 
 AsUser::~AsUser() {
-    setfsgid(gid_);
     setfsuid(uid_);
+    setfsgid(gid_);
+    if (setgroups(groups_.size(), groups_.data()) != 0) {
+        std::abort();  // must not go on with somebody else's groups
+    }
 }
 
 }  // namespace tool

@@ -7,6 +7,7 @@
 
 #include <memory>
 #include <string>
+#include <vector>
 
 namespace tool {
 
@@ -39,6 +40,7 @@ class AsUser {
     ~AsUser();
 
   private:
+    std::vector<gid_t> groups_;  ///< the process's own
     uid_t uid_;
     gid_t gid_;
 };

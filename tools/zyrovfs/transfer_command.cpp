@@ -30,8 +30,9 @@ struct TransferOptions {
     bool resume = false;
 };
 
-/** Room for one piece of a file that is fetched piece by piece. */
+/** Pieces of a file that is fetched piece by piece; what a cancel finds unfinished is lost. */
 constexpr long long kPiece = 8LL << 20;
+constexpr long long kPieceOfSlow = 256LL << 10;
 
 /** A descriptor of this program's own. */
 struct File {
@@ -108,9 +109,10 @@ class Transfer {
 
     int Fail(Cloud& cloud) {
         progress_.reset();
-        const __tag_vfs_err_ code =
-            Progress::Cancelled() ? VFS_ERR_CANCELLED : cloud.GetErrorCode();
-        return ReportCode(What(), code, -Cloud::GetUploadErrorCode(&cloud), json_);
+        if (Progress::Cancelled()) {
+            cloud.SetError(VFS_ERR_CANCELLED, "");
+        }
+        return ReportCode(What(), cloud.GetErrorCode(), -Cloud::GetUploadErrorCode(&cloud), json_);
     }
 
     int FailLocally(const std::string& step) {
@@ -183,9 +185,11 @@ class Transfer {
     int CopyBetween() {
         NameTarget();
         long long size = 0;
-        if (!source_->GetFileSize(options_.from, &size) ||
-            !target_->CanFileUpload(static_cast<unsigned long long>(size))) {
-            return Fail(size == 0 ? *source_ : *target_);
+        if (!source_->GetFileSize(options_.from, &size)) {
+            return Fail(*source_);
+        }
+        if (!target_->CanFileUpload(static_cast<unsigned long long>(size))) {
+            return Fail(*target_);
         }
         Start(size, true);
         if (Cloud::CopyFile(source_.get(), target_.get(), options_.from, options_.to, size,
@@ -212,6 +216,10 @@ class Transfer {
         }
         if (file.fd < 0) {
             return FailLocally("Opening " + part);
+        }
+        struct stat info {};
+        if (fstat(file.fd, &info) != 0 || !S_ISREG(info.st_mode)) {
+            return ReportProblem(part + " is no file.", json_);
         }
         const off_t have = lseek(file.fd, 0, SEEK_END);
         if (have < 0 || have > size) {
@@ -260,9 +268,10 @@ class Transfer {
         const Json::Value& url = meta["url"];
         const bool by_url = source_->GetCloudType() != ZYROCloud::CLOUD_TYPE_DROPBOX;
         const std::string place = by_url && url.isString() ? url.asString() : options_.from;
-        std::vector<char> piece(static_cast<size_t>(kPiece) + 1);
+        const long long most = options_.rate > 0 ? kPieceOfSlow : kPiece;
+        std::vector<char> piece(static_cast<size_t>(most) + 1);
         while (from < size) {
-            const long long want = std::min(kPiece, size - from);
+            const long long want = std::min(most, size - from);
             long long got = 0;
             if (!Cloud::DownloadFileToBuffer(source_.get(), place, piece.data(), from, want, &got,
                                              Progress::OnProgress, Progress::OnCancel, Speed()) ||
@@ -303,6 +312,7 @@ class Transfer {
 
 int RunTransfer(unsigned int uid, const TransferOptions& options, bool json,
                 int (Transfer::*job)()) {
+    Progress::CatchSignals();
     Cloud::InitCurlGlobal();
     int status = kFailure;
     {
@@ -337,10 +347,11 @@ void AddCopyCommand(CLI::App& app, Session& session) {
     AddRateOption(*command, options);
     command->add_flag("--resume", options->resume,
                       "Go on with the part that an earlier download left");
-    CheckUse(*command, "one side must be a URI, and a rate is a number like 500K", [options] {
-        return (IsUri(options->from) || IsUri(options->to)) && !options->to.empty() &&
-               TakeRate(*options);
-    });
+    CheckUse(*command, "one side must be a URI, the source a file, and a rate a number like 500K",
+             [options] {
+                 return (IsUri(options->from) || IsUri(options->to)) && !options->to.empty() &&
+                        !NameOf(options->from).empty() && TakeRate(*options);
+             });
 }
 
 void AddPrintCommand(CLI::App& app, Session& session) {

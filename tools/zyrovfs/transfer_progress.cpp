@@ -42,11 +42,20 @@ size_t Columns() {
 
 Progress::Progress(std::string name, long long total, long long rate, bool bar, long long already)
     : name_(std::move(name)), total_(total), rate_(rate), bar_(bar), already_(already) {
-    cancelled = 0;
     moved = 0;
     begin = drawn = Clock::now();
     limit = rate_;
     shown = this;
+}
+
+Progress::~Progress() {
+    shown = nullptr;
+    if (bar_) {
+        std::fprintf(stderr, "\r\033[K");
+    }
+}
+
+void Progress::CatchSignals() {
     struct sigaction action {};
     action.sa_handler = [](int signal) {
         // The engine asks with each piece; a server that sends none is left by the second Ctrl-C.
@@ -56,17 +65,9 @@ Progress::Progress(std::string name, long long total, long long rate, bool bar, 
         }
         cancelled = 1;
     };
-    sigaction(SIGINT, &action, &before_int_);
-    sigaction(SIGTERM, &action, &before_term_);
-}
-
-Progress::~Progress() {
-    shown = nullptr;
-    sigaction(SIGINT, &before_int_, nullptr);
-    sigaction(SIGTERM, &before_term_, nullptr);
-    if (bar_) {
-        std::fprintf(stderr, "\r\033[K");
-    }
+    sigaction(SIGINT, &action, nullptr);
+    sigaction(SIGTERM, &action, nullptr);
+    std::signal(SIGPIPE, SIG_IGN);
 }
 
 long long Progress::Bytes() const {

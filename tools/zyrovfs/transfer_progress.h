@@ -14,14 +14,17 @@ class Progress {
   public:
     /**
      * `total` 0 or less: not known. `rate` in bytes per second, 0 for no limit. Bytes `already`
-     * there count for the bar alone. While it lives, SIGINT and SIGTERM end the transfer as
-     * cancelled.
+     * there count for the bar alone.
      */
     Progress(std::string name, long long total, long long rate, bool bar, long long already = 0);
     Progress(const Progress&) = delete;
     Progress& operator=(const Progress&) = delete;
     /** Takes the bar off the terminal. */
     ~Progress();
+
+    /** From now on SIGINT and SIGTERM end the transfer as cancelled, and a reader who has gone is
+     * an error of writing. */
+    static void CatchSignals();
 
     long long Bytes() const;
     double Seconds() const;
@@ -40,8 +43,6 @@ class Progress {
     long long rate_;
     bool bar_;
     long long already_;
-    struct sigaction before_int_ {};
-    struct sigaction before_term_ {};
 };
 
 /** "12.3 MiB". */
