@@ -3,6 +3,7 @@
 #include <cerrno>
 
 #include "cloud/guard.h"
+#include "cloud/profile_member.h"
 #include "core/json.h"
 #include "http/api_handler.h"
 
@@ -11,19 +12,6 @@ namespace ZYROCloud {
 using namespace ZYROVFS;
 
 namespace {
-
-/** Text of a member; "" when it is missing. What has no text is logged and counts as missing. */
-std::string TextOf(const Json::Value& profile, const char* key) {
-    if (!profile.isObject() || !profile.isMember(key)) {
-        return "";
-    }
-    const Json::Value& value = profile[key];
-    if (!value.isConvertibleTo(Json::stringValue)) {
-        LOG_ERROR("Wrong type of %s in a profile", key);
-        return "";
-    }
-    return value.asString();
-}
 
 /** The account document that a profile holds as text; null when it is none. */
 Json::Value AccountOf(const Json::Value& profile) {
@@ -43,10 +31,10 @@ Json::Value AccountOf(const Json::Value& profile) {
 }  // namespace
 
 PublicCloud::PublicCloud(unsigned int owner, const Json::Value& profile)
-    : Cloud(owner, TextOf(profile, "server_id")),
-      token_{TextOf(profile, "access_token"), TextOf(profile, "refresh_token"),
-             TextOf(profile, "expire_time")},
-      client_id_(TextOf(profile, "client_id")),
+    : Cloud(owner, ProfileMember(profile, "server_id")),
+      token_{ProfileMember(profile, "access_token"), ProfileMember(profile, "refresh_token"),
+             ProfileMember(profile, "expire_time")},
+      client_id_(ProfileMember(profile, "client_id")),
       account_info_(AccountOf(profile)) {}
 
 bool PublicCloud::UpdateProfileConfig(Server::VFS_CONFIG_MODE mode, const Json::Value& fields) {

@@ -1,4 +1,3 @@
-#include <unistd.h>
 #include <zyrovfs/cloud_utils.h>
 
 #include <iostream>
@@ -65,12 +64,8 @@ int ListClients(bool json) {
 /** A command of root for the whole machine. */
 CLI::App* AddRootCommand(CLI::App& group, Session& session, const std::string& name,
                          const std::string& description, std::function<int()> action) {
-    return AddCommand(group, session, name, description, [&session, action = std::move(action)] {
-        if (geteuid() != 0) {
-            return ReportProblem("Only root can change the services.", session.json);
-        }
-        return action();
-    });
+    return AddCommand(group, session, name, description,
+                      OfRoot(session, "change the services", std::move(action)));
 }
 
 void AddClientOptions(CLI::App& command, ClientOptions& options) {

@@ -70,12 +70,18 @@ bool ResolveUser(const Session& session, unsigned int& uid) {
     return true;
 }
 
-bool NeedRoot(const Session& session) {
+bool NeedRoot(const Session& session, const std::string& what) {
     if (geteuid() == 0) {
         return true;
     }
-    ReportProblem("Only root can act for a user.", session.json);
+    ReportProblem("Only root can " + what + ".", session.json);
     return false;
+}
+
+std::function<int()> OfRoot(const Session& session, std::string what, std::function<int()> action) {
+    return [&session, what = std::move(what), action = std::move(action)] {
+        return NeedRoot(session, what) ? action() : kFailure;
+    };
 }
 
 }  // namespace tool

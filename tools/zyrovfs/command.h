@@ -37,8 +37,11 @@ void CheckUse(CLI::App& command, const std::string& hint, std::function<bool()> 
 /** The uid of --uid or --user; false, with the failure reported, when there is no such user. */
 bool ResolveUser(const Session& session, unsigned int& uid);
 
-/** False, with the failure reported, for anyone but root. */
-bool NeedRoot(const Session& session);
+/** False, with "Only root can WHAT." reported, for anyone but root. */
+bool NeedRoot(const Session& session, const std::string& what = "act for a user");
+
+/** `action`, for root alone. */
+std::function<int()> OfRoot(const Session& session, std::string what, std::function<int()> action);
 
 void AddProtocolCommands(CLI::App& app, Session& session);
 void AddProfileCommands(CLI::App& app, Session& session);

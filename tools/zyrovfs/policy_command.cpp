@@ -221,7 +221,7 @@ void AddListCommand(CLI::App& group, Session& session) {
     const auto options = std::make_shared<PolicyListOptions>();
     CLI::App* command =
         AddCommand(group, session, "list", "List the machine's users or groups with their settings",
-                   OfRoot(session, [=, &session] { return List(*options, session.json); }));
+                   OfPolicyRoot(session, [=, &session] { return List(*options, session.json); }));
     command->add_flag("--groups", options->groups, "List groups, not users");
     command->add_option("--auth", options->auth, "Where they come from")
         ->type_name("KIND")
@@ -264,17 +264,14 @@ std::string TypeOf(const Json::Value& policy) {
     return type.isConvertibleTo(Json::stringValue) ? type.asString() : "admin";
 }
 
-std::function<int()> OfRoot(const Session& session, std::function<int()> action) {
-    return [&session, action = std::move(action)] {
-        return geteuid() == 0 ? action()
-                              : ReportProblem("Only root can look after the policy.", session.json);
-    };
+std::function<int()> OfPolicyRoot(const Session& session, std::function<int()> action) {
+    return OfRoot(session, "look after the policy", std::move(action));
 }
 
 void AddPolicyCommands(CLI::App& app, Session& session) {
     CLI::App* group = AddGroup(app, "policy", "Who may use remote connections");
     AddCommand(*group, session, "show", "Show the policy",
-               OfRoot(session, [&session] { return Show(session.json); }));
+               OfPolicyRoot(session, [&session] { return Show(session.json); }));
     AddPolicySetCommand(*group, session);
     AddListCommand(*group, session);
     const auto protocol = std::make_shared<std::string>();

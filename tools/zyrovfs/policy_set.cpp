@@ -220,7 +220,7 @@ void AddPolicySetCommand(CLI::App& group, Session& session) {
     const auto options = std::make_shared<SetOptions>();
     CLI::App* command =
         AddCommand(group, session, "set", "Change who may use remote connections",
-                   OfRoot(session, [=, &session] { return Set(*options, session.json); }));
+                   OfPolicyRoot(session, [=, &session] { return Set(*options, session.json); }));
     command->add_option("--type", options->type, "Everybody, administrators, or a chosen set")
         ->type_name("TYPE")
         ->check(CLI::IsMember({"all", "admin", "custom"}));

@@ -18,7 +18,7 @@ bool ReadPolicy(const std::string& what, bool json, Json::Value& policy);
 std::string TypeOf(const Json::Value& policy);
 
 /** An action of root; anyone else is told so. */
-std::function<int()> OfRoot(const Session& session, std::function<int()> action);
+std::function<int()> OfPolicyRoot(const Session& session, std::function<int()> action);
 
 void AddPolicySetCommand(CLI::App& group, Session& session);
 

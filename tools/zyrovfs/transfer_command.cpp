@@ -1,6 +1,7 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
+#include <zosplatform/file.h>
 #include <zyrovfs/error.h>
 
 #include <cerrno>
@@ -280,23 +281,11 @@ class Transfer {
                 return false;
             }
             got = std::min(got, want);
-            if (!WriteAll(fd, piece.data(), static_cast<size_t>(got))) {
+            if (ZYROWriteFileFd(fd, piece.data(), static_cast<size_t>(got)) != got) {
                 failure_ = FailLocally("Writing");
                 return false;
             }
             from += got;
-        }
-        return true;
-    }
-
-    static bool WriteAll(int fd, const char* data, size_t size) {
-        while (size > 0) {
-            const ssize_t n = write(fd, data, size);
-            if (n < 0 && errno != EINTR) {
-                return false;
-            }
-            data += std::max<ssize_t>(n, 0);
-            size -= static_cast<size_t>(std::max<ssize_t>(n, 0));
         }
         return true;
     }

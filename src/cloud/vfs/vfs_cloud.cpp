@@ -10,6 +10,7 @@
 #include "cloud/attempt.h"
 #include "cloud/fuse_attr.h"
 #include "cloud/guard.h"
+#include "cloud/profile_member.h"
 #include "cloud/vfs/upload_body.h"
 #include "core/handle.h"
 #include "core/json.h"
@@ -38,18 +39,6 @@ bool IsDav(const std::string& text) {
     return StartsWithCaseless(text, "dav");
 }
 
-/** Text of a member. What has no text is logged and counts as missing. */
-std::string TextOf(const Json::Value& config, const char* key, const char* missing = "") {
-    if (!config.isObject() || !config.isMember(key)) {
-        return missing;
-    }
-    if (!config[key].isConvertibleTo(Json::stringValue)) {
-        LOG_ERROR("Wrong type of %s in a profile", key);
-        return missing;
-    }
-    return config[key].asString();
-}
-
 }  // namespace
 
 VFSCloud::VFSCloud() {
@@ -57,11 +46,11 @@ VFSCloud::VFSCloud() {
 }
 
 VFSCloud::VFSCloud(unsigned int owner, const Json::Value& config)
-    : Cloud(owner, TextOf(config, "server_id", "test")),
-      account_(TextOf(config, "account")),
-      password_(TextOf(config, "password")),
-      code_page_(TextOf(config, "codepage")),
-      protocol_(TextOf(config, "protocol")) {
+    : Cloud(owner, ProfileMember(config, "server_id", "test")),
+      account_(ProfileMember(config, "account")),
+      password_(ProfileMember(config, "password")),
+      code_page_(ProfileMember(config, "codepage")),
+      protocol_(ProfileMember(config, "protocol")) {
     VFSCloud::Init();
 }
 
