@@ -161,18 +161,21 @@ bool KeepTotal(int total, Json::Value& out) {
 bool VFSUser::SDKEnum(int start, int limit, Json::Value& out, const std::string& substr,
                       const std::string& domain, AUTH_TYPE type, bool prefix, bool noID) {
     return NoThrow(VFS_ERR_FAILED, [&] {
-        const UniqueList owner(YLIBCSzListAlloc(kListSize));
-        PYLIBCSZLIST administrators = owner.get();
+        UniqueList administrators(YLIBCSzListAlloc(kListSize));
         if (administrators == nullptr) {
             LOG_ERROR("YLIBCSzListAlloc failed " PLATFORM_ERROR_FORMAT, ZYROERR_ARGS);
             return Fail(VFS_ERR_FAILED);
         }
-        if (YLIBUserAdminListGet(type, &administrators) == -1) {
+        // The platform may put a larger list in the place of the one it was given.
+        PYLIBCSZLIST list = administrators.release();
+        const int listed = YLIBUserAdminListGet(type, &list);
+        administrators.reset(list);
+        if (listed == -1) {
             LOG_ERROR("YLIBUserAdminListGet failed, type=%u " PLATFORM_ERROR_FORMAT, type,
                       ZYROERR_ARGS);
             return Fail(VFS_ERR_FAILED);
         }
-        Context context{noID, administrators, Member(value_, settings_.key), out[kEntries]};
+        Context context{noID, administrators.get(), Member(value_, settings_.key), out[kEntries]};
         const Wanted wanted{start, limit, substr.c_str(), domain.c_str(), type, prefix};
         return KeepTotal(EnumUsers(wanted, context), out);
     });
