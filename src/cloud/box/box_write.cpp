@@ -2,8 +2,8 @@
 #include "cloud/box/box_api.h"
 #include "cloud/conflict.h"
 #include "cloud/guard.h"
-#include "cloud/path_walk.h"
 #include "cloud/request.h"
+#include "cloud/target.h"
 
 namespace ZYROCloud {
 
@@ -60,9 +60,7 @@ bool Box::DoCopy(const std::string& from, const std::string& to, bool overwrite)
     const std::string id = GetFileIDByPath(from);
     std::string parent;
     std::string name;
-    if (!CutAtLastSlash(to, parent, name)) {
-        SetError(VFS_ERR_NOT_FOUND, "");
-        LOG_ERROR("Failed to find / from [%s]", to.c_str());
+    if (!CutTarget(*this, to, parent, name)) {
         return false;
     }
     const std::string parent_id = GetFileIDByPath(parent);
