@@ -104,12 +104,6 @@ bool SeekSource(int fd, off64_t offset, const char* text,
                 ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
 
 /**
- * Lets libcurl itself go back to the start of a file: it has to when a kept connection turns out
- * dead in the middle of a body. Does nothing for a stream.
- */
-void LetCurlRewind(Cloud& cloud, const XferData& xfer);
-
-/**
  * Asks for "from_bytes" to "from_bytes" + "len" of `meta`, when it has a "len" other than 0. The
  * upper end is the place behind the last byte that is wanted: one byte more than `len` arrives.
  */

@@ -5,6 +5,7 @@
 #include "cloud/guard.h"
 #include "cloud/item_download.h"
 #include "cloud/request.h"
+#include "cloud/upload_body.h"
 #include "core/handle.h"
 #include "core/json.h"
 #include "http/api_handler.h"
@@ -96,13 +97,12 @@ bool Box::SendForm(XferData* xfer, const Json::Value& meta) {
     form.params["attributes"] =
         json::toString(Attributes(meta["name"].asString(), meta["parent_id"].asString(), total));
     api->SetFormUploadData(&form);
-    LetCurlRewind(*this, *xfer);
     const ScopeExit forget([this] { api->SetFormUploadData(nullptr); });
 
     const std::string url = meta["url"].asString();
     const int fd = xfer->context->fd;
     AttemptPlan plan;
-    plan.send = [this] { return api->Process(0); };
+    plan.send = [this, xfer] { return SendUpload(*this, *xfer); };
     plan.judge = [&](__tag_vfs_err_ code) {
         if (code == VFS_ERR_UNAUTHORIZED) {
             // The new token is for the caller's next upload: this request has the old one.
