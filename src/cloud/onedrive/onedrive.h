@@ -108,6 +108,10 @@ class OneDrive : public PublicCloud {
                      long long* offset, long long length, long long total);
     bool CloseUploadSession(const std::string& url, const std::string& session);
     bool DownloadProcess(XferData* xfer, const Json::Value& meta) override;
+
+  private:
+    bool SendWhole(XferData& xfer, const Json::Value& meta, const std::string& url);
+    bool SendFragment(XferData* xfer, const std::string& url, long long length);
 };
 
 }  // namespace ZYROCloud

@@ -1,19 +1,14 @@
 #include <strings.h>
 #include <zosplatform/text.h>
 
-#include <algorithm>
 #include <cstring>
 
-#include "cloud/attempt.h"
-#include "cloud/answer_header.h"
 #include "cloud/fuse_attr.h"
 #include "cloud/guard.h"
 #include "cloud/onedrive/onedrive.h"
 #include "cloud/onedrive/onedrive_api.h"
-#include "cloud/path_walk.h"
-#include "core/json.h"
+#include "cloud/target.h"
 #include "core/log.h"
-#include "http/api_handler.h"
 
 namespace ZYROCloud {
 
@@ -91,13 +86,10 @@ bool OneDrive::GetFileIDByPathFromServer(const std::string& /*root*/, const std:
         out = GetRootFileID();
         return true;
     }
-    std::string id;
-    if (!GetFileIDByPathFromServerRecursive("", path, kind, hint, id) || id.empty()) {
-        SetError(VFS_ERR_NOT_FOUND, "");
-        return false;
-    }
-    out = id;
-    return true;
+    const auto walk = [&](std::string& id) {
+        return GetFileIDByPathFromServerRecursive("", path, kind, hint, id);
+    };
+    return FindOnServer(*this, walk, out);
 }
 
 bool OneDrive::GetFileInfoByPathFromServer(const std::string& path, const std::string& kind,

@@ -1,4 +1,3 @@
-#include "cloud/conflict.h"
 #include "cloud/onedrive/onedrive.h"
 #include "cloud/onedrive/onedrive_api.h"
 #include "cloud/request.h"
@@ -39,23 +38,11 @@ bool OneDrive::Move(const std::string& /*old_parent*/, const std::string& id,
         SetError(VFS_ERR_NOT_FOUND, "");
         return false;
     }
-    return Request(*this, kFrame)
-        .To("MOVE", Api(id))
-        .Body(Only("destination", new_parent))
-        .Send();
+    return Request(*this, kFrame).To("MOVE", Api(id)).Body(Only("destination", new_parent)).Send();
 }
 
 bool OneDrive::Move(const std::string& from, const std::string& to) {
-    const std::string id = GetFileIDByPath(from);
-    if (id.empty()) {
-        SetError(VFS_ERR_NOT_FOUND, "");
-        return false;
-    }
-    std::string old_parent;
-    std::string new_parent;
-    std::string name;
-    return CutTarget(*this, from, old_parent, name) && CutTarget(*this, to, new_parent, name) &&
-           Move(GetFileIDByPath(old_parent), id, GetFileIDByPath(new_parent));
+    return MoveByPath(*this, from, to);
 }
 
 bool OneDrive::Copy(const std::string& from, const std::string& to) {
@@ -63,31 +50,20 @@ bool OneDrive::Copy(const std::string& from, const std::string& to) {
 }
 
 bool OneDrive::DoCopy(const std::string& from, const std::string& to, bool overwrite) {
-    const std::string id = GetFileIDByPath(from);
-    std::string parent;
-    std::string name;
-    if (!CutTarget(*this, to, parent, name)) {
+    std::string id;
+    std::string parent_id;
+    if (!FindCopyIds(*this, from, to, id, parent_id)) {
         return false;
     }
-    const std::string parent_id = GetFileIDByPath(parent);
-    if (id.empty() || parent_id.empty()) {
-        SetError(VFS_ERR_NOT_FOUND, "");
-        return false;
-    }
-    const auto replace = [&] {
-        const auto find = [&](Json::Value& item) {
-            return GetFileInfoByPathFromServer(to, "", Json::Value(Json::objectValue), "", item);
-        };
-        return ReplaceFile(
-            *this, find, [this](const Json::Value& item) { return IsDir(item); },
-            [this](const Json::Value& item) { return Delete(GetFileID(item)); },
-            [&] { return DoCopy(from, to, false); });
+    const auto find = [&](Json::Value& item) {
+        return GetFileInfoByPathFromServer(to, "", Json::Value(Json::objectValue), "", item);
     };
+    const auto again = [&] { return DoCopy(from, to, false); };
     // The copy has its source's name, whatever `to` ends in.
     Request request(*this, kFrame);
     request.To("COPY", Api(id)).Body(Only("destination", parent_id));
     if (overwrite) {
-        request.Unless(VFS_ERR_CONFLICT, replace);
+        request.Unless(VFS_ERR_CONFLICT, [&] { return ReplaceItem(*this, id, find, again); });
     }
     return request.Send();
 }
