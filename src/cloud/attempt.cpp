@@ -88,6 +88,15 @@ NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured) {
     return NextStep::RetryIf(context.fd != -1 && (cured || cloud.IsNeedRetry()));
 }
 
+NextStep JudgeRenewing(PublicCloud& cloud, const XferContext& context, __tag_vfs_err_ code,
+                       bool cured) {
+    const bool refused = code == VFS_ERR_UNAUTHORIZED;
+    if (refused && !cloud.RefreshToken(true)) {
+        return NextStep::End();
+    }
+    return JudgeUpload(cloud, context, cured || refused);
+}
+
 NextStep JudgeDownload(Cloud& cloud, const XferContext& context) {
     return NextStep::RetryIf(context.can_retry && cloud.IsNeedRetry());
 }
