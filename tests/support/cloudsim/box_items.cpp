@@ -179,7 +179,7 @@ Reply BoxService::Search(const BoxCall& call) {
     }
     const Page page = PageOf(request, 30, 200, 10000);
     Nodes found;
-    std::istringstream ancestors(request.Query("ancestor_folder_ids", tree_.RootId()));
+    std::istringstream ancestors(request.Query("ancestor_folder_ids", tree_.RootId(call.account)));
     std::string id;
     while (std::getline(ancestors, id, ',')) {
         Gather(Find(call, id, true), WordsOf(request.Query("query")), request.Query("type"), found);

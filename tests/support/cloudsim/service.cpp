@@ -12,11 +12,11 @@ Journal::Options JournalOptions(const ServerOptions& options) {
 
 }  // namespace
 
-Service::Service(const ServerOptions& options, const std::string& root_id)
+Service::Service(const ServerOptions& options, const TreeRules& rules)
     : options_(options),
       journal_(JournalOptions(options)),
       tokens_([this] { return Now(); }),
-      tree_([this] { return Now(); }, root_id) {}
+      tree_([this] { return Now(); }, rules) {}
 
 Service::~Service() = default;
 

@@ -61,7 +61,7 @@ class Service {
   protected:
     friend class Account;
 
-    Service(const ServerOptions& options, const std::string& root_id);
+    Service(const ServerOptions& options, const TreeRules& rules);
     /** To be called when the derived class is ready to answer. */
     void Start();
     /** To be called before the derived class goes. */
