@@ -78,11 +78,6 @@ class Attempts {
     const SourceLine at_;
 };
 
-int SeekFile(void* context, curl_off_t offset, int origin) {
-    const int fd = static_cast<const XferContext*>(context)->fd;
-    return lseek64(fd, offset, origin) < 0 ? CURL_SEEKFUNC_CANTSEEK : CURL_SEEKFUNC_OK;
-}
-
 }  // namespace
 
 bool RunAttempts(Cloud& cloud, const AttemptPlan& plan, SourceLine at) {
@@ -91,6 +86,15 @@ bool RunAttempts(Cloud& cloud, const AttemptPlan& plan, SourceLine at) {
 
 NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured) {
     return NextStep::RetryIf(context.fd != -1 && (cured || cloud.IsNeedRetry()));
+}
+
+NextStep JudgeRenewing(PublicCloud& cloud, const XferContext& context, __tag_vfs_err_ code,
+                       bool cured) {
+    const bool refused = code == VFS_ERR_UNAUTHORIZED;
+    if (refused && !cloud.RefreshToken(true)) {
+        return NextStep::End();
+    }
+    return JudgeUpload(cloud, context, cured || refused);
 }
 
 NextStep JudgeDownload(Cloud& cloud, const XferContext& context) {
@@ -115,13 +119,6 @@ bool SeekSource(int fd, off64_t offset, const char* text, SourceLine at) {
     }
     LOG_ERROR_AT(at, text, static_cast<unsigned long long>(offset));
     return false;
-}
-
-void LetCurlRewind(Cloud& cloud, const XferData& xfer) {
-    APIHandler* api = cloud.GetAPIHandler();
-    if (api != nullptr && xfer.context->fd != -1) {
-        api->SetSeekFunAndData(SeekFile, xfer.context);
-    }
 }
 
 bool SetRange(Cloud& cloud, const Json::Value& meta) {

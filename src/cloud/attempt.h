@@ -13,8 +13,8 @@
 #include <functional>
 #include <string>
 
+#include "cloud/public_cloud.h"
 #include "core/source_line.h"
-#include "zyrovfs/cloud.h"
 
 namespace ZYROCloud {
 
@@ -82,6 +82,14 @@ bool RunAttempts(Cloud& cloud, const AttemptPlan& plan,
  * for failures that the service's plan has cured by itself. */
 NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured = false);
 
+/**
+ * The same for an upload with a token that may have run out on the way. One that the service
+ * refuses is renewed, which is worth an attempt; a stream has none left, but the next transfer
+ * finds the new token. `code` is the failure's.
+ */
+NextStep JudgeRenewing(PublicCloud& cloud, const XferContext& context, __tag_vfs_err_ code,
+                       bool cured = false);
+
 /** A download is repeated from its start, so only before the first byte was written. */
 NextStep JudgeDownload(Cloud& cloud, const XferContext& context);
 
@@ -94,12 +102,6 @@ AttemptPlan DownloadPlan(Cloud& cloud, const XferData& xfer, const std::string& 
 /** lseek64 to `offset`; a failure logs `text`, a format that may end in "%m". */
 bool SeekSource(int fd, off64_t offset, const char* text,
                 ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
-
-/**
- * Lets libcurl itself go back to the start of a file: it has to when a kept connection turns out
- * dead in the middle of a body. Does nothing for a stream.
- */
-void LetCurlRewind(Cloud& cloud, const XferData& xfer);
 
 /**
  * Asks for "from_bytes" to "from_bytes" + "len" of `meta`, when it has a "len" other than 0. The

@@ -5,7 +5,13 @@
 #include <json/value.h>
 
 #include <algorithm>
+#include <string>
+#include <unordered_set>
 #include <utility>
+
+#include "core/log.h"
+#include "core/source_line.h"
+#include "zyrovfs/cloud.h"
 
 namespace ZYROCloud {
 
@@ -57,6 +63,26 @@ bool ForEachPage(const char* member, Json::Value& out, Fetch fetch, Keep keep, M
     }
     return true;
 }
+
+/** The places where pages of one listing began. */
+class CursorGuard {
+  public:
+    /** To be asked before each page. False for a place that was there before: following it would
+     * not end. Logged; the driver's record becomes VFS_ERR_CLOUD_FAILED, since what came so far is
+     * not the whole folder. */
+    bool Accept(Cloud& cloud, const std::string& cursor,
+                ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here()) {
+        if (seen_.insert(cursor).second) {
+            return true;
+        }
+        LOG_ERROR_AT(at, "Listing goes in a circle, %s", cursor.c_str());
+        cloud.SetError(ZYROVFS::VFS_ERR_CLOUD_FAILED, "");
+        return false;
+    }
+
+  private:
+    std::unordered_set<std::string> seen_;
+};
 
 }  // namespace ZYROCloud
 

@@ -49,6 +49,7 @@ void APIHandler::Reset() {
         curl_easy_reset(curl_);
     }
     form_data_ = nullptr;
+    form_file_ = FormFile();
     seek_function_ = nullptr;
     seek_data_ = nullptr;
     request_ = Json::Value(Json::objectValue);

@@ -80,6 +80,7 @@ class APIHandler {
     bool SetReqMethod(const std::string& method);
     /** A multipart body. Not owned, must outlive Process; null for none. */
     bool SetFormUploadData(FormUploadData* form);
+    bool IsForm() const { return form_data_ != nullptr; }
     /** Before Init: whether libcurl fails a status of 400 or more, without its body. Default true,
      * and stays set for later requests. */
     bool SetReturnOnError(bool return_on_error);
@@ -95,10 +96,11 @@ class APIHandler {
     /**
      * How to go back in what the read function gives: libcurl needs it when a kept connection dies
      * in the middle of a body, or the body is asked for again. For sources that can seek; offset 0
-     * is the first byte of this body. The file part of a form uses the function, too, with the
-     * context of its XferData in place of `data`.
+     * is the first byte of this body, also of the file part of a form.
      */
     bool SetSeekFunAndData(SeekCallback function, void* data);
+    /** The body cannot be given again. */
+    void ForgetSeek();
 
     /** The body comes from the read function. `mute` throws the answer's body away. */
     bool SetUploadOpt(bool mute);
@@ -194,6 +196,17 @@ class APIHandler {
     bool return_on_error_ = true;
     FormUploadData* form_data_ = nullptr;
     char* cert_data_ = nullptr;
+    /** Where libcurl reads the file of a form. */
+    struct FormFile {
+        const XferData* source = nullptr;
+        SeekCallback seek = nullptr;
+        void* seek_data = nullptr;
+    };
+    static size_t ReadFormFile(char* data, size_t size, size_t count, void* file);
+    static int SeekFormFile(void* file, curl_off_t offset, int origin);
+    CURLcode AddFormFile(curl_mime* form);
+
+    FormFile form_file_;
     SeekCallback seek_function_ = nullptr;
     void* seek_data_ = nullptr;
     /** Connections that are still open may check against these once more. */

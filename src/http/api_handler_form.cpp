@@ -27,38 +27,55 @@ CURLcode AddText(curl_mime* form, const std::string& name, const Json::Value& va
                   curl_mime_type(part, "application/json; charset=UTF-8")});
 }
 
-CURLcode AddFile(curl_mime* form, const FormUploadData& data, SeekCallback seek) {
-    curl_mimepart* part = curl_mime_addpart(form);
-    if (part == nullptr) {
-        return CURLE_OUT_OF_MEMORY;
-    }
-    if (data.xfer == nullptr || data.xfer->callback == nullptr) {
-        return CURLE_BAD_FUNCTION_ARGUMENT;
-    }
-    return First({curl_mime_name(part, data.name.c_str()), curl_mime_filename(part, "file"),
-                  curl_mime_data_cb(part, static_cast<curl_off_t>(data.size), data.xfer->callback,
-                                    seek, nullptr, data.xfer->context)});
-}
-
-CURLcode Fill(curl_mime* form, const FormUploadData& data, SeekCallback seek) {
-    for (const std::string& name : data.params.getMemberNames()) {
-        const CURLcode code = AddText(form, name, data.params[name]);
+CURLcode AddTexts(curl_mime* form, const Json::Value& params) {
+    for (const std::string& name : params.getMemberNames()) {
+        const CURLcode code = AddText(form, name, params[name]);
         if (code != CURLE_OK) {
             return code;
         }
     }
-    return data.name.empty() ? CURLE_OK : AddFile(form, data, seek);
+    return CURLE_OK;
 }
 
 }  // namespace
+
+size_t APIHandler::ReadFormFile(char* data, size_t size, size_t count, void* file) {
+    const XferData& source = *static_cast<FormFile*>(file)->source;
+    return source.callback(data, size, count, source.context);
+}
+
+int APIHandler::SeekFormFile(void* file, curl_off_t offset, int origin) {
+    const FormFile& self = *static_cast<FormFile*>(file);
+    return self.seek(self.seek_data, offset, origin);
+}
+
+CURLcode APIHandler::AddFormFile(curl_mime* form) {
+    if (form_data_->name.empty()) {
+        return CURLE_OK;
+    }
+    curl_mimepart* part = curl_mime_addpart(form);
+    if (part == nullptr) {
+        return CURLE_OUT_OF_MEMORY;
+    }
+    if (form_data_->xfer == nullptr || form_data_->xfer->callback == nullptr) {
+        return CURLE_BAD_FUNCTION_ARGUMENT;
+    }
+    form_file_ = {form_data_->xfer, seek_function_, seek_data_};
+    return First({curl_mime_name(part, form_data_->name.c_str()), curl_mime_filename(part, "file"),
+                  curl_mime_data_cb(part, static_cast<curl_off_t>(form_data_->size), ReadFormFile,
+                                    seek_function_ == nullptr ? nullptr : SeekFormFile, nullptr,
+                                    &form_file_)});
+}
 
 bool APIHandler::SetForm(curl_mime** form) {
     if (form_data_ == nullptr) {
         return true;
     }
     *form = curl_mime_init(curl_);
-    CURLcode code =
-        *form == nullptr ? CURLE_OUT_OF_MEMORY : Fill(*form, *form_data_, seek_function_);
+    CURLcode code = *form == nullptr ? CURLE_OUT_OF_MEMORY : AddTexts(*form, form_data_->params);
+    if (code == CURLE_OK) {
+        code = AddFormFile(*form);
+    }
     if (code == CURLE_OK && form_data_->xfer != nullptr) {
         code = curl_easy_setopt(curl_, CURLOPT_READFUNCTION, form_data_->xfer->callback);
     }

@@ -154,6 +154,13 @@ bool APIHandler::SetSeekFunAndData(SeekCallback function, void* data) {
             Accept(curl_easy_setopt(curl_, CURLOPT_SEEKDATA, data), "seek data"));
 }
 
+void APIHandler::ForgetSeek() {
+    seek_function_ = nullptr;
+    seek_data_ = nullptr;
+    curl_easy_setopt(curl_, CURLOPT_SEEKFUNCTION, nullptr);
+    curl_easy_setopt(curl_, CURLOPT_SEEKDATA, nullptr);
+}
+
 bool APIHandler::SetUploadOpt(bool mute) {
     const void* sink = mute ? Pointer(MutedWriteCallback) : Pointer(WriteToStrBuf);
     return Accept(curl_easy_setopt(curl_, CURLOPT_UPLOAD, 1L), "upload") &&

@@ -6,11 +6,9 @@
 
 namespace ZYROVFS::Server {
 
-class BoxServer : public CloudServer {
+class BoxServer : public CloudAccount<BoxServer> {
   public:
-    bool Load(unsigned int uid, VFS_CONFIG_MODE mode, Json::Value conf, bool decrypt,
-              bool online) override;
-    bool GetServerID(std::string& id) override;
+    static const CloudAccountRules& Rules();
 };
 
 }  // namespace ZYROVFS::Server

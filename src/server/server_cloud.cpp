@@ -69,8 +69,7 @@ std::string ExpireTimeOf(const CloudAccountRules& rules, const Json::Value& conf
 
 }  // namespace
 
-bool CloudServer::AskService(const CloudAccountRules& rules, unsigned int uid, Json::Value& conf,
-                             SourceLine at) {
+bool CloudServer::AskService(const CloudAccountRules& rules, unsigned int uid, Json::Value& conf) {
     // With its id the driver can write a renewed token into the profile, where there is one.
     conf["server_id"] = rules.scheme + conf.get("email", "").asString();
     Json::Value params(Json::objectValue);
@@ -83,11 +82,11 @@ bool CloudServer::AskService(const CloudAccountRules& rules, unsigned int uid, J
     const bool complete =
         rules.needed == nullptr || (answer.isObject() && answer.isMember(rules.needed));
     if (!asked || !complete) {
-        LOG_ERROR_AT(at, "GetAccountInfo failed, %s", json::toString(error).c_str());
+        LOG_ERROR_AT(rules.at, "GetAccountInfo failed, %s", json::toString(error).c_str());
         // Without a driver there is no record either.
         const int code =
             error.isObject() ? error.get("code", VFS_ERR_NONE).asInt() : VFS_ERR_FAILED;
-        return Fail(static_cast<__tag_vfs_err_>(code), at);
+        return Fail(static_cast<__tag_vfs_err_>(code), rules.at);
     }
     return NoThrow(
         VFS_ERR_CLOUD_FAILED,
@@ -100,7 +99,7 @@ bool CloudServer::AskService(const CloudAccountRules& rules, unsigned int uid, J
             account_info_ = json::toString(rules.document ? answer[rules.document] : answer);
             return true;
         },
-        at);
+        rules.at);
 }
 
 void CloudServer::TakeProfile(const CloudAccountRules& rules, const Json::Value& conf) {
@@ -114,12 +113,12 @@ void CloudServer::TakeProfile(const CloudAccountRules& rules, const Json::Value&
 }
 
 bool CloudServer::LoadBy(const CloudAccountRules& rules, unsigned int uid, VFS_CONFIG_MODE mode,
-                         Json::Value& conf, bool decrypt, bool online, SourceLine at) {
+                         Json::Value& conf, bool decrypt, bool online) {
     return NoThrow(
         VFS_ERR_BAD_PARAM,
         [&] {
             if (!HasRequiredKeys(rules, conf) || !AreTextsFine(conf)) {
-                return Fail(VFS_ERR_BAD_PARAM, at);
+                return Fail(VFS_ERR_BAD_PARAM, rules.at);
             }
             if (decrypt) {
                 // A token that does not decipher is refused by the service, with a better code.
@@ -128,17 +127,17 @@ bool CloudServer::LoadBy(const CloudAccountRules& rules, unsigned int uid, VFS_C
             if (!online) {
                 email_ = conf.get("email", "").asString();
                 account_info_ = conf.get("account_info", "").asString();
-            } else if (!AskService(rules, uid, conf, at)) {
+            } else if (!AskService(rules, uid, conf)) {
                 return false;
             }
             if (!IsConfigValid(conf)) {
-                return Fail(VFS_ERR_BAD_PARAM, at);
+                return Fail(VFS_ERR_BAD_PARAM, rules.at);
             }
             TakeProfile(rules, conf);
             connect_status_ = GetConnectStatus(uid);
             return true;
         },
-        at);
+        rules.at);
 }
 
 bool CloudServer::IsConfigValid(Json::Value& conf) {

@@ -24,7 +24,8 @@ struct CloudAccountRules {
     const char* needed;
     /** The account document is this member of the answer, or the whole answer when null. */
     const char* document;
-    std::vector<const char*> email;  ///< members that lead to the e-mail
+    std::vector<const char*> email;      ///< members that lead to the e-mail
+    SourceLine at = SourceLine::Here();  ///< what log lines name
 };
 
 /** The common part of the cloud types; each adds how its account is learnt. */
@@ -58,7 +59,7 @@ class CloudServer : public ServerBase {
   protected:
     /** Load by a service's rules. VFS_ERR_BAD_PARAM, or the code that asking the service left. */
     bool LoadBy(const CloudAccountRules& rules, unsigned int uid, VFS_CONFIG_MODE mode,
-                Json::Value& conf, bool decrypt, bool online, SourceLine at = SourceLine::Here());
+                Json::Value& conf, bool decrypt, bool online);
 
     std::string access_token_;
     std::string refresh_token_;
@@ -68,9 +69,23 @@ class CloudServer : public ServerBase {
     std::string account_info_;  ///< the service's account document as JSON text
 
   private:
-    bool AskService(const CloudAccountRules& rules, unsigned int uid, Json::Value& conf,
-                    SourceLine at);
+    bool AskService(const CloudAccountRules& rules, unsigned int uid, Json::Value& conf);
     void TakeProfile(const CloudAccountRules& rules, const Json::Value& conf);
+};
+
+/** A cloud type that is told from the others by `Type::Rules()` alone. */
+template <typename Type>
+class CloudAccount : public CloudServer {
+  public:
+    bool Load(unsigned int uid, VFS_CONFIG_MODE mode, Json::Value conf, bool decrypt,
+              bool online) override {
+        return LoadBy(Type::Rules(), uid, mode, conf, decrypt, online);
+    }
+    /** Before the e-mail is known, the bare scheme. */
+    bool GetServerID(std::string& id) override {
+        id = Type::Rules().scheme + email_;
+        return true;
+    }
 };
 
 }  // namespace ZYROVFS::Server

@@ -4,6 +4,9 @@
 
 #include "core/log.h"
 #include "server/server_box.h"
+#include "server/server_dropbox.h"
+#include "server/server_gdrive.h"
+#include "server/server_onedrive.h"
 #include "server/server_sharing.h"
 #include "server/server_vfs.h"
 
@@ -15,21 +18,14 @@ std::unique_ptr<ServerBase> Make() {
     return std::unique_ptr<ServerBase>(new (std::nothrow) Type);
 }
 
-std::unique_ptr<ServerBase> NotBuilt() {
-    LOG_ERROR("This cloud is not part of this build");
-    return nullptr;
-}
-
 struct Row {
     const char* protocol;
     std::unique_ptr<ServerBase> (*make)();
 };
 
 constexpr Row kTypes[] = {
-    {"google", NotBuilt},
-    {"dropbox", NotBuilt},
-    {"onedrive", NotBuilt},
-    {"box", Make<BoxServer>},
+    {"google", Make<GDriveServer>},     {"dropbox", Make<DropboxServer>},
+    {"onedrive", Make<OneDriveServer>}, {"box", Make<BoxServer>},
     {"sharing", Make<SharingServer>},
 };
 

@@ -11,7 +11,7 @@
 #include "cloud/pager.h"
 #include "cloud/request.h"
 #include "cloud/secret.h"
-#include "core/error_cell.h"
+#include "cloud/size_limit.h"
 #include "core/log.h"
 #include "http/api_handler.h"
 #include "http/error_handler.h"
@@ -147,12 +147,8 @@ bool Box::CanFileUpload(unsigned long long size) {
     if (size == kSizeNotKnown) {
         return true;
     }
-    if (size > kLargestFile) {
-        SetPlatformErr(0xa400);
-        SetError(VFS_ERR_FILE_TOO_LARGE, "");
-        return false;
-    }
-    return size <= kAskedFrom || PreflightCheck("", std::to_string(time(nullptr)), "0", "", size);
+    return FitsLimit(*this, size, kLargestFile) &&
+           (size <= kAskedFrom || PreflightCheck("", std::to_string(time(nullptr)), "0", "", size));
 }
 
 }  // namespace ZYROCloud

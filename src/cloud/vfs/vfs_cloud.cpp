@@ -11,7 +11,7 @@
 #include "cloud/fuse_attr.h"
 #include "cloud/guard.h"
 #include "cloud/profile_member.h"
-#include "cloud/vfs/upload_body.h"
+#include "cloud/upload_body.h"
 #include "core/handle.h"
 #include "core/json.h"
 #include "http/api_handler.h"

@@ -4,6 +4,8 @@
 #include <json/value.h>
 
 #include "core/json.h"
+#include "support/bare_driver.h"
+#include "support/seams.h"
 
 namespace ZYROCloud {
 namespace {
@@ -110,6 +112,29 @@ TEST(Pager, ItemsAreMovedNotCopied) {
         ASSERT_TRUE(out[number]["name"].getString(&moved, &end));
         EXPECT_EQ(moved, begin) << number;
     }
+}
+
+TEST(Pager, AListingWhosePagesGoInACircleFailsAndKeepsWhatCame) {
+    bare::PlainDriver cloud;
+    CursorGuard guard;
+    std::string cursor;
+    std::string letters = "abcab";
+    size_t fetched = 0;
+    Json::Value out;
+    EXPECT_FALSE(ForEachPage(
+        "entries", out,
+        [&](Json::Value& page) {
+            page = Page(R"({"entries":[1]})");
+            return guard.Accept(cloud, cursor);
+        },
+        kKeepAll,
+        [&](const Json::Value&) {
+            cursor = letters[fetched++];
+            return true;
+        }));
+    EXPECT_EQ(out.size(), 4U);
+    EXPECT_EQ(cloud.GetErrorCode(), ZYROVFS::VFS_ERR_CLOUD_FAILED);
+    EXPECT_THAT(seams::LogDump(), testing::HasSubstr("Listing goes in a circle, a"));
 }
 
 }  // namespace

@@ -185,7 +185,7 @@ TEST_F(Upload, AFormOnAKeptConnectionThatDiesInItsMiddleIsSentWholeOnAnother) {
         Source source(8 << 20);
         FormUploadData form{&source.xfer, "file", source.Text().size(), Parsed(R"({"a":"b"})")};
         talk.api.AddHeader(Parsed(R"({"Expect":""})"));
-        talk.api.SetSeekFunAndData(Source::Seek, nullptr);
+        talk.api.SetSeekFunAndData(Source::Seek, source.xfer.context);
         talk.api.SetFormUploadData(&form);
         EXPECT_TRUE(talk.Get(server.Url())) << seams::LogDump();
         EXPECT_EQ(talk.api.GetResponse(), "made");

@@ -1,6 +1,8 @@
 // FTP dialogues: what the handler asks for, and what refusals of a server become.
 #include <sys/types.h>
 
+#include <cstring>
+
 #include "unit/http/http_fixture.h"
 
 namespace ZYROCloud {
@@ -90,17 +92,17 @@ TEST(Ftp, AFullServerIsNoSpace) {
 }
 
 TEST(Ftp, ARefusedPassiveModeIsTriedAgainInActiveMode) {
-    const wire::WireServer server(
-        {Dialogue(LoggedInAnd({"500 what?", "502 not here"})),
-         Dialogue(LoggedInAnd({"500 what?", "500 what?", "500 what?", "500 what?"}))});
+    // The connection outlives the refusal, so both attempts are one dialogue.
+    const wire::WireServer server({Dialogue(LoggedInAnd(
+        {"500 what?", "502 not here", "500 what?", "500 what?", "500 what?", "500 what?"}))});
     Conversation<FTPErrorHandler> talk;
     EXPECT_FALSE(talk.Get(server.Url("/file", "ftp"), 1));
-    ASSERT_EQ(server.Connections(), 2U);
     const std::string told = server.ReceivedText();
-    const size_t second = told.rfind("USER");
-    EXPECT_THAT(told.substr(0, second), HasSubstr("EPSV\r\nPASV\r\n"));
-    EXPECT_THAT(told.substr(second), HasSubstr("EPRT |1|127.0.0.1|"));
-    EXPECT_THAT(told.substr(second), Not(HasSubstr("PASV")));
+    const size_t refused = told.find("EPSV\r\nPASV\r\n");
+    ASSERT_NE(refused, std::string::npos) << told;
+    const std::string second = told.substr(refused + strlen("EPSV\r\nPASV\r\n"));
+    EXPECT_THAT(second, HasSubstr("EPRT |1|127.0.0.1|"));
+    EXPECT_THAT(second, Not(HasSubstr("PASV")));
     EXPECT_THAT(seams::Sleeps(), ElementsAre(3)) << seams::LogDump();
 }
 

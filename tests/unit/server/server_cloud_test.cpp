@@ -4,7 +4,10 @@
 #include <zosplatform/process.h>
 
 #include "server/server_box.h"
+#include "server/server_dropbox.h"
+#include "server/server_gdrive.h"
 #include "server/server_mgr.h"
+#include "server/server_onedrive.h"
 #include "support/fake_location.h"
 #include "support/profiles.h"
 #include "support/seams.h"
@@ -18,31 +21,6 @@ namespace {
 
 using profiles::kUser;
 using Calls = std::vector<std::string>;
-
-/** A service like those whose stored end of the token counts first. */
-class StoredEndServer : public CloudServer {
-  public:
-    explicit StoredEndServer(bool expiring) : expiring_(expiring) {}
-    bool Load(unsigned int uid, VFS_CONFIG_MODE mode, Json::Value conf, bool decrypt,
-              bool online) override {
-        const CloudAccountRules rules{ZYROCloud::CLOUD_TYPE_DROPBOX,
-                                      "dropbox://",
-                                      expiring_,
-                                      false,
-                                      nullptr,
-                                      nullptr,
-                                      nullptr,
-                                      {"email"}};
-        return LoadBy(rules, uid, mode, conf, decrypt, online);
-    }
-    bool GetServerID(std::string& id) override {
-        id = "dropbox://" + email_;
-        return true;
-    }
-
-  private:
-    bool expiring_;
-};
 
 class CloudProfile : public profiles::ProfileTest {
   protected:
@@ -125,7 +103,7 @@ TEST_F(CloudProfile, EmptyAliasIsStoredAsTheEmail) {
 TEST_F(CloudProfile, WithoutRefreshTokenItIsStoredAsEmptyTextWhereTheServiceHasNone) {
     conf.removeMember("refresh_token");
     conf.removeMember("expire_time");
-    StoredEndServer dropbox(false);
+    DropboxServer dropbox;
     ASSERT_TRUE(LoadInto(dropbox));
     const Json::Value stored = Stored(dropbox, true);
     EXPECT_EQ(stored["refresh_token"], "");
@@ -142,12 +120,18 @@ TEST_F(CloudProfile, WithBothEndsGivenBoxComputesAndTheOthersKeepTheStored) {
     const time_t now = time(nullptr);
     ASSERT_TRUE(Load());
     EXPECT_NEAR(std::stoll(Stored(box)["expire_time"].asString()), now + 3600, 60);
-    StoredEndServer other(true);
-    ASSERT_TRUE(LoadInto(other));
-    EXPECT_EQ(Stored(other)["expire_time"], "1700000000");
-    conf.removeMember("expire_time");
-    ASSERT_TRUE(LoadInto(other));
-    EXPECT_NEAR(std::stoll(Stored(other)["expire_time"].asString()), now + 3600, 60);
+    const Json::Value both = conf;
+    DropboxServer dropbox;
+    GDriveServer google;
+    OneDriveServer onedrive;
+    for (CloudServer* other : std::vector<CloudServer*>{&dropbox, &google, &onedrive}) {
+        conf = both;
+        ASSERT_TRUE(LoadInto(*other));
+        EXPECT_EQ(Stored(*other)["expire_time"], "1700000000");
+        conf.removeMember("expire_time");
+        ASSERT_TRUE(LoadInto(*other));
+        EXPECT_NEAR(std::stoll(Stored(*other)["expire_time"].asString()), now + 3600, 60);
+    }
 }
 
 TEST_F(CloudProfile, LifeOfATokenIsReadAsFarAsItIsANumber) {

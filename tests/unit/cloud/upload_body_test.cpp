@@ -1,0 +1,111 @@
+// The body of an upload, asked for again by libcurl in the middle of a request.
+#include "cloud/upload_body.h"
+
+#include <gmock/gmock.h>
+#include <sys/mman.h>
+#include <unistd.h>
+
+#include <string>
+
+#include "core/handle.h"
+#include "support/bare_driver.h"
+#include "support/seams.h"
+#include "support/wire_server.h"
+
+namespace ZYROCloud {
+namespace {
+
+using namespace ZYROVFS;  // NOLINT(google-build-using-namespace)
+
+/** A file of 0123456789... and a driver whose uploads read it. */
+class UploadBodies : public testing::Test {
+  protected:
+    static constexpr size_t kSize = 4 << 20;
+
+    UploadBodies() : file_(memfd_create("source", MFD_CLOEXEC)) {
+        for (size_t i = 0; i < kSize; ++i) {
+            text_ += static_cast<char>('0' + i % 10);
+        }
+        EXPECT_EQ(write(file_.Get(), text_.data(), text_.size()),
+                  static_cast<ssize_t>(text_.size()));
+        context_.fd = file_.Get();
+    }
+
+    static size_t Read(char* data, size_t size, size_t count, void* context) {
+        auto& self = *static_cast<XferContext*>(context);
+        const size_t want =
+            self.limited ? std::min<size_t>(size * count, self.chunk_left) : size * count;
+        const ssize_t n = read(self.fd, data, want);
+        if (self.limited && n > 0) {
+            self.chunk_left -= static_cast<unsigned int>(n);
+        }
+        return n < 0 ? CURL_READFUNC_ABORT : static_cast<size_t>(n);
+    }
+
+    /** Sends from `from` on, on a kept connection that dies in the middle of the body. */
+    bool SendOnADyingConnection(off_t from, unsigned long long size, std::string& arrived) {
+        const wire::WireServer server({{wire::ReadRequest(), wire::Send(wire::Answer(200)),
+                                        wire::ReadHead(), wire::ReadBytes(100000), wire::Reset()},
+                                       {wire::ReadRequest(), wire::Send(wire::Answer(201))}});
+        APIHandler& api = *driver_.GetAPIHandler();
+        driver_.Init();
+        EXPECT_TRUE(api.Init());
+        api.SetURL(server.Url(), false);
+        EXPECT_TRUE(api.Process(0));
+        lseek(file_.Get(), from, SEEK_SET);
+        Json::Value headers;
+        headers["Expect"] = "";
+        EXPECT_TRUE(api.Init() && driver_.InitXferData(&xfer_) && api.SetUploadOpt(true) &&
+                    api.AddHeader(headers) && api.SetUploadSize(static_cast<long long>(size)));
+        api.SetURL(server.Url(), false);
+        const bool sent = SendUpload(driver_, xfer_);
+        if (sent) {
+            const std::string last = server.Received().back();
+            arrived = last.substr(last.find("\r\n\r\n") + 4);
+        }
+        return sent;
+    }
+
+    UniqueFd file_;
+    std::string text_;
+    XferContext context_;
+    XferData xfer_{Read, 1, &context_};
+    bare::Driver<Cloud> driver_;
+};
+
+TEST_F(UploadBodies, AFileIsReadAgainFromWhereTheBodyBegan) {
+    std::string arrived;
+    ASSERT_TRUE(SendOnADyingConnection(1003, kSize - 1003, arrived)) << seams::LogDump();
+    EXPECT_TRUE(arrived == text_.substr(1003));
+}
+
+TEST_F(UploadBodies, APieceIsReadAgainToItsEndAndNoFurther) {
+    constexpr unsigned int kPiece = 2 << 20;
+    context_.limited = true;
+    context_.chunk_size = kPiece;
+    context_.chunk_left = kPiece;
+    std::string arrived;
+    ASSERT_TRUE(SendOnADyingConnection(1003, kPiece, arrived)) << seams::LogDump();
+    EXPECT_TRUE(arrived == text_.substr(1003, kPiece));
+    EXPECT_EQ(context_.chunk_left, 0U);
+}
+
+TEST_F(UploadBodies, AStreamThatHasBegunIsNotSentAgain) {
+    const int stream = file_.Get();
+    static int from;
+    from = stream;
+    context_.fd = -1;
+    xfer_.callback = [](char* data, size_t size, size_t count, void*) -> size_t {
+        return static_cast<size_t>(read(from, data, size * count));
+    };
+    std::string arrived;
+    EXPECT_FALSE(SendOnADyingConnection(0, kSize, arrived));
+}
+
+TEST_F(UploadBodies, ADriverWithoutAContextSendsNothing) {
+    xfer_.context = nullptr;
+    EXPECT_FALSE(SendUpload(driver_, xfer_));
+}
+
+}  // namespace
+}  // namespace ZYROCloud
