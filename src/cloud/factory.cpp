@@ -2,6 +2,7 @@
 #include <new>
 
 #include "cloud/box/box.h"
+#include "cloud/onedrive/onedrive.h"
 #include "cloud/vfs/vfs_cloud.h"
 #include "core/log.h"
 #include "zyrovfs/cloud_utils.h"
@@ -37,7 +38,7 @@ constexpr struct {
     Make make;
 } kDrivers[] = {
     {CLOUD_TYPE_VFS, New<VFSCloud>}, {CLOUD_TYPE_GOOGLE, NoDriver},
-    {CLOUD_TYPE_DROPBOX, NoDriver},  {CLOUD_TYPE_ONEDRIVE, NoDriver},
+    {CLOUD_TYPE_DROPBOX, NoDriver},  {CLOUD_TYPE_ONEDRIVE, New<OneDrive>},
     {CLOUD_TYPE_BOX, New<Box>},      {CLOUD_TYPE_ONEDRIVE_SHORT, Nothing},
     {CLOUD_TYPE_HUBIC, Nothing},     {CLOUD_TYPE_AWSS3, Nothing},
 };

@@ -12,11 +12,11 @@ Journal::Options JournalOptions(const ServerOptions& options) {
 
 }  // namespace
 
-Service::Service(const ServerOptions& options, const std::string& root_id)
+Service::Service(const ServerOptions& options, const TreeRules& rules)
     : options_(options),
       journal_(JournalOptions(options)),
       tokens_([this] { return Now(); }),
-      tree_([this] { return Now(); }, root_id) {}
+      tree_([this] { return Now(); }, rules) {}
 
 Service::~Service() = default;
 
@@ -52,6 +52,10 @@ int64_t Service::Now() const {
 
 std::unique_ptr<Sink> Service::NewSink() const {
     return MakeSink(options_.storage, options_.hash_uploads);
+}
+
+std::map<std::string, std::string> Service::Attributes(const Account&, const Item& item) {
+    return {{"id::file", item.id}};
 }
 
 }  // namespace cloudsim
