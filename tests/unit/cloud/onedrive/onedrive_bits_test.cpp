@@ -56,7 +56,7 @@ TEST_F(OneDriveBits, IsASessionWithTheStorageOfTheOwner) {
     EXPECT_THAT(Packets(), ElementsAre("Create-Session", "Fragment", "Fragment", "Close-Session"));
     EXPECT_THAT(Headers("BITS-Session-Id"), ElementsAre("-", "{s-1}", "{s-1}", "{s-1}"));
     EXPECT_THAT(Headers("BITS-Supported-Protocols"),
-                ElementsAre("{7df0354d-249b-430f-820d-3d2a9bef4931}", "-", "-", "-"));
+                ElementsAre("7df0354d-249b-430f-820d-3d2a9bef4931", "-", "-", "-"));
     EXPECT_THAT(Headers("Content-Length"), ElementsAre("-", "33554432", "8388608", "0"));
     EXPECT_THAT(Headers("Transfer-Encoding"), testing::Each(testing::Eq("-")));
     EXPECT_THAT(Headers("Authorization"), testing::Each(testing::Eq("Bearer token-canary")));
@@ -152,12 +152,28 @@ TEST_F(OneDriveBits, AFragmentThatTheServiceIsTooBusyForIsRepeatedFromWhereItSay
 }
 
 TEST_F(OneDriveBits, AWrongRangeIsCuredByGoingBackToWhereTheServiceIs) {
-    Give({opened, Has(kMiB, 416), Has(kFirst + kMiB), Has(kTotal), ok});
+    Give({opened, Has(kFirst), Has(kFirst - kMiB, 416), Has(kTotal - kMiB), ok});
+    EXPECT_TRUE(Upload()) << seams::LogDump();
+    EXPECT_THAT(Ranges(),
+                ElementsAre("bytes 0-33554431/41943040", "bytes 33554432-41943039/41943040",
+                            "bytes 32505856-40894463/41943040"));
+    EXPECT_TRUE(IsPart(3, kFirst - kMiB, 8 * kMiB));
+}
+
+TEST_F(OneDriveBits, AFragmentThatWasStoredInPartGoesOnThereAndEndsWithTheFile) {
+    Give({opened, Has(kMiB, 500), Has(kFirst + kMiB), Has(kTotal), ok});
     EXPECT_TRUE(Upload()) << seams::LogDump();
     EXPECT_THAT(Ranges(),
                 ElementsAre("bytes 0-33554431/41943040", "bytes 1048576-34603007/41943040",
-                            "bytes 34603008-42991615/41943040"));
+                            "bytes 34603008-41943039/41943040"));
     EXPECT_TRUE(IsPart(2, kMiB, kFirst));
+    EXPECT_TRUE(IsPart(3, kFirst + kMiB, kTotal - kFirst - kMiB));
+}
+
+TEST_F(OneDriveBits, AFileThatTheServiceHasInWholeIsClosedThoughItsLastAnswerFailed) {
+    Give({opened, Has(kFirst), Has(kTotal, 503), ok});
+    EXPECT_TRUE(Upload()) << seams::LogDump();
+    EXPECT_THAT(Packets(), ElementsAre("Create-Session", "Fragment", "Fragment", "Close-Session"));
 }
 
 TEST_F(OneDriveBits, AFailureWithoutTheServicesWordIsSentAgainFromTheVeryStart) {
