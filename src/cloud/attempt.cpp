@@ -29,7 +29,8 @@ class Attempts {
                 return false;
             }
         }
-        Copy(plan_.copy != CopyError::kNever);
+        // Copied before, it stays: requests between the attempts have made a record of their own.
+        Copy(plan_.copy == CopyError::kAtEnd);
         Log(plan_.exhausted);
         return false;
     }

@@ -82,6 +82,10 @@ bool APIHandler::AddGetParam(const Json::Value& params) {
 }
 
 bool APIHandler::AddPostRawParam(const Json::Value& params) {
+    if (params.isNull()) {
+        request_[kRawBody] = params;
+        return true;
+    }
     return SetMember(kRawBody, params);
 }
 
@@ -202,7 +206,7 @@ bool APIHandler::BuildHeaderParam(curl_slist** list) {
     for (const std::string& name : headers.getMemberNames()) {
         const Json::Value& value = headers[name];
         const std::string line =
-            name + ": " + (value.isObject() ? json::toString(value) : value.asString());
+            name + ": " + (value.isObject() ? json::toAscii(value) : value.asString());
         if (line.find_first_of("\r\n") != std::string::npos) {
             return false;  // would end the header and begin another one
         }

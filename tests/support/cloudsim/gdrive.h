@@ -64,6 +64,9 @@ class GDrive : public Service {
     std::string ContentHost() const { return Address(drive_options_.content_name); }
     std::string TokenUrl() const { return AccountsHost() + "/o/oauth2/token"; }
 
+    std::map<std::string, std::string> Attributes(const Account& account,
+                                                  const Item& item) override;
+
     // What only this service's items can be. Accounts take several items of one name. Each answers
     // the new item's id; an empty `parent` means that it lies nowhere.
     /** `kind` is "document", "spreadsheet", "presentation", "drawing", "form" or "script". */

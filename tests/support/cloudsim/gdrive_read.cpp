@@ -273,6 +273,13 @@ Json::Value GDrive::Show(const GDriveCall& call, const Node& node) {
                         gdrive::ParseFields(call.request.Query("fields"), gdrive::kFileSchema));
 }
 
+std::map<std::string, std::string> GDrive::Attributes(const Account& account, const Item& item) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    const gdrive::Mask whole = gdrive::ParseFields("", gdrive::kFileSchema);
+    const Json::Value described = gdrive::File(ViewOf(account), At(account, item.id), whole);
+    return {{"id::file", item.id}, {"standard::description", OneLine(described)}};
+}
+
 std::string GDrive::Md5(const Node& node) {
     const auto known = sums_.find(node.version_id);
     return known != sums_.end() ? known->second : sums_[node.version_id] = Md5Of(*node.content);

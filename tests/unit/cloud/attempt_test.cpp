@@ -141,5 +141,18 @@ TEST_F(Attempts, PiecesOfAnUploadEndWithTheRest) {
     EXPECT_EQ(sent, 2);
 }
 
+TEST_F(Attempts, ARequestBetweenTheAttemptsDoesNotHideTheFailure) {
+    // The handler's record is that of the look in the end, and the look went well.
+    Transfer run({});
+    DropboxDownload(run);
+    run.plan.send = [&] { return run.Note("send") && run.cloud.Meet(kGone); };
+    run.plan.judge = [&](__tag_vfs_err_) {
+        return run.cloud.Meet(kDone) ? NextStep::RetryAfter(10) : NextStep::End();
+    };
+    EXPECT_FALSE(run.Go());
+    EXPECT_EQ(run.cloud.GetErrorCode(), VFS_ERR_NOT_FOUND);
+    EXPECT_EQ(seams::Sleeps().size(), 6U);
+}
+
 }  // namespace
 }  // namespace ZYROCloud
