@@ -110,6 +110,12 @@ class GDrive : public PublicCloud {
     bool StartUpload(const std::string& session_uri, XferData* xfer, unsigned long long start,
                      unsigned long long total);
     bool DownloadProcess(XferData* xfer, const Json::Value& meta) override;
+
+  private:
+    bool DescribeDownload(const std::string& uri, const std::string& link_attr, Json::Value& meta,
+                          std::string& url);
+    bool DescribeUpload(const std::string& server_path, const std::string& id, Json::Value& meta,
+                        std::string& url);
 };
 
 }  // namespace ZYROCloud
