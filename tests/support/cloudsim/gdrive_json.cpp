@@ -203,13 +203,22 @@ const std::map<std::string, Maker>& Makers() {
 
 Json::Value File(const View& view, const Node& node, const Mask& mask) {
     Json::Value file = Json::objectValue;
-    for (const auto& [field, make] : Makers()) {
-        if (!mask.Wants(field)) {
-            continue;
-        }
+    const auto put = [&](const std::string& field, const Maker& make) {
         Json::Value value = make(view, node);
         if (!value.isNull()) {
             file[field] = mask.Of(field).Apply(value);
+        }
+    };
+    if (mask.Wants("*")) {
+        for (const auto& [field, make] : Makers()) {
+            put(field, make);
+        }
+        return file;
+    }
+    for (const auto& [field, below] : mask.members) {
+        const auto maker = Makers().find(field);
+        if (maker != Makers().end()) {
+            put(field, maker->second);
         }
     }
     return file;
