@@ -69,7 +69,7 @@ bool GDrive::DescribeDownload(const std::string& uri, const std::string& link_at
 bool GDrive::DescribeUpload(const std::string& server_path, const std::string& id,
                             Json::Value& meta, std::string& url) {
     const bool is_new = id.empty() || id == kRoot;
-    url = Upload(is_new ? "" : "/" + id);
+    url = gdrive::Upload(is_new ? "" : "/" + id);
     meta["method"] = is_new ? "POST" : "PUT";
     std::string parent, title;
     if (!CutAtLastSlash(server_path, parent, title)) {
