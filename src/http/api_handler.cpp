@@ -20,6 +20,10 @@ constexpr char kQuery[] = "get_param";
 constexpr char kRawBody[] = "post_raw_param";
 constexpr char kFormBody[] = "post_param";
 
+// Of HTTP; those of FTP begin behind them.
+constexpr long kFirstInterim = 100;
+constexpr long kLastInterim = 103;
+
 using UniqueCurlText = std::unique_ptr<char, FreeWith<curl_free>>;
 
 }  // namespace
@@ -167,6 +171,11 @@ bool APIHandler::ParseCurlError(CURLcode code) {
                   LoggableUrl().c_str(), static_cast<int>(info), curl_easy_strerror(info));
         status = 0;
         code = info;
+    }
+    if (status >= kFirstInterim && status <= kLastInterim) {
+        // "Continue", and nothing came after that. It is no answer, and what broke off behind it
+        // must not count as done.
+        status = 0;
     }
     if (code != CURLE_OK) {
         LOG_ERROR("Failed to perform curl, curl code=%d, resp:%d err=%s", static_cast<int>(code),
