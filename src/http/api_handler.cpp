@@ -1,10 +1,12 @@
 #include "http/api_handler.h"
 
+#include <strings.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <climits>
 #include <cstdlib>
+#include <cstring>
 
 #include "core/json.h"
 #include "core/log.h"
@@ -20,11 +22,16 @@ constexpr char kQuery[] = "get_param";
 constexpr char kRawBody[] = "post_raw_param";
 constexpr char kFormBody[] = "post_param";
 
-// Of HTTP; those of FTP begin behind them.
-constexpr long kFirstInterim = 100;
-constexpr long kLastInterim = 103;
-
 using UniqueCurlText = std::unique_ptr<char, FreeWith<curl_free>>;
+
+/** "100 Continue" says that a body may be sent. A connection that breaks behind it has brought no
+ * answer, and a status below 400 would make a success of that. */
+bool IsInterim(CURL* curl, long status) {
+    constexpr long kFirstAnswer = 200;
+    const char* scheme = nullptr;
+    return status < kFirstAnswer && curl_easy_getinfo(curl, CURLINFO_SCHEME, &scheme) == CURLE_OK &&
+           scheme != nullptr && strncasecmp(scheme, "http", strlen("http")) == 0;
+}
 
 }  // namespace
 
@@ -172,9 +179,7 @@ bool APIHandler::ParseCurlError(CURLcode code) {
         status = 0;
         code = info;
     }
-    if (status >= kFirstInterim && status <= kLastInterim) {
-        // "Continue", and nothing came after that. It is no answer, and what broke off behind it
-        // must not count as done.
+    if (code != CURLE_OK && IsInterim(curl_, status)) {
         status = 0;
     }
     if (code != CURLE_OK) {

@@ -96,13 +96,10 @@ TEST_F(Fault, InterimAnswersArePassedOver) {
            "final");
 }
 
-TEST_F(Fault, AnInterimAnswerIsNoneWhenTheConnectionEndsBehindIt) {
-    // The body went out on the server's word, and then there was silence: nobody knows whether it
-    // arrived, least of all that it did.
-    Expect({52, 0, VFS_ERR_UNKNOWN, false}, {ReadRequest(), Send("HTTP/1.1 100 Continue\r\n\r\n")});
-    Expect({52, 0, VFS_ERR_UNKNOWN, false},
-           {ReadRequest(), Send("HTTP/1.1 103 Early Hints\r\nLink: x\r\n\r\n")});
-    EXPECT_THAT(seams::Sleeps(), ElementsAre(3, 3));
+TEST_F(Fault, AResetBehindAnInterimAnswerIsAFailedReceive) {
+    Expect({56, 0, VFS_ERR_RECEIVE_FAILED, false},
+           {ReadRequest(), Send("HTTP/1.1 100 Continue\r\n\r\n"), wire::Drip("H", 1, 50),
+            wire::Reset()});
 }
 
 TEST_F(Fault, AnAnswerThatIsNoHttpFails) {
