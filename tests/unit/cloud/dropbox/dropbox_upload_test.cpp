@@ -164,6 +164,7 @@ TEST_F(DropboxUpload, OfASourceThatCannotSeekEndsWithALine) {
     EXPECT_THAT(Requests(), SizeIs(1));
     EXPECT_TRUE(seams::Logged("Failed to seek file to back to zero position, Illegal seek"))
         << seams::LogDump();
+    EXPECT_THAT(seams::LogLines().back().text, testing::StartsWith("dropbox_transfer.cpp:"));
 }
 
 TEST_F(DropboxUpload, ThatTheServiceRefusesHasItsCode) {
