@@ -112,6 +112,10 @@ class GDrive : public PublicCloud {
     bool DownloadProcess(XferData* xfer, const Json::Value& meta) override;
 
   private:
+    bool DescribeDownload(const std::string& uri, const std::string& link_attr, Json::Value& meta,
+                          std::string& url);
+    bool DescribeUpload(const std::string& server_path, const std::string& id, Json::Value& meta,
+                        std::string& url);
     bool SendForm(XferData& xfer, const Json::Value& meta, const std::string& url);
     bool SendRest(const XferData& xfer, const std::string& session_uri);
     bool RenewURL(const std::string& path, const std::string& uri, const std::string& link_attr,

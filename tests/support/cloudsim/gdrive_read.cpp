@@ -180,7 +180,7 @@ GDrive::Cursor GDrive::FindAll(const GDriveCall& call) {
 }
 
 std::string GDrive::Remember(Cursor cursor) {
-    const std::string token = "~!!~" + RandomText(40);
+    std::string token = "~!!~" + RandomText(40);
     cursors_.emplace(token, std::move(cursor));
     cursor_order_.push_back(token);
     if (cursor_order_.size() > kKeptCursors) {
