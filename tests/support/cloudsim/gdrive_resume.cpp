@@ -69,7 +69,7 @@ void GDriveResume::Refuse(Reply reply) {
 void GDriveResume::ReadRange(const std::string& text) {
     if (text.empty()) {
         total_ = ParseNumber(request_.Header("Content-Length"));
-        size_ = total_.value_or(0);
+        size_ = total_.value_or(UINT64_MAX);
         return;
     }
     const size_t slash = text.find('/'), dash = text.find('-');
@@ -163,9 +163,9 @@ Reply GDriveResume::Answer() {
     if (asks_ && came_ != 0) {
         return BadRange("A status request has no body.");
     }
-    if (!ranged_ && !asks_ && !session_->total) {
-        session_->total = came_;  // it came without a length
-        size_ = came_;
+    if (!ranged_ && !asks_ && !total_) {
+        size_ = came_;  // it came without a length
+        session_->total = session_->total.value_or(came_);
     }
     if (!asks_ && came_ != size_) {
         return BadRange("The body is not as long as the Content-Range header tells.");

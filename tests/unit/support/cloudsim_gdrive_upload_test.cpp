@@ -1,4 +1,6 @@
 /** Uploads to the simulated Google Drive. */
+#include <thread>
+
 #include "support/cloudsim_gdrive.h"
 
 namespace {
@@ -350,6 +352,30 @@ TEST_F(GDriveResumeTest, KeepsLessOfAPieceThanWasSentWhenTold) {
     EXPECT_EQ(308, last.status);
     EXPECT_EQ("bytes=0-262153", HeaderOf(last, "Range"));
     EXPECT_EQ(201, Piece(bytes, kUnit + 10, 2 * kUnit - 10).status);
+    EXPECT_EQ(bytes, amy.Bytes(amy.Find("/a.bin")));
+}
+
+TEST_F(GDriveResumeTest, ABodyWithoutALengthIsTheWhole) {
+    Open(-1);
+    client.headers = {"Transfer-Encoding: chunked", "Expect:"};
+    const Got got = client.Send("PUT", session, "text");
+    EXPECT_EQ(201, got.status) << got.body;
+    EXPECT_EQ("text", amy.Bytes(amy.Find("/a.bin")));
+}
+
+TEST_F(GDriveResumeTest, OfTwoRequestsAtOnceTheLaterOneCounts) {
+    const std::string bytes = Pattern(3 * kUnit);
+    Open(static_cast<int64_t>(bytes.size()));
+    drive.AddFault(Fault::On("PUT", kUpload).PauseUpload(kUnit, 0.5));
+    Got first;
+    std::thread slow([&] { first = Piece(bytes, 0, 3 * kUnit); });
+    EXPECT_TRUE(drive.Journal().WaitFor([](const auto& entries) { return entries.size() == 2; }));
+    const int64_t arrived = std::max<int64_t>(Arrived(), 0);
+    slow.join();
+    EXPECT_EQ(503, first.status);
+    EXPECT_EQ(arrived, std::max<int64_t>(Arrived(), 0));
+    const auto from = static_cast<uint64_t>(arrived);
+    EXPECT_EQ(201, Piece(bytes, from, bytes.size() - from).status);
     EXPECT_EQ(bytes, amy.Bytes(amy.Find("/a.bin")));
 }
 
