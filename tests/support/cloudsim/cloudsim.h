@@ -15,5 +15,6 @@
 
 #include "support/cloudsim/box.h"
 #include "support/cloudsim/gdrive.h"
+#include "support/cloudsim/onedrive.h"
 
 #endif
