@@ -193,4 +193,8 @@ Reply BoxService::Search(const BoxCall& call) {
     return JsonReply(200, list);
 }
 
+std::map<std::string, std::string> BoxService::Attributes(const Account&, const Item& item) {
+    return {{"id::file", (item.folder ? "folders/" : "files/") + item.id}};
+}
+
 }  // namespace cloudsim

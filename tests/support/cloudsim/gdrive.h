@@ -29,6 +29,8 @@ struct GDriveOptions : ServerOptions {
     int64_t download_life = 8 * 3600;
     /** Seconds that an upload session is kept. */
     int64_t session_life = 7 * 24 * 3600;
+    /** The first page of every list is empty and has a token, as documented to be possible. */
+    bool empty_pages = false;
     /** Reason of a refused upload: today's word, or "quotaExceeded" of older days. */
     std::string quota_reason = "storageQuotaExceeded";
 };
@@ -61,6 +63,9 @@ class GDrive : public Service {
     std::string AccountsHost() const { return Address(drive_options_.accounts_name); }
     std::string ContentHost() const { return Address(drive_options_.content_name); }
     std::string TokenUrl() const { return AccountsHost() + "/o/oauth2/token"; }
+
+    std::map<std::string, std::string> Attributes(const Account& account,
+                                                  const Item& item) override;
 
     // What only this service's items can be. Accounts take several items of one name. Each answers
     // the new item's id; an empty `parent` means that it lies nowhere.

@@ -58,4 +58,8 @@ std::unique_ptr<Sink> Service::NewSink() const {
     return MakeSink(options_.storage, options_.hash_uploads);
 }
 
+std::map<std::string, std::string> Service::Attributes(const Account&, const Item& item) {
+    return {{"id::file", item.id}};
+}
+
 }  // namespace cloudsim

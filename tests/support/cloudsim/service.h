@@ -50,6 +50,9 @@ class Service {
         return journal_;
     }
 
+    /** Attributes that a backend which had mounted the account would serve for an item. */
+    virtual std::map<std::string, std::string> Attributes(const Account& account, const Item& item);
+
     /** The service's clock runs ahead by so much more: tokens expire without waiting. */
     void AdvanceClock(int64_t seconds) { ahead_ += seconds; }
     int64_t Now() const;
