@@ -97,6 +97,29 @@ TEST_F(OneDriveTest, TypesAreToldByNamesOrByTheTest) {
                 ElementsAre("e", "a.JPG"));
 }
 
+TEST_F(OneDriveTest, AlbumsLieInTheTopFolder) {
+    amy.AddFolder(amy.Root(), "folder");
+    const Got made = Send("POST", "me/albums", NameBody("My album"));
+    EXPECT_EQ(201, made.status);
+    EXPECT_EQ("album", made.Json()["type"].asString());
+    EXPECT_EQ(amy.Root(), made.Json()["parent_id"].asString());
+    EXPECT_THAT(NamesOf(Get("me/albums").Json()), ElementsAre("My album"));
+    const std::string id = amy.Find("/My album");
+    EXPECT_EQ(201, Put(id + "/files/a.jpg", "x").status);
+    EXPECT_THAT(NamesOf(Get(id + "/files").Json()), ElementsAre("a.jpg"));
+    EXPECT_EQ("album", Get(id).Json()["type"].asString());
+}
+
+TEST_F(OneDriveTest, NamesMayHoldAnyBytes) {
+    const std::string odd = "\xff\x01\"\\/\xe2\x80\x8f\xf0\x9f\x98\x80";
+    const std::string id = amy.AddFile(amy.Root(), odd, "text");
+    amy.AddFile(amy.Root(), std::string(4096, 'n'), "");
+    amy.AddFile(amy.Root(), "", "");
+    EXPECT_THAT(Get("me/skydrive/files?pretty=false").body, HasSubstr("\\u0001\\\"\\\\/"));
+    client.follow = true;
+    EXPECT_EQ("text", Get(id + "/content").body);
+}
+
 TEST_F(OneDriveTest, ListsAllAtOnceUnlessALimitIsGiven) {
     amy.AddMany(amy.Root(), 1200, 1);
     const Json::Value all = Get("me/skydrive/files?pretty=false").Json();
@@ -287,6 +310,8 @@ TEST_F(MildOneDriveTest, ContentsComeAtOnceWithoutARedirect) {
     EXPECT_EQ("0123456789", Get(id + "/content").body);
     client.headers = {"Range: bytes=2-4"};
     EXPECT_EQ("234", Get(id + "/content").body);
+    client.headers.clear();
+    EXPECT_EQ("10", HeaderOf(client.Head(Api(id + "/content")), "Content-Length"));
 }
 
 TEST_F(MildOneDriveTest, APutOfTooMuchIsRefused) {
@@ -426,6 +451,8 @@ TEST_F(OneDriveTest, TellsUnknownPathsFromUnknownMethods) {
     EXPECT_EQ(404, client.Get(drive.ApiHost() + "/me").status);
     EXPECT_EQ(404, client.Get(drive.ApiHost() + "/v4.0/me").status);
     EXPECT_EQ(404, Get("me/skydrive/nothing").status);
+    EXPECT_EQ(404, Get("me/files").status);
+    EXPECT_EQ(405, Get("me/skydrive/files/a").status);
     EXPECT_EQ(405, Send("PATCH", amy.Root()).status);
     EXPECT_EQ(405, Send("DELETE", "me").status);
     EXPECT_EQ(405, client.Get(drive.TokenUrl()).status);
