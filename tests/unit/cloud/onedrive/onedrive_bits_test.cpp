@@ -152,12 +152,14 @@ TEST_F(OneDriveBits, AFragmentThatTheServiceIsTooBusyForIsRepeatedFromWhereItSay
 }
 
 TEST_F(OneDriveBits, AWrongRangeIsCuredByGoingBackToWhereTheServiceIs) {
-    Give({opened, Has(kFirst), Has(kFirst - kMiB, 416), Has(kTotal - kMiB), ok});
+    Give({opened, Has(kFirst), Has(kFirst - kMiB, 416), Has(kTotal - kMiB), Has(kTotal), ok});
     EXPECT_TRUE(Upload()) << seams::LogDump();
-    EXPECT_THAT(Ranges(),
-                ElementsAre("bytes 0-33554431/41943040", "bytes 33554432-41943039/41943040",
-                            "bytes 32505856-40894463/41943040"));
+    EXPECT_THAT(
+        Ranges(),
+        ElementsAre("bytes 0-33554431/41943040", "bytes 33554432-41943039/41943040",
+                    "bytes 32505856-40894463/41943040", "bytes 40894464-41943039/41943040"));
     EXPECT_TRUE(IsPart(3, kFirst - kMiB, 8 * kMiB));
+    EXPECT_TRUE(IsPart(4, kTotal - kMiB, kMiB));
 }
 
 TEST_F(OneDriveBits, AFragmentThatWasStoredInPartGoesOnThereAndEndsWithTheFile) {
