@@ -1,10 +1,12 @@
 #include "http/api_handler.h"
 
+#include <strings.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <climits>
 #include <cstdlib>
+#include <cstring>
 
 #include "core/json.h"
 #include "core/log.h"
@@ -21,6 +23,15 @@ constexpr char kRawBody[] = "post_raw_param";
 constexpr char kFormBody[] = "post_param";
 
 using UniqueCurlText = std::unique_ptr<char, FreeWith<curl_free>>;
+
+/** "100 Continue" says that a body may be sent. A connection that breaks behind it has brought no
+ * answer, and a status below 400 would make a success of that. */
+bool IsInterim(CURL* curl, long status) {
+    constexpr long kFirstAnswer = 200;
+    const char* scheme = nullptr;
+    return status < kFirstAnswer && curl_easy_getinfo(curl, CURLINFO_SCHEME, &scheme) == CURLE_OK &&
+           scheme != nullptr && strncasecmp(scheme, "http", strlen("http")) == 0;
+}
 
 }  // namespace
 
@@ -167,6 +178,9 @@ bool APIHandler::ParseCurlError(CURLcode code) {
                   LoggableUrl().c_str(), static_cast<int>(info), curl_easy_strerror(info));
         status = 0;
         code = info;
+    }
+    if (code != CURLE_OK && IsInterim(curl_, status)) {
+        status = 0;
     }
     if (code != CURLE_OK) {
         LOG_ERROR("Failed to perform curl, curl code=%d, resp:%d err=%s", static_cast<int>(code),

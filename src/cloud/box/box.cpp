@@ -4,7 +4,6 @@
 #include <ctime>
 #include <limits>
 #include <new>
-#include <string_view>
 
 #include "cloud/box/box_api.h"
 #include "cloud/guard.h"
@@ -22,8 +21,6 @@ using namespace ZYROVFS;
 using namespace box;
 
 namespace {
-
-constexpr std::string_view kName = "name";
 
 Json::Value WithFields(const Json::Value& params, const char* fields) {
     Json::Value query = params;
@@ -105,10 +102,7 @@ bool Box::ListFolder(const std::string& id, const Json::Value& params, Json::Val
 bool Box::ListFolder(const std::string& id, const Json::Value& params, Json::Value& out) {
     unsigned int offset = 0;
     const auto fetch = [&](Json::Value& page) { return ListFolder(id, params, page, &offset); };
-    const auto keep = [](const Json::Value& item) {
-        const Json::Value* name = item.find(kName.data(), kName.data() + kName.size());
-        return name == nullptr || !IsHiddenFilePath("", name->asString());
-    };
+    const auto keep = [](const Json::Value& item) { return IsShown(item, "name"); };
     const auto more = [&](const Json::Value& page) {
         return page.isMember("total_count") && offset < page["total_count"].asUInt();
     };

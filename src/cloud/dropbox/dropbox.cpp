@@ -95,12 +95,16 @@ bool Dropbox::CanFileUpload(unsigned long long size) {
     return FitsLimit(*this, size, kLargestFile);
 }
 
+// The calls about the account take no arguments, and say so by a body of "null".
+
 bool Dropbox::GetAccountInfo(const Json::Value& /*params*/, Json::Value& out) {
-    // The call takes no arguments, and says so by a body of "null".
-    return Request(*this, kFrame)
-        .Post(Api("users/get_current_account"))
-        .RawBody(Json::Value())
-        .Send(out);
+    const std::string url = Api("users/get_current_account");
+    return Request(*this, kFrame).Post(url).RawBody(Json::Value()).Send(out);
+}
+
+bool Dropbox::GetSpaceUsage(Json::Value& out) {
+    const std::string url = Api("users/get_space_usage");
+    return Request(*this, kFrame).Post(url).RawBody(Json::Value()).Send(out);
 }
 
 bool Dropbox::GetFileInfo(const std::string& path, const Json::Value& params, Json::Value& out) {

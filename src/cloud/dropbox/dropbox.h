@@ -29,6 +29,8 @@ class Dropbox : public PublicCloud {
     _tag_cloud_type GetCloudType() override { return CLOUD_TYPE_DROPBOX; }
     /** `params` is not read. */
     bool GetAccountInfo(const Json::Value& params, Json::Value& out) override;
+    /** "used", and "allocated" in "allocation", in bytes. */
+    bool GetSpaceUsage(Json::Value& out);
     /** VFS_ERR_NOT_FOUND for what lies in the trash, too. "" is the root. */
     bool GetFileInfo(const std::string& path, const Json::Value& params, Json::Value& out) override;
     /** All items of a folder, hidden names among them; "" and "/" are the root. */

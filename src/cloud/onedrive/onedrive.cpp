@@ -69,6 +69,10 @@ bool OneDrive::GetAccountInfo(const Json::Value& params, Json::Value& out) {
     return Request(*this, kFrame).Get(Api(kAccount)).Query(params).Send(out);
 }
 
+bool OneDrive::GetQuota(Json::Value& out) {
+    return Request(*this, kFrame).Get(ItemUrl("") + "/quota").Send(out);
+}
+
 bool OneDrive::GetFileInfo(const std::string& id, const Json::Value& /*params*/, Json::Value& out) {
     return Request(*this, kFrame).Get(ItemUrl(id)).Send(out);
 }

@@ -32,6 +32,8 @@ class OneDrive : public PublicCloud {
     bool CanFileUpload(unsigned long long size) override;
     _tag_cloud_type GetCloudType() override { return CLOUD_TYPE_ONEDRIVE; }
     bool GetAccountInfo(const Json::Value& params, Json::Value& out) override;
+    /** "quota" and "available", in bytes. */
+    bool GetQuota(Json::Value& out);
     /** "" is the root. `params` are not sent. */
     bool GetFileInfo(const std::string& id, const Json::Value& params, Json::Value& out) override;
     /** All items of a folder, hidden names too; "" is the root. `params` are not sent. */

@@ -121,10 +121,7 @@ class Fragments {
             return false;
         }
         AttemptPlan plan;
-        plan.send = [&] {
-            position_ = offset_ + length;
-            return drive_.StartUpload(&xfer_, url_, session_, &offset_, length, total_);
-        };
+        plan.send = [this, length] { return SendOnce(length); };
         plan.judge = [this](__tag_vfs_err_ code) {
             // Going back to where the service wants to go on cures a wrong range.
             return JudgeRenewing(drive_, *xfer_.context, code, code == VFS_ERR_RANGE_FAILED);
@@ -147,6 +144,17 @@ class Fragments {
 
   private:
     static constexpr const char* kRefused = "Chunk upload failed and do not retry";
+
+    /** What the service has of a failed attempt it keeps, and a repeat goes that much further: but
+     * not beyond the file. */
+    bool SendOnce(long long length) {
+        const long long size = std::min(length, total_ - offset_);
+        if (size <= 0) {
+            return true;  // an answer was lost, and no bytes
+        }
+        position_ = offset_ + size;
+        return drive_.StartUpload(&xfer_, url_, session_, &offset_, size, total_);
+    }
 
     bool GoBack() {
         if (SeekSource(xfer_.context->fd, offset_,

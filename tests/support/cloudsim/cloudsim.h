@@ -16,5 +16,6 @@
 #include "support/cloudsim/box.h"
 #include "support/cloudsim/dropbox.h"
 #include "support/cloudsim/gdrive.h"
+#include "support/cloudsim/onedrive.h"
 
 #endif

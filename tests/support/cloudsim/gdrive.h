@@ -29,6 +29,8 @@ struct GDriveOptions : ServerOptions {
     int64_t download_life = 8 * 3600;
     /** Seconds that an upload session is kept. */
     int64_t session_life = 7 * 24 * 3600;
+    /** The first page of every list is empty and has a token, as documented to be possible. */
+    bool empty_pages = false;
     /** Reason of a refused upload: today's word, or "quotaExceeded" of older days. */
     std::string quota_reason = "storageQuotaExceeded";
 };

@@ -75,7 +75,7 @@ void GDrive::SetParents(const Account& account, const std::string& id,
     for (const std::string& parent : parents) {
         folders.push_back(&At(account, parent));
         if (!folders.back()->folder || folders.back()->IsInside(node)) {
-            throw std::invalid_argument(parent + " cannot be a parent of " + id);
+            throw std::invalid_argument("cannot be a parent: " + parent);
         }
     }
     tree_.Place(node, folders, node.name);

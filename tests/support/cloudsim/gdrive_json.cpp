@@ -116,8 +116,11 @@ Maker OfShared(const std::function<Json::Value(const Node&)>& make) {
 }
 
 /** A null value is left out. */
-const std::map<std::string, Maker>& Makers() {
-    static const std::map<std::string, Maker> makers = {
+using MakerTable = std::map<std::string, Maker>;
+
+/** What every item has. */
+MakerTable CommonMakers() {
+    return {
         {"kind", Always("drive#file")},
         {"id", ByNode([](const Node& n) { return Json::Value(n.id); })},
         {"etag", ByNode([](const Node& n) {
@@ -125,10 +128,6 @@ const std::map<std::string, Maker>& Makers() {
          })},
         {"selfLink", [](const View& v, const Node& n) { return SelfLink(v, n.id); }},
         {"alternateLink", [](const View& v, const Node& n) { return AlternateLink(v, n); }},
-        {"webContentLink",
-         [](const View& v, const Node& n) {
-             return IfBytes(n, v.content + "/uc?id=" + n.id + "&export=download");
-         }},
         {"iconLink", [](const View& v, const Node&) { return v.content + "/images/icon.png"; }},
         {"title", ByNode([](const Node& n) { return Json::Value(n.name); })},
         {"mimeType", ByNode([](const Node& n) { return Json::Value(MimeType(n)); })},
@@ -145,30 +144,23 @@ const std::map<std::string, Maker>& Makers() {
              return Json::Value(UtcDate({n.modified, 0}));
          })},
         {"markedViewedByMeDate", Always("1970-01-01T00:00:00.000Z")},
+        {"version", ByNode([](const Node& n) { return Json::Value(std::to_string(n.version)); })},
+        {"parents", Parents},
+        {"explicitlyTrashed", ByNode([](const Node& n) {
+             return n.IsTrashed() ? Json::Value(n.trashed) : Json::Value();
+         })},
+        {"appDataContents", Always(false)},
+    };
+}
+
+/** Who may do what with it. */
+MakerTable PeopleMakers() {
+    return {
         {"sharedWithMeDate", OfShared([](const Node& n) {
              return Json::Value(UtcDate({n.shared, 0}));
          })},
-        {"version", ByNode([](const Node& n) { return Json::Value(std::to_string(n.version)); })},
         {"sharingUser", OfShared(Sharer)},
-        {"parents", Parents},
-        {"exportLinks",
-         [](const View& v, const Node& n) {
-             return IsDocument(n) ? ExportLinks(v, n) : Json::Value();
-         }},
-        {"downloadUrl", [](const View& v, const Node& n) { return IfBytes(n, v.download_url(n)); }},
         {"userPermission", Permission},
-        {"originalFilename", ByNode([](const Node& n) { return IfBytes(n, n.name); })},
-        {"fileExtension", ByNode([](const Node& n) { return IfBytes(n, Extension(n)); })},
-        {"fullFileExtension", ByNode([](const Node& n) { return IfBytes(n, Extension(n)); })},
-        {"md5Checksum",
-         [](const View& v, const Node& n) {
-             const std::string sum = HasBytes(n) ? v.md5(n) : "";
-             return sum.empty() ? Json::Value() : Json::Value(sum);
-         }},
-        {"fileSize", ByNode([](const Node& n) { return IfBytes(n, Size(n)); })},
-        {"quotaBytesUsed", ByNode([](const Node& n) {
-             return Json::Value(HasBytes(n) && !n.weightless ? Size(n) : "0");
-         })},
         {"ownerNames",
          [](const View& v, const Node& n) {
              Json::Value names;
@@ -190,12 +182,44 @@ const std::map<std::string, Maker>& Makers() {
         {"copyable", ByNode([](const Node& n) { return Json::Value(!n.folder); })},
         {"writersCanShare", Always(true)},
         {"shared", ByNode([](const Node& n) { return Json::Value(!n.sharer.empty()); })},
-        {"explicitlyTrashed", ByNode([](const Node& n) {
-             return n.IsTrashed() ? Json::Value(n.trashed) : Json::Value();
+    };
+}
+
+/** The bytes and where they are. */
+MakerTable ContentMakers() {
+    return {
+        {"webContentLink",
+         [](const View& v, const Node& n) {
+             return IfBytes(n, v.content + "/uc?id=" + n.id + "&export=download");
+         }},
+        {"exportLinks",
+         [](const View& v, const Node& n) {
+             return IsDocument(n) ? ExportLinks(v, n) : Json::Value();
+         }},
+        {"downloadUrl", [](const View& v, const Node& n) { return IfBytes(n, v.download_url(n)); }},
+        {"originalFilename", ByNode([](const Node& n) { return IfBytes(n, n.name); })},
+        {"fileExtension", ByNode([](const Node& n) { return IfBytes(n, Extension(n)); })},
+        {"fullFileExtension", ByNode([](const Node& n) { return IfBytes(n, Extension(n)); })},
+        {"md5Checksum",
+         [](const View& v, const Node& n) {
+             const std::string sum = HasBytes(n) ? v.md5(n) : "";
+             return sum.empty() ? Json::Value() : Json::Value(sum);
+         }},
+        {"fileSize", ByNode([](const Node& n) { return IfBytes(n, Size(n)); })},
+        {"quotaBytesUsed", ByNode([](const Node& n) {
+             return Json::Value(HasBytes(n) && !n.weightless ? Size(n) : "0");
          })},
-        {"appDataContents", Always(false)},
         {"headRevisionId", ByNode([](const Node& n) { return IfBytes(n, n.version_id); })},
     };
+}
+
+const MakerTable& Makers() {
+    static const MakerTable makers = [] {
+        MakerTable all = CommonMakers();
+        all.merge(PeopleMakers());
+        all.merge(ContentMakers());
+        return all;
+    }();
     return makers;
 }
 
@@ -203,13 +227,22 @@ const std::map<std::string, Maker>& Makers() {
 
 Json::Value File(const View& view, const Node& node, const Mask& mask) {
     Json::Value file = Json::objectValue;
-    for (const auto& [field, make] : Makers()) {
-        if (!mask.Wants(field)) {
-            continue;
-        }
+    const auto put = [&](const std::string& field, const Maker& make) {
         Json::Value value = make(view, node);
         if (!value.isNull()) {
             file[field] = mask.Of(field).Apply(value);
+        }
+    };
+    if (mask.Wants("*")) {
+        for (const auto& [field, make] : Makers()) {
+            put(field, make);
+        }
+        return file;
+    }
+    for (const auto& [field, below] : mask.members) {
+        const auto maker = Makers().find(field);
+        if (maker != Makers().end()) {
+            put(field, maker->second);
         }
     }
     return file;

@@ -169,7 +169,10 @@ class Parser {
 
     QueryPtr Parse() {
         QueryPtr query = Chain();
-        return Next().kind == Token::Kind::kEnd ? std::move(query) : (Fail(), nullptr);
+        if (Next().kind != Token::Kind::kEnd) {
+            Fail();
+        }
+        return query;
     }
 
   private:
@@ -188,9 +191,11 @@ class Parser {
         QueryPtr query = Single();
         while (true) {
             if (TakeIf(Token::Kind::kWord, "and")) {
-                query = std::make_unique<Both>(std::move(query), Single());
+                QueryPtr next = Single();
+                query = std::make_shared<Both>(std::move(query), std::move(next));
             } else if (TakeIf(Token::Kind::kWord, "or")) {
-                query = std::make_unique<Either>(std::move(query), Single());
+                QueryPtr next = Single();
+                query = std::make_shared<Either>(std::move(query), std::move(next));
             } else {
                 return query;
             }
@@ -204,9 +209,9 @@ class Parser {
         }
         if (TakeIf(Token::Kind::kWord, "not")) {
             depth_++;
-            QueryPtr query = std::make_unique<Not>(Single());
+            QueryPtr query = Single();
             depth_--;
-            return query;
+            return std::make_shared<Not>(std::move(query));
         }
         if (!TakeIf(Token::Kind::kSign, "(")) {
             return Next().kind == Token::Kind::kText ? Membership() : Comparison();
@@ -214,7 +219,10 @@ class Parser {
         depth_++;
         QueryPtr query = Chain();
         depth_--;
-        return TakeIf(Token::Kind::kSign, ")") ? std::move(query) : (Fail(), nullptr);
+        if (!TakeIf(Token::Kind::kSign, ")")) {
+            Fail();
+        }
+        return query;
     }
 
     QueryPtr Membership() {
@@ -228,12 +236,12 @@ class Parser {
         }
         const bool me = member == "me" || SameText(member, asker_.email);
         if (collection == "owners" || collection == "writers") {
-            return std::make_unique<Condition>([me, member](const Node& node) {
+            return std::make_shared<Condition>([me, member](const Node& node) {
                 return node.sharer.empty() ? me : SameText(node.sharer, member);
             });
         }
         if (collection == "readers") {
-            return std::make_unique<Condition>(
+            return std::make_shared<Condition>(
                 [me, member](const Node& node) { return me || SameText(node.sharer, member); });
         }
         Fail();
@@ -241,7 +249,7 @@ class Parser {
 
     QueryPtr InParents(const std::string& id) {
         folders_.push_back(id);
-        return std::make_unique<Condition>(
+        return std::make_shared<Condition>(
             [id](const Node& node) {
                 for (const Node* parent : node.Parents()) {
                     if (parent->id == id) {
@@ -271,13 +279,13 @@ class Parser {
     QueryPtr CompareFlag(const Flags& flag) {
         const bool same = TakeIf(Token::Kind::kSign, "=");
         if (!same && !TakeIf(Token::Kind::kSign, "!=")) {
-            return std::make_unique<Condition>(flag);
+            return std::make_shared<Condition>(flag);
         }
         const bool wanted = TakeIf(Token::Kind::kWord, "true");
         if (!wanted && !TakeIf(Token::Kind::kWord, "false")) {
             Fail();
         }
-        return std::make_unique<Condition>(
+        return std::make_shared<Condition>(
             [flag, wanted, same](const Node& node) { return (flag(node) == wanted) == same; });
     }
 
@@ -291,7 +299,7 @@ class Parser {
         }
         // The service finds titles without regard to case, whatever its clients would like.
         const std::string wanted = FoldCase(Text());
-        return std::make_unique<Condition>([value, wanted, same](const Node& node) {
+        return std::make_shared<Condition>([value, wanted, same](const Node& node) {
             return (FoldCase(value(node)) == wanted) == same;
         });
     }
@@ -299,11 +307,11 @@ class Parser {
     static QueryPtr Contains(const std::string& field, const Texts& value,
                              const std::string& wanted) {
         if (field == "mimeType") {
-            return std::make_unique<Condition>([value, wanted](const Node& node) {
+            return std::make_shared<Condition>([value, wanted](const Node& node) {
                 return value(node).find(wanted) != std::string::npos;
             });
         }
-        return std::make_unique<Condition>(
+        return std::make_shared<Condition>(
             [value, wanted](const Node& node) { return HasWordThatBegins(value(node), wanted); });
     }
 
@@ -316,7 +324,7 @@ class Parser {
         if (!moment) {
             Fail();
         }
-        return std::make_unique<Condition>(
+        return std::make_shared<Condition>(
             [value, moment = *moment, fits = comparison->second](const Node& node) {
                 const Moment own = value(node);
                 return fits(own < moment ? -1 : moment < own ? 1 : 0);
@@ -334,9 +342,13 @@ class Parser {
 
 QueryPtr ParseQuery(const std::string& text, const Asker& asker,
                     std::vector<std::string>& folders) {
+    constexpr size_t kMostTokens = 4000;
     std::vector<Token> tokens = Split(text);
+    if (tokens.size() > kMostTokens) {
+        Fail();
+    }
     if (tokens.empty()) {
-        return std::make_unique<Condition>([](const Node&) { return true; });
+        return std::make_shared<Condition>([](const Node&) { return true; });
     }
     return Parser(std::move(tokens), asker, folders).Parse();
 }

@@ -18,7 +18,7 @@ class Query {
     /** Ids that have to be among the parents of whatever fits, and so tell where to look. */
     virtual std::string OnlyIn() const { return ""; }
 };
-using QueryPtr = std::unique_ptr<const Query>;
+using QueryPtr = std::shared_ptr<const Query>;
 
 /** For whom the query is. */
 struct Asker {

@@ -2,6 +2,7 @@
 #include <json/value.h>
 #include <openssl/evp.h>
 
+#include <algorithm>
 #include <vector>
 
 #include "support/cloudsim/gdrive.h"
@@ -37,13 +38,12 @@ std::string Md5Of(const class Content& content) {
 
 uint64_t PageSize(const Request& request) {
     const auto size = ParseNumber(request.Query("maxResults", std::to_string(kUsualPage)));
-    if (!size || *size > kLargestPage) {
-        throw gdrive::Failure{gdrive::Error(400, "invalidParameter",
-                                            "Invalid value '" + request.Query("maxResults") +
-                                                "'. Values must be within the range: [0, 1000]",
-                                            "maxResults")};
+    if (!size) {
+        throw gdrive::Failure{gdrive::Error(
+            400, "invalidParameter",
+            "Invalid integer value: '" + request.Query("maxResults") + "'.", "maxResults")};
     }
-    return *size == 0 ? kUsualPage : *size;
+    return *size == 0 ? kUsualPage : std::min(*size, kLargestPage);
 }
 
 Json::Value MaxUploadSizes(uint64_t size) {
@@ -109,7 +109,8 @@ Reply GDrive::ListFiles(const GDriveCall& call) {
 Reply GDrive::MakePage(const GDriveCall& call) {
     const gdrive::Mask mask =
         gdrive::ParseFields(call.request.Query("fields"), gdrive::kListSchema);
-    const uint64_t size = PageSize(call.request);
+    const bool empty = drive_options_.empty_pages && !call.request.HasQuery("pageToken");
+    const uint64_t size = empty ? 0 : PageSize(call.request);
     Cursor cursor = FindAll(call);
     const gdrive::View view = ViewOf(call.account);
     Json::Value items = Json::arrayValue;
@@ -179,7 +180,7 @@ GDrive::Cursor GDrive::FindAll(const GDriveCall& call) {
 }
 
 std::string GDrive::Remember(Cursor cursor) {
-    const std::string token = "~!!~" + RandomText(40);
+    std::string token = "~!!~" + RandomText(40);
     cursors_.emplace(token, std::move(cursor));
     cursor_order_.push_back(token);
     if (cursor_order_.size() > kKeptCursors) {

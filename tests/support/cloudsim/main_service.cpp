@@ -43,7 +43,23 @@ Running StartGoogle(const ServiceOptions& options) {
     return running;
 }
 
-constexpr ServiceKind kKinds[] = {{"--box", StartBox}, {"--google", StartGoogle}};
+Running StartOneDrive(const ServiceOptions& options) {
+    auto own = Common<OneDriveOptions>(options);
+    if (options.names) {
+        std::tie(own.api_name, own.login_name, own.content_name) = std::tuple_cat(*options.names);
+    }
+    auto drive = std::make_unique<OneDrive>(own);
+    Running running;
+    running.hosts = {{"api", drive->ApiHost()},
+                     {"login", drive->LoginHost()},
+                     {"content", drive->ContentHost()},
+                     {"storage", drive->StorageDomain()}};
+    running.service = std::move(drive);
+    return running;
+}
+
+constexpr ServiceKind kKinds[] = {
+    {"--box", StartBox}, {"--google", StartGoogle}, {"--onedrive", StartOneDrive}};
 
 }  // namespace
 

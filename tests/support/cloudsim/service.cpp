@@ -40,10 +40,14 @@ void Service::AddClient(const std::string& id, const std::string& secret) {
 Account& Service::AddAccount(const std::string& email, const std::string& name) {
     const std::string shown = name.empty() ? email.substr(0, email.find('@')) : name;
     const std::lock_guard<std::mutex> lock(mutex_);
-    const std::string id = std::to_string(270000001 + accounts_.size());
-    accounts_.push_back(std::make_unique<Account>(*this, email, shown, id));
+    accounts_.push_back(
+        std::make_unique<Account>(*this, email, shown, AccountId(accounts_.size())));
     tree_.AddAccount(*accounts_.back());
     return *accounts_.back();
+}
+
+std::string Service::AccountId(size_t index) const {
+    return std::to_string(270000001 + index);
 }
 
 int64_t Service::Now() const {

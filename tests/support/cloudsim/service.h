@@ -72,6 +72,8 @@ class Service {
 
     virtual std::unique_ptr<Handler> Begin(Request& request) = 0;
     virtual std::string Role(const Request& request) const = 0;
+    /** Id of the account that is the `index`th to be added. */
+    virtual std::string AccountId(size_t index) const;
     std::unique_ptr<Sink> NewSink() const;
 
     const ServerOptions options_;

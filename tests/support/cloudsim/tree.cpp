@@ -93,10 +93,11 @@ bool Node::IsTrashed() const {
 
 Node& Tree::AddAccount(const Account& account) {
     auto root = std::make_unique<Node>();
-    root->id = rules_.root_id + (rules_.graph ? account.Id() : "");
     root->name = "All Files";
     root->owner = &account;
     root->folder = true;
+    root->id = rules_.make_id ? rules_.make_id(*root, 0)
+                              : rules_.root_id + (rules_.graph ? account.Id() : "");
     return *(roots_[&account] = std::move(root));
 }
 
@@ -166,11 +167,13 @@ void Tree::Detach(Node& node) {
 
 Node& Tree::Make(Node& parent, const std::string& name, bool folder) {
     auto node = std::make_unique<Node>();
-    node->id = rules_.id_prefix + std::to_string(last_id_ += 17);
     node->name = node->disk_name = name;
     node->owner = parent.owner;
     node->parent = &parent;
     node->folder = folder;
+    last_id_ += 17;
+    node->id = rules_.make_id ? rules_.make_id(*node, last_id_)
+                              : rules_.id_prefix + std::to_string(last_id_);
     node->created = node->modified = node->content_created = node->content_modified = now_();
     Node& made = *node;
     Attach(made);

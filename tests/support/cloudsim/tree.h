@@ -60,6 +60,8 @@ struct TreeRules {
     /** Id of the topmost folder of every account; in a graph the account's own id follows it. */
     std::string root_id;
     std::string id_prefix;
+    /** Where ids tell more: makes an item's id of a number that none else has, a root's of 0. */
+    std::function<std::string(const Node&, uint64_t number)> make_id;
     /**
      * A folder may hold several items of one name, names are taken as they are, an item may lie in
      * several folders or in none, and what is trashed stays where it was.

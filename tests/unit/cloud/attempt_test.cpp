@@ -5,6 +5,7 @@
 #include <sys/mman.h>
 
 #include "core/handle.h"
+#include "support/bare_driver.h"
 #include "support/seams.h"
 #include "unit/cloud/attempt_plans.h"
 
@@ -54,6 +55,22 @@ TEST_F(Attempts, TheErrorIsCopiedBeforeOrBehindTheTestForACancel) {
     never.plan.copy = CopyError::kNever;
     EXPECT_FALSE(never.Go());
     EXPECT_EQ(never.cloud.GetErrorCode(), VFS_ERR_NONE);
+}
+
+class TokenlessDriver : public bare::Driver<PublicCloud> {
+  public:
+    bool SetRefreshTokenParam(APIHandler*) override { return false; }
+};
+
+TEST_F(Attempts, ATokenThatCannotBeRenewedEndsThemAndAnotherFailureIsJudgedAsAlways) {
+    TokenlessDriver drive;
+    XferContext context;
+    context.fd = 0;
+    EXPECT_EQ(JudgeRenewing(drive, context, VFS_ERR_UNAUTHORIZED).kind, NextStep::kEnd);
+    EXPECT_EQ(JudgeRenewing(drive, context, VFS_ERR_FORBIDDEN).kind, NextStep::kGiveUp);
+    EXPECT_EQ(JudgeRenewing(drive, context, VFS_ERR_RANGE_FAILED, true).kind, NextStep::kRetry);
+    context.fd = -1;
+    EXPECT_EQ(JudgeRenewing(drive, context, VFS_ERR_RANGE_FAILED, true).kind, NextStep::kGiveUp);
 }
 
 TEST_F(Attempts, LinesNameTheCallersUnitTheAttemptAndTheLimit) {
