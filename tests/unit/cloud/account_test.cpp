@@ -53,8 +53,7 @@ TEST_F(AskAccountTest, OfAnAddressWhereNobodyListensLeavesTheDriversRecord) {
 }
 
 TEST_F(AskAccountTest, OfAServiceWithoutADriverFailsWithoutARecord) {
-    for (const _tag_cloud_type type : {CLOUD_TYPE_GOOGLE, CLOUD_TYPE_DROPBOX, CLOUD_TYPE_ONEDRIVE,
-                                       CLOUD_TYPE_UNKNOWN, CLOUD_TYPE_HUBIC}) {
+    for (const _tag_cloud_type type : {CLOUD_TYPE_UNKNOWN, CLOUD_TYPE_HUBIC, CLOUD_TYPE_AWSS3}) {
         error = "before";
         EXPECT_FALSE(Ask(type));
         EXPECT_TRUE(error.isNull());

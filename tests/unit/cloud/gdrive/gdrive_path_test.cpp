@@ -291,6 +291,35 @@ TEST_F(GDriveWalk, LooksForTheFirstNameInAllTheDrive) {
                                          "' in parents and (title='a.txt')"));
 }
 
+TEST_F(GDriveWalk, OfTenNamesTakesTenRequests) {
+    const std::string path = "/a/b/c/d/e/f/g/h/i/j.txt";
+    const std::string id = amy.AddPath(path, "x");
+    std::string out;
+    EXPECT_TRUE(drive->GetFileIDByPathFromServer("", path, "", "", out));
+    EXPECT_EQ(out, id);
+    EXPECT_EQ(Requests().size(), 10U);
+}
+
+TEST_F(GDriveWalk, AlongAPathThatNoTreeHoldsAsksNothing) {
+    std::string out;
+    EXPECT_FALSE(drive->GetFileIDByPathFromServer("", "/" + std::string(5000, 'a'), "", "", out));
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_NOT_FOUND);
+    EXPECT_THAT(Requests(), IsEmpty());
+}
+
+TEST_F(GDriveWalk, ByNamesOfAnyKindFindsThem) {
+    for (const std::string& name :
+         {std::string(255, 'n'), std::string("\xf0\x9f\x98\x80 & + % # ?.txt"),
+          std::string("\xe2\x80\x8f.txt"), std::string("\xc4\xb0"), std::string("it's - it"),
+          std::string("%s%n"), std::string("a=b&q=c")}) {
+        const std::string id = amy.AddFile(root, name, "x");
+        std::string out;
+        EXPECT_TRUE(drive->GetFileIDByPathFromServer("", "/" + name, "", "", out))
+            << name << seams::LogDump();
+        EXPECT_EQ(out, id) << name;
+    }
+}
+
 TEST_F(GDriveWalk, ToAnEmptyPathIsTheRootWithoutARequest) {
     std::string out;
     EXPECT_TRUE(drive->GetFileIDByPathFromServer("", "", kFolders, "x", out));
