@@ -24,6 +24,20 @@ ZYROVFS_API Cloud* CreateCloudByServerID(unsigned int uid, const std::string& se
 ZYROVFS_API Cloud* CreateCloudByURI(unsigned int uid, const std::string& uri,
                                     ZYROVFS::Server::VFS_CONFIG_MODE mode);
 
+// --- accounts -----------------------------------------------------------------------------------
+
+/** What a service tells of an account; -1 for sizes that it does not tell. */
+struct AccountSummary {
+    std::string name;
+    std::string email;
+    long long used = -1;   ///< bytes
+    long long total = -1;  ///< bytes
+};
+
+/** Asks the service of a driver for its account. False leaves the cause in the driver's record:
+ * VFS_ERR_NOT_SUPPORTED for a driver of servers, which have no accounts in this sense. */
+ZYROVFS_API bool GetAccountSummary(Cloud* cloud, AccountSummary& out);
+
 // --- text ---------------------------------------------------------------------------------------
 
 /** By the text in front of "://"; text without it is CLOUD_TYPE_UNKNOWN. */

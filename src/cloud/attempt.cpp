@@ -29,7 +29,8 @@ class Attempts {
                 return false;
             }
         }
-        Copy(plan_.copy != CopyError::kNever);
+        // Copied before, it stays: requests between the attempts have made a record of their own.
+        Copy(plan_.copy == CopyError::kAtEnd);
         Log(plan_.exhausted);
         return false;
     }
@@ -86,6 +87,15 @@ bool RunAttempts(Cloud& cloud, const AttemptPlan& plan, SourceLine at) {
 
 NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured) {
     return NextStep::RetryIf(context.fd != -1 && (cured || cloud.IsNeedRetry()));
+}
+
+NextStep JudgeRenewing(PublicCloud& cloud, const XferContext& context, __tag_vfs_err_ code,
+                       bool cured) {
+    const bool refused = code == VFS_ERR_UNAUTHORIZED;
+    if (refused && !cloud.RefreshToken(true)) {
+        return NextStep::End();
+    }
+    return JudgeUpload(cloud, context, cured || refused);
 }
 
 NextStep JudgeDownload(Cloud& cloud, const XferContext& context) {

@@ -13,8 +13,8 @@
 #include <functional>
 #include <string>
 
+#include "cloud/public_cloud.h"
 #include "core/source_line.h"
-#include "zyrovfs/cloud.h"
 
 namespace ZYROCloud {
 
@@ -81,6 +81,14 @@ bool RunAttempts(Cloud& cloud, const AttemptPlan& plan,
 /** An upload is repeated when its source can be read again and the failure may pass; `cured` is
  * for failures that the service's plan has cured by itself. */
 NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured = false);
+
+/**
+ * The same for an upload with a token that may have run out on the way. One that the service
+ * refuses is renewed, which is worth an attempt; a stream has none left, but the next transfer
+ * finds the new token. `code` is the failure's.
+ */
+NextStep JudgeRenewing(PublicCloud& cloud, const XferContext& context, __tag_vfs_err_ code,
+                       bool cured = false);
 
 /** A download is repeated from its start, so only before the first byte was written. */
 NextStep JudgeDownload(Cloud& cloud, const XferContext& context);

@@ -2,6 +2,8 @@
 #include <new>
 
 #include "cloud/box/box.h"
+#include "cloud/dropbox/dropbox.h"
+#include "cloud/onedrive/onedrive.h"
 #include "cloud/vfs/vfs_cloud.h"
 #include "core/log.h"
 #include "zyrovfs/cloud_utils.h"
@@ -36,10 +38,10 @@ constexpr struct {
     _tag_cloud_type type;
     Make make;
 } kDrivers[] = {
-    {CLOUD_TYPE_VFS, New<VFSCloud>}, {CLOUD_TYPE_GOOGLE, NoDriver},
-    {CLOUD_TYPE_DROPBOX, NoDriver},  {CLOUD_TYPE_ONEDRIVE, NoDriver},
-    {CLOUD_TYPE_BOX, New<Box>},      {CLOUD_TYPE_ONEDRIVE_SHORT, Nothing},
-    {CLOUD_TYPE_HUBIC, Nothing},     {CLOUD_TYPE_AWSS3, Nothing},
+    {CLOUD_TYPE_VFS, New<VFSCloud>},    {CLOUD_TYPE_GOOGLE, NoDriver},
+    {CLOUD_TYPE_DROPBOX, New<Dropbox>}, {CLOUD_TYPE_ONEDRIVE, New<OneDrive>},
+    {CLOUD_TYPE_BOX, New<Box>},         {CLOUD_TYPE_ONEDRIVE_SHORT, Nothing},
+    {CLOUD_TYPE_HUBIC, Nothing},        {CLOUD_TYPE_AWSS3, Nothing},
 };
 
 }  // namespace

@@ -7,11 +7,6 @@
 #include "core/log.h"
 
 namespace ZYROCloud::fuse_attr {
-namespace {
-
-constexpr size_t kMostIdBytes = 128;
-
-}  // namespace
 
 bool Read(const std::string& full_path, const char* name, size_t most, std::string& out) {
     std::string buffer(most, '\0');
@@ -23,15 +18,20 @@ bool Read(const std::string& full_path, const char* name, size_t most, std::stri
     return true;
 }
 
+bool FindFullPath(Cloud& cloud, const std::string& server_path, std::string& full_path,
+                  ZYROVFS::SourceLine at) {
+    if (cloud.GetFullPathByServerPath(server_path, full_path)) {
+        return true;
+    }
+    LOG_ERROR_AT(at, "Failed to get full path by [%s]", server_path.c_str());
+    return false;
+}
+
 std::string ReadFileId(Cloud& cloud, const std::string& server_path, bool log_missing,
                        ZYROVFS::SourceLine at) {
     std::string full_path;
     std::string id;
-    if (server_path.empty()) {
-        return "";
-    }
-    if (!cloud.GetFullPathByServerPath(server_path, full_path)) {
-        LOG_ERROR_AT(at, "Failed to get full path by [%s]", server_path.c_str());
+    if (server_path.empty() || !FindFullPath(cloud, server_path, full_path, at)) {
         return "";
     }
     if (!Read(full_path, kFileId, kMostIdBytes, id) && log_missing) {

@@ -28,6 +28,13 @@ inline bool ReadDescription(const std::string& full_path, size_t most, std::stri
     return Read(full_path, kDescription, most, out);
 }
 
+/** The longest id of an item. */
+constexpr size_t kMostIdBytes = 128;
+
+/** Full path of a server path. A failure is logged. */
+bool FindFullPath(Cloud& cloud, const std::string& server_path, std::string& full_path,
+                  ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
+
 /**
  * Id of the item at a server path, from the mounted tree; "" for an empty path and when there is
  * none. `log_missing` says whether a failed read of the attribute gets a log line, too.

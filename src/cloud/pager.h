@@ -64,6 +64,12 @@ bool ForEachPage(const char* member, Json::Value& out, Fetch fetch, Keep keep, M
     return true;
 }
 
+/** Whether the file tree shows an item with its name in `member`; one without a name it does. */
+inline bool IsShown(const Json::Value& item, const std::string& member) {
+    const Json::Value* name = item.find(member.data(), member.data() + member.size());
+    return name == nullptr || !Cloud::IsHiddenFilePath("", name->asString());
+}
+
 /** The places where pages of one listing began. */
 class CursorGuard {
   public:

@@ -73,4 +73,17 @@ bool SendUpload(Cloud& cloud, const XferData& xfer) {
     return sent;
 }
 
+AttemptPlan WholeUploadPlan(Cloud& cloud, const XferData& xfer, const std::string& what) {
+    AttemptPlan plan;
+    plan.send = [&cloud, &xfer] { return SendUpload(cloud, xfer); };
+    plan.judge = [&cloud, &xfer](__tag_vfs_err_) { return JudgeUpload(cloud, *xfer.context); };
+    plan.rewind = [&xfer] {
+        return SeekSource(xfer.context->fd, 0, "Failed to seek file to back to zero position, %m");
+    };
+    plan.retry = "Retry directly upload";
+    plan.exhausted = kNoAttemptLeft;
+    plan.what = &what;
+    return plan;
+}
+
 }  // namespace ZYROCloud

@@ -8,6 +8,7 @@
 #ifndef ZYROVFS_CLOUD_UPLOAD_BODY_H
 #define ZYROVFS_CLOUD_UPLOAD_BODY_H
 
+#include "cloud/attempt.h"
 #include "http/api_handler.h"
 #include "zyrovfs/cloud.h"
 
@@ -40,6 +41,13 @@ class UploadBody {
 /** One attempt of an upload that a driver has described on its handler, as a plain body or as a
  * form: the bytes of `xfer` from its position on. */
 bool SendUpload(Cloud& cloud, const XferData& xfer);
+
+/**
+ * The plan of an upload that is one request, and begins again at the source's first byte. What a
+ * service does about refusals, and its `refused` line, are the driver's to add. `xfer` and `what`,
+ * the log's name for the upload, must outlive the loop.
+ */
+AttemptPlan WholeUploadPlan(Cloud& cloud, const XferData& xfer, const std::string& what);
 
 }  // namespace ZYROCloud
 

@@ -35,15 +35,17 @@ const Json::CharReaderBuilder& ReaderRules() {
     return rules;
 }
 
+Json::StreamWriterBuilder OneLine(bool utf8) {
+    Json::StreamWriterBuilder builder;
+    builder["indentation"] = "";
+    builder["emitUTF8"] = utf8;
+    builder["commentStyle"] = "None";
+    return builder;
+}
+
 const Json::StreamWriterBuilder& WriterRules() {
-    static const Json::StreamWriterBuilder rules = [] {
-        Json::StreamWriterBuilder builder;
-        builder["indentation"] = "";
-        // Escaping would replace what is not valid UTF-8; names and passwords keep their bytes.
-        builder["emitUTF8"] = true;
-        builder["commentStyle"] = "None";
-        return builder;
-    }();
+    // Escaping would replace what is not valid UTF-8; names and passwords keep their bytes.
+    static const Json::StreamWriterBuilder rules = OneLine(true);
     return rules;
 }
 
@@ -138,6 +140,17 @@ bool fromString(Json::Value& value, const std::string& text) {
 
 std::string toString(const Json::Value& value) {
     return Json::writeString(WriterRules(), value);
+}
+
+std::string toAscii(const Json::Value& value) {
+    constexpr char kDelete = 0x7f;
+    static const Json::StreamWriterBuilder rules = OneLine(false);
+    std::string text = Json::writeString(rules, value);
+    // The writer counts it as printable.
+    for (size_t at = 0; (at = text.find(kDelete, at)) != std::string::npos;) {
+        text.replace(at, 1, "\\u007f");
+    }
+    return text;
 }
 
 bool toInt64(const Json::Value& value, int64_t& number) {

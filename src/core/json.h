@@ -36,6 +36,9 @@ bool fromString(Json::Value& value, const std::string& text);
  */
 std::string toString(const Json::Value& value);
 
+/** The same in printable ASCII alone, as headers need it; what is no valid UTF-8 is replaced. */
+std::string toAscii(const Json::Value& value);
+
 /** A number, or decimal text of one (services give sizes and times in either form). */
 bool toInt64(const Json::Value& value, int64_t& number);
 bool toUInt64(const Json::Value& value, uint64_t& number);

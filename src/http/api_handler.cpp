@@ -1,10 +1,12 @@
 #include "http/api_handler.h"
 
+#include <strings.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <climits>
 #include <cstdlib>
+#include <cstring>
 
 #include "core/json.h"
 #include "core/log.h"
@@ -21,6 +23,15 @@ constexpr char kRawBody[] = "post_raw_param";
 constexpr char kFormBody[] = "post_param";
 
 using UniqueCurlText = std::unique_ptr<char, FreeWith<curl_free>>;
+
+/** "100 Continue" says that a body may be sent. A connection that breaks behind it has brought no
+ * answer, and a status below 400 would make a success of that. */
+bool IsInterim(CURL* curl, long status) {
+    constexpr long kFirstAnswer = 200;
+    const char* scheme = nullptr;
+    return status < kFirstAnswer && curl_easy_getinfo(curl, CURLINFO_SCHEME, &scheme) == CURLE_OK &&
+           scheme != nullptr && strncasecmp(scheme, "http", strlen("http")) == 0;
+}
 
 }  // namespace
 
@@ -82,6 +93,10 @@ bool APIHandler::AddGetParam(const Json::Value& params) {
 }
 
 bool APIHandler::AddPostRawParam(const Json::Value& params) {
+    if (params.isNull()) {
+        request_[kRawBody] = params;
+        return true;
+    }
     return SetMember(kRawBody, params);
 }
 
@@ -164,6 +179,9 @@ bool APIHandler::ParseCurlError(CURLcode code) {
         status = 0;
         code = info;
     }
+    if (code != CURLE_OK && IsInterim(curl_, status)) {
+        status = 0;
+    }
     if (code != CURLE_OK) {
         LOG_ERROR("Failed to perform curl, curl code=%d, resp:%d err=%s", static_cast<int>(code),
                   static_cast<int>(status), curl_easy_strerror(code));
@@ -202,7 +220,7 @@ bool APIHandler::BuildHeaderParam(curl_slist** list) {
     for (const std::string& name : headers.getMemberNames()) {
         const Json::Value& value = headers[name];
         const std::string line =
-            name + ": " + (value.isObject() ? json::toString(value) : value.asString());
+            name + ": " + (value.isObject() ? json::toAscii(value) : value.asString());
         if (line.find_first_of("\r\n") != std::string::npos) {
             return false;  // would end the header and begin another one
         }

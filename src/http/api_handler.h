@@ -60,7 +60,8 @@ class APIHandler {
     /** All of a kind at once, in place of what was there. False when it is not an object. */
     bool AddHeader(const Json::Value& headers);
     bool AddGetParam(const Json::Value& params);
-    /** The body as JSON text. */
+    /** The body as JSON text. It may also be null: services want the text "null" from calls without
+     * arguments. */
     bool AddPostRawParam(const Json::Value& params);
     /** The body as a form; wins over AddPostRawParam. */
     bool AddPostParam(const Json::Value& params);

@@ -267,7 +267,8 @@ std::string Key(const std::string& path, const std::string& key) {
 TEST_F(HostLayer, TheCatalogueHasTheNetworkProtocolsAndNoNamelessEntry) {
     ASSERT_EQ(Install().status, 0);
     std::string listed;
-    for (const std::string name : {"box", "dav", "davs", "ftp", "nfs", "sftp", "sharing", "smb"}) {
+    for (const std::string name : {"box", "dav", "davs", "dropbox", "ftp", "google", "nfs",
+                                   "onedrive", "sftp", "sharing", "smb"}) {
         const std::string path = kMounts + name + ".mount";
         listed += path + "\n";
         EXPECT_EQ(Key(path, "Protocol"), name);

@@ -174,7 +174,7 @@ TEST_F(Tool, AUserCanBeNamed) {
 
 TEST_F(Tool, ProtocolListShowsTheCatalogue) {
     const Json::Value list = AsJson("protocol list");
-    ASSERT_EQ(list.size(), 8u);
+    ASSERT_EQ(list.size(), 11u);
     EXPECT_FALSE(list[0].isMember("has_server"));
     EXPECT_THAT(Zyrovfs("protocol list").output,
                 AllOf(HasSubstr("PROTOCOL  NAME"), HasSubstr("sftp      SFTP")));

@@ -45,6 +45,11 @@ class Client {
     CURL* Handle() { return curl_; }
 
     Got Get(const std::string& url) { return Send("GET", url, nullptr); }
+    Got Head(const std::string& url) {
+        Prepare("HEAD", url);
+        curl_easy_setopt(curl_, CURLOPT_NOBODY, 1L);
+        return Perform(Got());
+    }
     Got Send(const std::string& method, const std::string& url, const std::string* body) {
         Got got;
         Prepare(method, url);

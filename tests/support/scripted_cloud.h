@@ -41,10 +41,16 @@ class ScriptedCloud : public bare::Driver<ZYROCloud::Cloud> {
 
     /** The handler's own request: its record changes, the driver's does not. */
     bool Process() {
-        errors_->now = script_.empty() ? Outcome{} : script_.front();
+        const Outcome next = script_.empty() ? Outcome{} : script_.front();
         if (!script_.empty()) {
             script_.pop_front();
         }
+        return Meet(next);
+    }
+
+    /** The same with an outcome that the script does not have. */
+    bool Meet(const Outcome& outcome) {
+        errors_->now = outcome;
         Json::Value record;
         record["curl_code"] = 22;
         record["response_code"] = 500;

@@ -11,6 +11,7 @@
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
+#include <cstring>
 
 namespace wire {
 namespace {
@@ -91,6 +92,19 @@ std::string HeaderOf(const std::string& head, const std::string& name) {
     return "";
 }
 
+bool TakeChunked(int fd, std::string& buffer, std::string& taken) {
+    size_t size = 0;
+    do {
+        std::string line;
+        if (!TakeUntil(fd, buffer, "\r\n", line)) {
+            return false;
+        }
+        size = strtoul(line.c_str(), nullptr, 16);
+        taken += line;
+    } while (Take(fd, buffer, size + strlen("\r\n"), taken) && size > 0);
+    return size == 0;
+}
+
 bool TakeRequest(int fd, std::string& buffer, std::string& taken) {
     if (!TakeUntil(fd, buffer, "\r\n\r\n", taken)) {
         return false;
@@ -100,7 +114,7 @@ bool TakeRequest(int fd, std::string& buffer, std::string& taken) {
         return false;
     }
     if (HeaderOf(head, "Transfer-Encoding") == "chunked") {
-        return TakeUntil(fd, buffer, "\r\n0\r\n\r\n", taken);
+        return TakeChunked(fd, buffer, taken);
     }
     return Take(fd, buffer, strtoul(HeaderOf(head, "Content-Length").c_str(), nullptr, 10), taken);
 }

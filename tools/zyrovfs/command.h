@@ -49,6 +49,7 @@ void AddConnectionCommands(CLI::App& app, Session& session);
 void AddPathCommand(CLI::App& app, Session& session);
 void AddUserCommands(CLI::App& app, Session& session);
 void AddTransferCommands(CLI::App& app, Session& session);
+void AddAccountCommand(CLI::App& app, Session& session);
 void AddCloudCommands(CLI::App& app, Session& session);
 void AddTaskCommands(CLI::App& app, Session& session);
 void AddPolicyCommands(CLI::App& app, Session& session);

@@ -92,6 +92,7 @@ int Set(const EntryKind& kind, unsigned int uid, const EntryOptions& options, bo
     if (!ReadChanges(options.profile, changes, problem)) {
         return ReportProblem(problem, json);
     }
+    TurnLifeIntoEnd(changes);
     std::string id = options.id;
     if (!Server::Set(uid, kind.mode, id, changes, options.accept)) {
         return ReportFailure(std::string(kind.word) + " set " + options.id, json);

@@ -18,6 +18,7 @@ int Main(int argc, char** argv) {
     AddConnectionCommands(app, session);
     AddPathCommand(app, session);
     AddTransferCommands(app, session);
+    AddAccountCommand(app, session);
     AddCloudCommands(app, session);
     AddUserCommands(app, session);
     AddTaskCommands(app, session);

@@ -4,7 +4,9 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdlib>
 #include <cstring>
+#include <ctime>
 #include <memory>
 
 #include "file.h"
@@ -171,6 +173,17 @@ bool ReadProfile(const ProfileOptions& options, Json::Value& profile, std::strin
     }
     FillIn(profile);
     return true;
+}
+
+void TurnLifeIntoEnd(Json::Value& changes) {
+    const Json::Value life = changes["expires_in"];
+    changes.removeMember("expires_in");
+    if (life.isString()) {
+        changes["expire_time"] =
+            std::to_string(time(nullptr) + std::strtoll(life.asCString(), nullptr, 10));
+    } else if (!life.isNull()) {
+        changes["expires_in"] = life;  // for the library to refuse
+    }
 }
 
 void DropCredentials(Json::Value& profile) {

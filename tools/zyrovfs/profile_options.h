@@ -46,6 +46,10 @@ bool ReadChanges(const ProfileOptions& options, Json::Value& changes, std::strin
  */
 bool ReadProfile(const ProfileOptions& options, Json::Value& profile, std::string& problem);
 
+/** "expires_in" as "expire_time": in a stored profile most services believe its old end before the
+ * life of a new token. */
+void TurnLifeIntoEnd(Json::Value& changes);
+
 /** Takes passwords and tokens out of a profile that is to be shown. */
 void DropCredentials(Json::Value& profile);
 

@@ -74,6 +74,19 @@ void PrintCode(const std::string& what, __tag_vfs_err_ code) {
               << "\n";
 }
 
+/** What the owner of an account can do, where the account is what stands in the way. */
+void PrintAdvice(__tag_vfs_err_ code) {
+    if (code == VFS_ERR_TOKEN_REVOKED) {
+        std::cerr << "The service has taken back what it granted: the owner withdrew it, changed "
+                     "the password, or did not use it for long. Sign in at the service again and "
+                     "save the new tokens with `zyrovfs profile set ID --access-token-file FILE "
+                     "--refresh-token-file FILE --expires-in SECONDS`.\n";
+    } else if (code == VFS_ERR_UNAUTHORIZED) {
+        std::cerr << "The account no longer lets this connection in. Give it new tokens or a new "
+                     "password with `zyrovfs profile set`.\n";
+    }
+}
+
 }  // namespace
 
 void PrintJson(const Json::Value& value) {
@@ -111,10 +124,7 @@ int ReportCode(const std::string& what, __tag_vfs_err_ code, int status, bool js
         return status;
     }
     PrintCode(what, code);
-    if (code == VFS_ERR_UNAUTHORIZED || code == VFS_ERR_TOKEN_REVOKED) {
-        std::cerr << "The account no longer lets this connection in. Give it new tokens or a new "
-                     "password with `zyrovfs profile set`.\n";
-    }
+    PrintAdvice(code);
     return status;
 }
 

@@ -4,14 +4,13 @@
 #include <ctime>
 #include <limits>
 #include <new>
-#include <string_view>
 
 #include "cloud/box/box_api.h"
 #include "cloud/guard.h"
 #include "cloud/pager.h"
 #include "cloud/request.h"
 #include "cloud/secret.h"
-#include "core/error_cell.h"
+#include "cloud/size_limit.h"
 #include "core/log.h"
 #include "http/api_handler.h"
 #include "http/error_handler.h"
@@ -22,8 +21,6 @@ using namespace ZYROVFS;
 using namespace box;
 
 namespace {
-
-constexpr std::string_view kName = "name";
 
 Json::Value WithFields(const Json::Value& params, const char* fields) {
     Json::Value query = params;
@@ -105,10 +102,7 @@ bool Box::ListFolder(const std::string& id, const Json::Value& params, Json::Val
 bool Box::ListFolder(const std::string& id, const Json::Value& params, Json::Value& out) {
     unsigned int offset = 0;
     const auto fetch = [&](Json::Value& page) { return ListFolder(id, params, page, &offset); };
-    const auto keep = [](const Json::Value& item) {
-        const Json::Value* name = item.find(kName.data(), kName.data() + kName.size());
-        return name == nullptr || !IsHiddenFilePath("", name->asString());
-    };
+    const auto keep = [](const Json::Value& item) { return IsShown(item, "name"); };
     const auto more = [&](const Json::Value& page) {
         return page.isMember("total_count") && offset < page["total_count"].asUInt();
     };
@@ -147,12 +141,8 @@ bool Box::CanFileUpload(unsigned long long size) {
     if (size == kSizeNotKnown) {
         return true;
     }
-    if (size > kLargestFile) {
-        SetPlatformErr(0xa400);
-        SetError(VFS_ERR_FILE_TOO_LARGE, "");
-        return false;
-    }
-    return size <= kAskedFrom || PreflightCheck("", std::to_string(time(nullptr)), "0", "", size);
+    return FitsLimit(*this, size, kLargestFile) &&
+           (size <= kAskedFrom || PreflightCheck("", std::to_string(time(nullptr)), "0", "", size));
 }
 
 }  // namespace ZYROCloud

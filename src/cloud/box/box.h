@@ -107,7 +107,6 @@ class Box : public PublicCloud {
     bool DescribeUpload(const std::string& server_path, Json::Value& meta);
     bool ClearTheWay(const std::string& path);
     bool SendForm(XferData* xfer, const Json::Value& meta);
-    bool ReceiveContent(XferData* xfer, const Json::Value& meta, const std::string& url);
 };
 
 }  // namespace ZYROCloud

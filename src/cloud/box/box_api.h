@@ -20,7 +20,6 @@ inline constexpr unsigned int kPageSize = 1000;
 inline constexpr unsigned long long kLargestFile = 5368709120ULL;  // 5 GiB
 /** Beyond this an account's own limit may be lower than that of the service: it is asked. */
 inline constexpr unsigned long long kAskedFrom = 262144000ULL;  // 250 MiB
-inline constexpr unsigned long long kSizeNotKnown = ~0ULL;
 
 /** Item ids carry their kind, as "files/12" or "folders/34", and are part of the address. */
 inline constexpr const char* kFiles = "files/";

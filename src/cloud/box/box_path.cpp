@@ -6,7 +6,7 @@
 #include "cloud/box/box_api.h"
 #include "cloud/fuse_attr.h"
 #include "cloud/guard.h"
-#include "cloud/path_walk.h"
+#include "cloud/target.h"
 #include "zyrovfs/cloud_utils.h"
 
 namespace ZYROCloud {
@@ -107,13 +107,10 @@ bool Box::GetFileIDByPathFromServer(const std::string& /*root*/, const std::stri
         out = kRoot;
         return true;
     }
-    std::string id;
-    if (!GetFileIDByPathFromServerRecursive("", path, kind, hint, id) || id.empty()) {
-        SetError(VFS_ERR_NOT_FOUND, "");
-        return false;
-    }
-    out = id;
-    return true;
+    const auto walk = [&](std::string& id) {
+        return GetFileIDByPathFromServerRecursive("", path, kind, hint, id);
+    };
+    return FindOnServer(*this, walk, out);
 }
 
 bool Box::GetFileInfoByPathFromServer(const std::string& root, const std::string& path,

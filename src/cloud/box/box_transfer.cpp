@@ -3,6 +3,7 @@
 #include "cloud/box/box_api.h"
 #include "cloud/fuse_attr.h"
 #include "cloud/guard.h"
+#include "cloud/item_download.h"
 #include "cloud/request.h"
 #include "cloud/upload_body.h"
 #include "core/handle.h"
@@ -121,35 +122,7 @@ bool Box::SendForm(XferData* xfer, const Json::Value& meta) {
 }
 
 bool Box::DownloadProcess(XferData* xfer, const Json::Value& meta) {
-    return Guard(*this, [&] {
-        const std::string url = meta.get("url", "").asString();
-        if (url.empty()) {
-            SetError(VFS_ERR_CLOUD_FAILED, "");
-            LOG_ERROR("Downlaod URL is empty");
-            return false;
-        }
-        if (xfer == nullptr || xfer->context == nullptr) {
-            SetError(VFS_ERR_CLOUD_FAILED, "");
-            return false;
-        }
-        return ReceiveContent(xfer, meta, url);
-    });
-}
-
-bool Box::ReceiveContent(XferData* xfer, const Json::Value& meta, const std::string& url) {
-    Request request(*this, kFrame);
-    // The handler stays set to fail on errors: later refusals on this driver have no body.
-    if (!request.Get(url).FailOnError().Prepare(xfer)) {
-        return false;
-    }
-    if (!SetRange(*this, meta)) {
-        SetError(VFS_ERR_CLOUD_FAILED, "");
-        return false;
-    }
-    AttemptPlan plan = DownloadPlan(*this, *xfer, url);
-    plan.send = [&] { return api->SetURL(url, true) && DoAPIRequest(0); };
-    plan.copy = CopyError::kAfterCancelTest;
-    return RunAttempts(*this, plan);
+    return DownloadByUrl(*this, xfer, meta, {kFrame, true});
 }
 
 }  // namespace ZYROCloud

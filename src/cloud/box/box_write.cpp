@@ -1,9 +1,8 @@
 #include "cloud/box/box.h"
 #include "cloud/box/box_api.h"
-#include "cloud/conflict.h"
 #include "cloud/guard.h"
-#include "cloud/path_walk.h"
 #include "cloud/request.h"
+#include "cloud/target.h"
 
 namespace ZYROCloud {
 
@@ -57,33 +56,20 @@ bool Box::Copy(const std::string& from, const std::string& to) {
 }
 
 bool Box::DoCopy(const std::string& from, const std::string& to, bool overwrite) {
-    const std::string id = GetFileIDByPath(from);
-    std::string parent;
-    std::string name;
-    if (!CutAtLastSlash(to, parent, name)) {
-        SetError(VFS_ERR_NOT_FOUND, "");
-        LOG_ERROR("Failed to find / from [%s]", to.c_str());
-        return false;
-    }
-    const std::string parent_id = GetFileIDByPath(parent);
-    if (id.empty() || parent_id.empty()) {
-        SetError(VFS_ERR_NOT_FOUND, "");
+    std::string id;
+    std::string parent_id;
+    if (!FindCopyIds(*this, from, to, id, parent_id)) {
         return false;
     }
     const auto find = [&](Json::Value& item) {
         return GetFileInfoByPathFromServer("", to, Json::Value(Json::objectValue), "", item);
     };
-    const auto replace = [&] {
-        return ReplaceFile(
-            *this, find, [this](const Json::Value& item) { return IsDir(item); },
-            [this](const Json::Value& item) { return Delete(GetFileID(item)); },
-            [&] { return DoCopy(from, to, false); });
-    };
+    const auto again = [&] { return DoCopy(from, to, false); };
     // Without a name in the body the copy has its source's name, whatever `to` ends in.
     Request request(*this, kFrame);
     request.Post(Api(id + "/copy")).Body(Into(parent_id));
     if (overwrite) {
-        request.Unless(VFS_ERR_CONFLICT, replace);
+        request.Unless(VFS_ERR_CONFLICT, [&] { return ReplaceItem(*this, id, find, again); });
     }
     return request.Send();
 }

@@ -110,6 +110,17 @@ class GDrive : public PublicCloud {
     bool StartUpload(const std::string& session_uri, XferData* xfer, unsigned long long start,
                      unsigned long long total);
     bool DownloadProcess(XferData* xfer, const Json::Value& meta) override;
+
+  private:
+    bool DescribeDownload(const std::string& uri, const std::string& link_attr, Json::Value& meta,
+                          std::string& url);
+    bool DescribeUpload(const std::string& server_path, const std::string& id, Json::Value& meta,
+                        std::string& url);
+    bool SendForm(XferData& xfer, const Json::Value& meta, const std::string& url);
+    bool SendRest(const XferData& xfer, const std::string& session_uri);
+    bool RenewURL(const std::string& path, const std::string& uri, const std::string& link_attr,
+                  std::string& url);
+    bool GiveLink(XferData* xfer, std::string text);
 };
 
 }  // namespace ZYROCloud

@@ -2,6 +2,8 @@
 #ifndef ZYROVFS_CLOUD_GDRIVE_API_H
 #define ZYROVFS_CLOUD_GDRIVE_API_H
 
+#include <json/value.h>
+
 #include <string>
 
 #include "cloud/request.h"
@@ -22,6 +24,10 @@ inline constexpr unsigned long long kLargestDirect = 33554432ULL;  // 32 MiB
 /** In place of a URL, for a document that has no bytes. */
 inline constexpr const char* kLinkScheme = "alternateLink://";
 
+inline std::string About() {
+    return GoogleApiHost() + "/drive/v2/about";
+}
+
 /** Address of the collection of all items, or, with "/" and more, of an item or an action. */
 inline std::string Files(const std::string& what = "") {
     return GoogleApiHost() + "/drive/v2/files" + what;
@@ -29,6 +35,15 @@ inline std::string Files(const std::string& what = "") {
 
 inline std::string Upload(const std::string& what = "") {
     return GoogleApiHost() + "/upload/drive/v2/files" + what;
+}
+
+/** `params` as they are; Json::LogicError when they are no object. A null would ask for nothing,
+ * where the caller is to say that it wants nothing. */
+inline const Json::Value& NeedObject(const Json::Value& params) {
+    if (!params.isObject()) {
+        Json::throwLogicError("the parameters are no object");
+    }
+    return params;
 }
 
 }  // namespace ZYROCloud::gdrive

@@ -30,7 +30,8 @@ Account::Account(Service& service, std::string email, std::string name, std::str
     : service_(service), email_(std::move(email)), name_(std::move(name)), id_(std::move(id)) {}
 
 std::string Account::Root() const {
-    return service_.tree_.RootId();
+    const Lock lock(service_.mutex_);
+    return service_.tree_.RootId(*this);
 }
 
 Tokens Account::IssueTokens(int64_t life, const std::string& client) {
@@ -59,7 +60,8 @@ Node& Account::At(const std::string& id) const {
 
 Node& Account::FreePlace(const std::string& parent, const std::string& name) const {
     Node& folder = At(parent);
-    if (!folder.folder || service_.tree_.Child(folder, name) != nullptr) {
+    const bool taken = !service_.tree_.IsGraph() && service_.tree_.Child(folder, name) != nullptr;
+    if (!folder.folder || taken) {
         throw std::invalid_argument("account " + email_ + ": no place for " + name);
     }
     return folder;
@@ -113,7 +115,7 @@ void Account::AddMany(const std::string& parent, size_t count, uint64_t size) {
 void Account::Remove(const std::string& id) {
     const Lock lock(service_.mutex_);
     Node& node = At(id);
-    if (node.parent == nullptr) {
+    if (&node == &service_.tree_.Root(*this)) {
         throw std::invalid_argument("the folder that holds all cannot be removed");
     }
     service_.tree_.Remove(node);
@@ -124,6 +126,7 @@ void Account::SetTimes(const std::string& id, int64_t created, int64_t modified)
     Node& node = At(id);
     node.created = node.content_created = created;
     node.modified = node.content_modified = modified;
+    node.modified_millis = 0;
     service_.tree_.Touch(node);
     node.modified = modified;
 }
@@ -152,7 +155,9 @@ std::vector<Item> Account::List(const std::string& folder) const {
     const Lock lock(service_.mutex_);
     std::vector<Item> items;
     for (const auto& [key, node] : At(folder).children) {
-        items.push_back(ToItem(*node));
+        if (!node->trashed) {
+            items.push_back(ToItem(*node));
+        }
     }
     return items;
 }

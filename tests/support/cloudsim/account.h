@@ -75,6 +75,7 @@ class Account {
     bool Exists(const std::string& path) const { return !Find(path).empty(); }
     Item Get(const std::string& id) const;
     std::string Bytes(const std::string& id) const;
+    /** Without what is in the trash. */
     std::vector<Item> List(const std::string& folder) const;
 
     void SetQuota(uint64_t bytes) { quota_ = bytes; }

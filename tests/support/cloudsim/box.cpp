@@ -6,6 +6,7 @@
 
 #include "support/cloudsim/box_json.h"
 #include "support/cloudsim/box_upload.h"
+#include "support/cloudsim/route.h"
 
 namespace cloudsim {
 namespace {
@@ -15,42 +16,11 @@ constexpr const char* kUpload = "upload";
 constexpr const char* kDownload = "download";
 constexpr const char* kAccount = "account";
 
-bool BeginsWith(const std::string& text, const std::string& start) {
-    return text.compare(0, start.size(), start) == 0;
-}
-
-bool IsBareAddress(const std::string& host) {
-    return host.empty() || host[0] == '[' ||
-           host.find_first_not_of("0123456789.") == std::string::npos;
-}
-
 const char* RoleOfPath(const std::string& path) {
     return BeginsWith(path, "/api/2.0/") ? kUpload
            : BeginsWith(path, "/api/")   ? kAccount
            : BeginsWith(path, "/d/")     ? kDownload
                                          : kApi;
-}
-
-std::vector<std::string> Split(const std::string& path) {
-    Request request;
-    request.path = path;
-    return request.Segments();
-}
-
-/** Sets `id` to what stands at the place of '*'. */
-bool Matches(const std::string& pattern, const std::vector<std::string>& path, std::string& id) {
-    const std::vector<std::string> parts = Split(pattern);
-    if (parts.size() != path.size()) {
-        return false;
-    }
-    for (size_t i = 0; i < parts.size(); i++) {
-        if (parts[i] == "*") {
-            id = path[i];
-        } else if (parts[i] != path[i]) {
-            return false;
-        }
-    }
-    return true;
 }
 
 }  // namespace
@@ -125,7 +95,7 @@ std::unique_ptr<Handler> BoxService::BeginCall(Request& request,
     bool known = false;
     std::string id;
     for (const Route& route : kRoutes) {
-        if (!Matches(route.path, path, id)) {
+        if (!MatchesPath(route.path, path, id)) {
             continue;
         }
         known = true;
@@ -164,8 +134,8 @@ Reply BoxService::Call(const Request& request, Account& account, const std::stri
 std::unique_ptr<Handler> BoxService::BeginUpload(Request& request,
                                                  const std::vector<std::string>& path) {
     std::string id;
-    const bool first = Matches("api/2.0/files/content", path, id);
-    if (!first && !Matches("api/2.0/files/*/content", path, id)) {
+    const bool first = MatchesPath("api/2.0/files/content", path, id);
+    if (!first && !MatchesPath("api/2.0/files/*/content", path, id)) {
         return Ready(box::Error(404, "not_found", "Not Found"));
     }
     if (request.method != "POST") {

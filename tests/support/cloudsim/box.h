@@ -42,6 +42,9 @@ class BoxService : public Service {
     std::string DownloadHost() const { return Address(box_options_.download_name); }
     std::string TokenUrl() const { return ApiHost() + "/oauth2/token"; }
 
+    std::map<std::string, std::string> Attributes(const Account& account,
+                                                  const Item& item) override;
+
   private:
     friend class BoxUpload;
     using Operation = Reply (BoxService::*)(const BoxCall&);

@@ -179,7 +179,7 @@ Reply BoxService::Search(const BoxCall& call) {
     }
     const Page page = PageOf(request, 30, 200, 10000);
     Nodes found;
-    std::istringstream ancestors(request.Query("ancestor_folder_ids", tree_.RootId()));
+    std::istringstream ancestors(request.Query("ancestor_folder_ids", tree_.RootId(call.account)));
     std::string id;
     while (std::getline(ancestors, id, ',')) {
         Gather(Find(call, id, true), WordsOf(request.Query("query")), request.Query("type"), found);
@@ -191,6 +191,10 @@ Reply BoxService::Search(const BoxCall& call) {
     list["offset"] = Json::UInt64(page.offset);
     list["entries"] = Entries(found, page, request, true);
     return JsonReply(200, list);
+}
+
+std::map<std::string, std::string> BoxService::Attributes(const Account&, const Item& item) {
+    return {{"id::file", (item.folder ? "folders/" : "files/") + item.id}};
 }
 
 }  // namespace cloudsim

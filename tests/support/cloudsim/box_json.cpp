@@ -247,31 +247,4 @@ std::string Date(int64_t time) {
     return text;
 }
 
-int64_t ParseDate(const std::string& text) {
-    struct tm parts {};
-    const char* rest = strptime(text.c_str(), "%Y-%m-%dT%H:%M:%S", &parts);
-    if (rest == nullptr) {
-        return -1;
-    }
-    if (*rest == '.') {
-        rest += 1 + std::string(rest + 1).find_first_not_of("0123456789");
-    }
-    if (*rest == 'Z') {
-        return timegm(&parts);
-    }
-    // "+hh:mm": digits by their places.
-    const std::string zone_text = rest;
-    if (zone_text.size() != 6 || zone_text[3] != ':') {
-        return -1;
-    }
-    const auto hours = ParseNumber(zone_text.substr(1, 2));
-    const auto minutes = ParseNumber(zone_text.substr(4, 2));
-    if (!hours || !minutes) {
-        return -1;
-    }
-    const auto ahead = static_cast<int64_t>(*hours * 3600 + *minutes * 60);
-    const int64_t zone = zone_text[0] == '-' ? -ahead : ahead;
-    return timegm(&parts) - zone;
-}
-
 }  // namespace cloudsim::box

@@ -27,8 +27,6 @@ Json::Value Selected(const Node& node, const std::string& fields);
 Json::Value User(const Account& account);
 /** "2012-12-12T10:53:43-08:00": the service shows its own zone. */
 std::string Date(int64_t time);
-/** Seconds since 1970; -1 for what is no RFC 3339 date. */
-int64_t ParseDate(const std::string& text);
 
 }  // namespace cloudsim::box
 

@@ -4,6 +4,7 @@
 #include "support/cloudsim/box.h"
 #include "support/cloudsim/box_json.h"
 #include "support/cloudsim/box_upload.h"
+#include "support/cloudsim/date.h"
 
 namespace cloudsim {
 namespace {
@@ -30,10 +31,10 @@ int64_t ReadDate(const Json::Value& attributes, const char* name) {
     if (attributes[name].isNull()) {
         return -1;
     }
-    const int64_t given = box::ParseDate(attributes[name].asString());
-    return given >= 0 ? given
-                      : throw box::Failure{
-                            box::Error(400, "bad_request", std::string("Bad Request: ") + name)};
+    const auto given = ParseDate(attributes[name].asString());
+    return given ? given->seconds
+                 : throw box::Failure{
+                       box::Error(400, "bad_request", std::string("Bad Request: ") + name)};
 }
 
 Dates ReadDates(const Json::Value& attributes) {

@@ -12,27 +12,27 @@
 #include <sstream>
 #include <stdexcept>
 
-#include "support/cloudsim/cloudsim.h"
 #include "support/cloudsim/main_mount.h"
+#include "support/cloudsim/main_service.h"
 #include "support/test_certs.h"
 
 namespace {
 
 namespace fs = std::filesystem;
 
-const char kUsage[] = R"(cloudsim --box [OPTION]...
+const char kUsage[] = R"(cloudsim --box|--dropbox|--google|--onedrive [OPTION]...
 cloudsim --make-tls FOLDER [NAME]...    makes ca.pem, cert.pem and key.pem for these names
 
 Serves a simulated cloud on loopback until it is told to end (SIGTERM, SIGINT), and prints how to
 reach it, as NAME=VALUE lines, the last of them "ready". Its exit status is 3 when a declared fault
-was not used.
+was not used. Hosts are api, upload and download of Box, api, accounts and content of Google, api,
+content and notify of Dropbox, api, login and content of OneDrive.
 
   --tls CERT KEY        PEM files of the server; without, plain HTTP
   --port N              0, the default, takes any
   --address HOST        one name or address for everything (127.0.0.1), instead of
-                        localhost, upload.localhost and dl.localhost
-  --hosts API UPLOAD DOWNLOAD
-                        these names instead
+                        localhost and names below it
+  --hosts A B C         these names for its three hosts instead
   --account EMAIL       one more account; what follows is about it
     --name NAME           of its user
     --serve FOLDER        what lies there is its tree; changes are made there as well
@@ -64,12 +64,13 @@ struct AccountPlan {
 };
 
 struct Plan {
-    cloudsim::BoxOptions options;
+    cloudsim::ServiceOptions options;
     std::vector<AccountPlan> accounts;
     std::vector<std::pair<std::string, std::string>> clients;
     std::vector<cloudsim::Fault> faults;
     int64_t token_life = 3600;
-    bool box = false, rotate = true;
+    const cloudsim::ServiceKind* kind = nullptr;
+    bool rotate = true;
 };
 
 std::string ReadAll(const std::string& path) {
@@ -116,7 +117,6 @@ using Option = std::function<void(Plan&, Arguments&)>;
 
 const std::map<std::string, Option>& ServiceOptions() {
     static const std::map<std::string, Option> options = {
-        {"--box", [](Plan& plan, Arguments&) { plan.box = true; }},
         {"--tls",
          [](Plan& plan, Arguments& in) {
              plan.options.certificate = ReadAll(in.Word());
@@ -126,14 +126,15 @@ const std::map<std::string, Option>& ServiceOptions() {
          [](Plan& plan, Arguments& in) { plan.options.port = static_cast<int>(in.Number()); }},
         {"--address",
          [](Plan& plan, Arguments& in) {
-             plan.options.api_name = plan.options.upload_name = plan.options.download_name =
-                 in.Word();
+             const std::string name = in.Word();
+             plan.options.names = {name, name, name};
          }},
         {"--hosts",
          [](Plan& plan, Arguments& in) {
-             plan.options.api_name = in.Word();
-             plan.options.upload_name = in.Word();
-             plan.options.download_name = in.Word();
+             plan.options.names.emplace();
+             for (std::string& name : *plan.options.names) {
+                 name = in.Word();
+             }
          }},
         {"--client",
          [](Plan& plan, Arguments& in) {
@@ -201,6 +202,10 @@ Plan ReadPlan(Arguments in) {
     plan.options.keep_journal = false;
     while (!in.Empty()) {
         const std::string word = in.Word();
+        if (const cloudsim::ServiceKind* kind = cloudsim::FindServiceKind(word)) {
+            plan.kind = kind;
+            continue;
+        }
         auto option = ServiceOptions().find(word);
         if (option == ServiceOptions().end()) {
             option = AccountOptions().find(word);
@@ -210,8 +215,8 @@ Plan ReadPlan(Arguments in) {
         }
         option->second(plan, in);
     }
-    if (!plan.box || plan.accounts.empty()) {
-        throw std::invalid_argument("--box and at least one --account are needed");
+    if (plan.kind == nullptr || plan.accounts.empty()) {
+        throw std::invalid_argument("a service and at least one --account are needed");
     }
     return plan;
 }
@@ -235,8 +240,8 @@ void Say(const std::string& name, const std::string& value) {
     std::cout << name << '=' << value << '\n';
 }
 
-cloudsim::Account& Fill(cloudsim::BoxService& box, const AccountPlan& plan, int64_t life) {
-    cloudsim::Account& account = box.AddAccount(plan.email, plan.name);
+cloudsim::Account& Fill(cloudsim::Service& service, const AccountPlan& plan, int64_t life) {
+    cloudsim::Account& account = service.AddAccount(plan.email, plan.name);
     if (plan.quota != 0) {
         account.SetQuota(plan.quota);
     }
@@ -261,7 +266,7 @@ cloudsim::Account& Fill(cloudsim::BoxService& box, const AccountPlan& plan, int6
         document["email"] = account.Email();
         document["access_token"] = tokens.access_token;
         document["refresh_token"] = tokens.refresh_token;
-        document["expire_time"] = Json::Int64(box.Now() + life);
+        document["expire_time"] = Json::Int64(service.Now() + life);
         WriteAll(plan.tokens, cloudsim::OneLine(document) + "\n");
     }
     return account;
@@ -281,7 +286,11 @@ void Wait(const sigset_t& ends, std::vector<std::unique_ptr<cloudsim::MountedAcc
     while (mounted.empty() ? sigwaitinfo(&ends, nullptr) < 0
                            : sigtimedwait(&ends, nullptr, &interval) < 0) {
         for (const auto& account : mounted) {
-            account->Refresh();
+            try {
+                account->Refresh();
+            } catch (const std::invalid_argument&) {
+                // A client removed what was being looked at; the next look is whole.
+            }
         }
     }
 }
@@ -294,29 +303,31 @@ int Serve(const Plan& plan) {
     pthread_sigmask(SIG_BLOCK, &ends, nullptr);
     AllowManyFiles();
 
-    cloudsim::BoxService box(plan.options);
-    box.SetTokenLife(plan.token_life);
-    box.SetRotation(plan.rotate);
+    const cloudsim::Running running = plan.kind->start(plan.options);
+    cloudsim::Service& service = *running.service;
+    service.SetTokenLife(plan.token_life);
+    service.SetRotation(plan.rotate);
     for (const auto& [id, secret] : plan.clients) {
-        box.AddClient(id, secret);
+        service.AddClient(id, secret);
     }
     for (const cloudsim::Fault& fault : plan.faults) {
-        box.AddFault(fault);
+        service.AddFault(fault);
     }
-    Say("api", box.ApiHost());
-    Say("upload", box.UploadHost());
-    Say("download", box.DownloadHost());
+    for (const auto& [use, address] : running.hosts) {
+        Say(use, address);
+    }
     std::vector<std::unique_ptr<cloudsim::MountedAccount>> mounted;
     for (const AccountPlan& account : plan.accounts) {
-        const cloudsim::Account& made = Fill(box, account, plan.token_life);
+        const cloudsim::Account& made = Fill(service, account, plan.token_life);
         if (!account.mounted.empty()) {
-            mounted.push_back(std::make_unique<cloudsim::MountedAccount>(made, account.mounted));
+            mounted.push_back(
+                std::make_unique<cloudsim::MountedAccount>(service, made, account.mounted));
             mounted.back()->Refresh();
         }
     }
     std::cout << "ready" << std::endl;
     Wait(ends, mounted);
-    const std::vector<std::string> unused = box.UnusedFaults();
+    const std::vector<std::string> unused = service.UnusedFaults();
     for (const std::string& fault : unused) {
         std::cerr << "cloudsim: fault not used: " << fault << '\n';
     }

@@ -1,12 +1,12 @@
-/** What the box's backend would show of an account: a tree of names with the ids of items. */
+/** What the box's backend would show of an account: a tree of names with attributes of the items.
+ */
 #ifndef ZYROVFS_TESTS_CLOUDSIM_MAIN_MOUNT_H
 #define ZYROVFS_TESTS_CLOUDSIM_MAIN_MOUNT_H
 
-#include <cstdint>
 #include <map>
 #include <string>
 
-#include "support/cloudsim/account.h"
+#include "support/cloudsim/service.h"
 #include "support/xattrtree/xattrtree.h"
 
 namespace cloudsim {
@@ -17,27 +17,23 @@ namespace cloudsim {
  */
 class MountedAccount {
   public:
-    MountedAccount(const Account& account, const std::string& folder)
-        : account_(account), tree_(folder) {}
+    MountedAccount(Service& service, const Account& account, const std::string& folder)
+        : service_(service), account_(account), tree_(folder) {}
 
-    /** Shows what has changed since. */
+    /** Shows what has changed since, and again what a client asked to be forgotten. */
     void Refresh();
 
   private:
-    struct Entry {
-        std::string id;  ///< with the prefix that tells files and folders apart
-        bool folder;
-        uint64_t size;
-        bool operator==(const Entry& other) const {
-            return id == other.id && folder == other.folder && size == other.size;
-        }
-    };
-    using Entries = std::map<std::string, Entry>;
-    void Collect(const std::string& path, const std::string& id, Entries& entries) const;
+    using Items = std::map<std::string, Item>;
+    void Collect(const std::string& path, const std::string& id, Items& items) const;
+    void Forget();
+    void Show(const std::string& path, const Item& item);
 
+    Service& service_;
     const Account& account_;
     XattrTree tree_;
-    Entries shown_;
+    Items shown_;
+    size_t writes_seen_ = 0;
 };
 
 }  // namespace cloudsim

@@ -33,11 +33,11 @@ bool Parameter(const std::string& header, const std::string& name, std::string& 
 }  // namespace
 
 Multipart::Multipart(const std::string& content_type, std::function<void(const Part&)> begin,
-                     OnData data)
+                     OnData data, const std::string& kind)
     : begin_(std::move(begin)), data_(std::move(data)) {
     std::string boundary;
-    const bool form = SameText(content_type.substr(0, 19), "multipart/form-data");
-    if (!form || !Parameter(content_type, "boundary", boundary) || boundary.empty()) {
+    if (!SameText(content_type.substr(0, kind.size()), kind) ||
+        !Parameter(content_type, "boundary", boundary) || boundary.empty()) {
         state_ = State::kBroken;
     }
     boundary_ = "\r\n--" + boundary;
@@ -91,6 +91,8 @@ bool Multipart::StepHeaders() {
             std::string ignored;
             Parameter(line, "name", part_.name);
             part_.file = Parameter(line, "filename", ignored);
+        } else if (SameText(line.substr(0, 13), "Content-Type:")) {
+            part_.type = line.substr(std::min(line.find_first_not_of(" \t", 13), line.size()));
         }
         start = next;
     }

@@ -12,11 +12,11 @@ Journal::Options JournalOptions(const ServerOptions& options) {
 
 }  // namespace
 
-Service::Service(const ServerOptions& options, const std::string& root_id)
+Service::Service(const ServerOptions& options, const TreeRules& rules)
     : options_(options),
       journal_(JournalOptions(options)),
       tokens_([this] { return Now(); }),
-      tree_([this] { return Now(); }, root_id) {}
+      tree_([this] { return Now(); }, rules) {}
 
 Service::~Service() = default;
 
@@ -40,10 +40,14 @@ void Service::AddClient(const std::string& id, const std::string& secret) {
 Account& Service::AddAccount(const std::string& email, const std::string& name) {
     const std::string shown = name.empty() ? email.substr(0, email.find('@')) : name;
     const std::lock_guard<std::mutex> lock(mutex_);
-    const std::string id = std::to_string(270000001 + accounts_.size());
-    accounts_.push_back(std::make_unique<Account>(*this, email, shown, id));
+    accounts_.push_back(
+        std::make_unique<Account>(*this, email, shown, AccountId(accounts_.size())));
     tree_.AddAccount(*accounts_.back());
     return *accounts_.back();
+}
+
+std::string Service::AccountId(size_t index) const {
+    return std::to_string(270000001 + index);
 }
 
 int64_t Service::Now() const {
@@ -52,6 +56,10 @@ int64_t Service::Now() const {
 
 std::unique_ptr<Sink> Service::NewSink() const {
     return MakeSink(options_.storage, options_.hash_uploads);
+}
+
+std::map<std::string, std::string> Service::Attributes(const Account&, const Item& item) {
+    return {{"id::file", item.id}};
 }
 
 }  // namespace cloudsim

@@ -50,6 +50,9 @@ class Service {
         return journal_;
     }
 
+    /** Attributes that a backend which had mounted the account would serve for an item. */
+    virtual std::map<std::string, std::string> Attributes(const Account& account, const Item& item);
+
     /** The service's clock runs ahead by so much more: tokens expire without waiting. */
     void AdvanceClock(int64_t seconds) { ahead_ += seconds; }
     int64_t Now() const;
@@ -61,7 +64,7 @@ class Service {
   protected:
     friend class Account;
 
-    Service(const ServerOptions& options, const std::string& root_id);
+    Service(const ServerOptions& options, const TreeRules& rules);
     /** To be called when the derived class is ready to answer. */
     void Start();
     /** To be called before the derived class goes. */
@@ -69,6 +72,8 @@ class Service {
 
     virtual std::unique_ptr<Handler> Begin(Request& request) = 0;
     virtual std::string Role(const Request& request) const = 0;
+    /** Id of the account that is the `index`th to be added. */
+    virtual std::string AccountId(size_t index) const;
     std::unique_ptr<Sink> NewSink() const;
 
     const ServerOptions options_;

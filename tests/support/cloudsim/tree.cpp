@@ -4,6 +4,8 @@
 #include <clocale>
 #include <cwctype>
 
+#include "support/cloudsim/account.h"
+
 namespace cloudsim {
 namespace {
 
@@ -69,24 +71,38 @@ uint64_t Node::Size() const {
 }
 
 bool Node::IsInside(const Node& folder_node) const {
-    const Node* node = this;
-    while (node != nullptr && node != &folder_node) {
-        node = node->parent;
+    const std::vector<Node*> above = Parents();
+    return this == &folder_node || std::any_of(above.begin(), above.end(), [&](const Node* node) {
+               return node->IsInside(folder_node);
+           });
+}
+
+std::vector<Node*> Node::Parents() const {
+    std::vector<Node*> all = more_parents;
+    if (parent != nullptr) {
+        all.insert(all.begin(), parent);
     }
-    return node != nullptr;
+    return all;
+}
+
+bool Node::IsTrashed() const {
+    const std::vector<Node*> above = Parents();
+    return trashed || (!above.empty() && std::all_of(above.begin(), above.end(),
+                                                     [](const Node* n) { return n->IsTrashed(); }));
 }
 
 Node& Tree::AddAccount(const Account& account) {
     auto root = std::make_unique<Node>();
-    root->id = root_id_;
     root->name = "All Files";
     root->owner = &account;
     root->folder = true;
+    root->id = rules_.make_id ? rules_.make_id(*root, 0)
+                              : rules_.root_id + (rules_.graph ? account.Id() : "");
     return *(roots_[&account] = std::move(root));
 }
 
 Node* Tree::Find(const Account& account, const std::string& id) {
-    if (id == root_id_) {
+    if (id == RootId(account)) {
         return &Root(account);
     }
     const auto found = nodes_.find(id);
@@ -102,9 +118,18 @@ bool Tree::WasRemoved(const Account& account, const std::string& id) const {
 Node* Tree::Child(const Node& folder, const std::string& name) const {
     const std::string folded = FoldCase(name);
     for (const int rank : {0, 1}) {
-        const auto found = folder.children.find({rank, folded});
-        if (found != folder.children.end()) {
-            return found->second;
+        auto found = folder.children.lower_bound({rank, folded});
+        if (!rules_.graph) {
+            if (found != folder.children.end() && found->first == Node::Key(rank, folded)) {
+                return found->second;
+            }
+            continue;
+        }
+        const Node::Key end = {rank, folded + '\1'};
+        for (; found != folder.children.end() && found->first < end; ++found) {
+            if (found->second->name == name && !found->second->trashed) {
+                return found->second;
+            }
         }
     }
     return nullptr;
@@ -124,19 +149,34 @@ Node* Tree::Walk(const Account& account, const std::string& path) {
 }
 
 Node::Key Tree::KeyOf(const Node& node) const {
-    return {node.folder ? 0 : 1, FoldCase(node.name)};
+    const std::string twin = rules_.graph ? '\0' + node.id : "";
+    return {node.folder ? 0 : 1, FoldCase(node.name) + twin};
+}
+
+void Tree::Attach(Node& node) {
+    for (Node* parent : node.Parents()) {
+        parent->children[KeyOf(node)] = &node;
+    }
+}
+
+void Tree::Detach(Node& node) {
+    for (Node* parent : node.Parents()) {
+        parent->children.erase(KeyOf(node));
+    }
 }
 
 Node& Tree::Make(Node& parent, const std::string& name, bool folder) {
     auto node = std::make_unique<Node>();
-    node->id = std::to_string(last_id_ += 17);
-    node->name = name;
+    node->name = node->disk_name = name;
     node->owner = parent.owner;
     node->parent = &parent;
     node->folder = folder;
+    last_id_ += 17;
+    node->id = rules_.make_id ? rules_.make_id(*node, last_id_)
+                              : rules_.id_prefix + std::to_string(last_id_);
     node->created = node->modified = node->content_created = node->content_modified = now_();
     Node& made = *node;
-    parent.children[KeyOf(made)] = &made;
+    Attach(made);
     nodes_[made.id] = std::move(node);
     version_++;
     return made;
@@ -148,15 +188,41 @@ void Tree::Touch(Node& node) {
     version_++;
 }
 
-uint64_t Tree::Used(const Account& account) const {
-    return roots_.at(&account)->Size();
+std::vector<const Node*> Tree::All(const Account& account) const {
+    std::vector<const Node*> all;
+    for (const auto& [id, node] : nodes_) {
+        if (node->owner == &account) {
+            all.push_back(node.get());
+        }
+    }
+    std::sort(all.begin(), all.end(), [](const Node* a, const Node* b) { return a->id < b->id; });
+    return all;
 }
 
+uint64_t Tree::Used(const Account& account) const {
+    if (!rules_.graph) {
+        return roots_.at(&account)->Size();
+    }
+    uint64_t used = 0;
+    for (const auto& [id, node] : nodes_) {
+        const bool counts = node->owner == &account && !node->folder && !node->weightless;
+        used += counts ? node->content->Size() : 0;
+    }
+    return used;
+}
+
+/** What lies in another folder as well stays there. */
 void Tree::Forget(Node& node) {
     while (!node.children.empty()) {
         Node& child = *node.children.begin()->second;
         node.children.erase(node.children.begin());
-        Forget(child);
+        std::vector<Node*> left = child.Parents();
+        left.erase(std::remove(left.begin(), left.end(), &node), left.end());
+        child.parent = left.empty() ? nullptr : left.front();
+        child.more_parents.assign(left.begin() + (left.empty() ? 0 : 1), left.end());
+        if (left.empty()) {
+            Forget(child);
+        }
     }
     removed_[node.id] = node.owner;
     nodes_.erase(node.id);

@@ -46,17 +46,37 @@ int64_t ModificationTime(const std::string& path) {
 
 }  // namespace
 
-/** Empty when the account isn't served from a disk. */
-std::string Tree::DiskPath(const Node& parent, const std::string& name) const {
-    const auto disk = disks_.find(parent.owner);
-    if (disk == disks_.end()) {
-        return "";
+/** Empty when the account isn't served from a disk, or the item lies nowhere or in the trash. */
+std::string Tree::DiskPath(const Node& node) const {
+    const auto disk = disks_.find(node.owner);
+    const Node* root = roots_.at(node.owner).get();
+    std::string path;
+    for (const Node* at = &node; at != root && disk != disks_.end(); at = at->parent) {
+        if (at->trashed || at->parent == nullptr) {
+            return "";
+        }
+        path.insert(0, "/" + at->disk_name);
     }
-    std::string path = "/" + name;
-    for (const Node* node = &parent; node->parent != nullptr; node = node->parent) {
-        path.insert(0, "/" + node->name);
+    return disk == disks_.end() ? "" : disk->second + path;
+}
+
+std::string Tree::DiskPath(const Node& parent, const std::string& disk_name) const {
+    const std::string folder = DiskPath(parent);
+    return folder.empty() ? "" : folder + "/" + disk_name;
+}
+
+/** Of several items of one name the first keeps it. */
+std::string Tree::DiskName(const Node& parent, const std::string& name) const {
+    constexpr size_t kLimit = 200;
+    if (!rules_.graph || disks_.count(parent.owner) == 0) {
+        return name;
     }
-    return disk->second + path;
+    std::string plain = name.substr(0, kLimit);
+    std::replace(plain.begin(), plain.end(), '/', '_');
+    std::replace(plain.begin(), plain.end(), '\0', '_');
+    plain = plain.empty() || plain == "." || plain == ".." ? "_" : plain;
+    const bool taken = fs::exists(fs::symlink_status(DiskPath(parent, plain)));
+    return taken ? plain + "~" + std::to_string(last_id_ + 17) : plain;
 }
 
 /** Puts the content there, whole or not at all. The answer reads from the new file. */
@@ -86,38 +106,102 @@ ContentPtr Tree::ToDisk(const std::string& path, ContentPtr content) const {
 }
 
 Node& Tree::AddFolder(Node& parent, const std::string& name) {
-    const std::string path = DiskPath(parent, name);
+    const std::string disk_name = DiskName(parent, name);
+    const std::string path = DiskPath(parent, disk_name);
     if (!path.empty() && mkdir(path.c_str(), 0755) != 0) {
         Fail("cannot make folder", path);
     }
-    return Make(parent, name, true);
+    Node& folder = Make(parent, name, true);
+    folder.disk_name = disk_name;
+    return folder;
 }
 
 Node& Tree::AddFile(Node& parent, const std::string& name, ContentPtr content) {
-    content = ToDisk(DiskPath(parent, name), std::move(content));
+    const std::string disk_name = DiskName(parent, name);
+    content = ToDisk(DiskPath(parent, disk_name), std::move(content));
     Node& file = Make(parent, name, false);
+    file.disk_name = disk_name;
     file.content = std::move(content);
     file.version_id = std::to_string(last_id_ += 17);
     return file;
 }
 
 void Tree::SetContent(Node& file, ContentPtr content) {
-    file.content = ToDisk(DiskPath(*file.parent, file.name), std::move(content));
+    file.content = ToDisk(DiskPath(file), std::move(content));
     file.version_id = std::to_string(last_id_ += 17);
     file.content_modified = now_();
+    file.modified_millis = 0;
     Touch(file);
 }
 
 void Tree::Move(Node& node, Node& parent, const std::string& name) {
-    const std::string from = DiskPath(*node.parent, node.name), to = DiskPath(parent, name);
-    if (!from.empty() && from != to && rename(from.c_str(), to.c_str()) != 0) {
+    Place(node, {&parent}, name);
+}
+
+void Tree::Place(Node& node, const std::vector<Node*>& parents, const std::string& name) {
+    const std::string from = DiskPath(node), old_name = node.name, old_disk_name = node.disk_name;
+    const std::vector<Node*> old_parents = node.Parents();
+    Node* first = parents.empty() ? nullptr : parents.front();
+    const bool stays = first == nullptr || (name == old_name && first == node.parent);
+    const std::string disk_name = stays ? old_disk_name : DiskName(*first, name);
+    Put(node, parents, name, disk_name);
+    try {
+        MoveOnDisk(node, from);
+    } catch (...) {
+        Put(node, old_parents, old_name, old_disk_name);
+        throw;
+    }
+    Touch(node);
+}
+
+void Tree::Put(Node& node, const std::vector<Node*>& parents, const std::string& name,
+               const std::string& disk_name) {
+    Detach(node);
+    node.parent = parents.empty() ? nullptr : parents.front();
+    node.more_parents.assign(parents.begin() + (parents.empty() ? 0 : 1), parents.end());
+    node.name = name;
+    node.disk_name = disk_name;
+    Attach(node);
+}
+
+void Tree::MoveOnDisk(Node& node, const std::string& from) {
+    const std::string to = DiskPath(node);
+    if (from == to) {
+        return;
+    }
+    if (from.empty()) {
+        Restore(node);
+    } else if (to.empty()) {
+        fs::remove_all(from);
+    } else if (rename(from.c_str(), to.c_str()) != 0) {
         Fail("cannot move", from);
     }
-    node.parent->children.erase(KeyOf(node));
-    node.parent = &parent;
-    node.name = name;
-    parent.children[KeyOf(node)] = &node;
-    Touch(node);
+}
+
+/** An item that wasn't on the disk for a while. Its content could be read all the time. */
+void Tree::Restore(Node& node) {
+    node.disk_name = DiskName(*node.parent, node.name);
+    const std::string path = DiskPath(node);
+    if (path.empty()) {
+        return;
+    }
+    if (!node.folder) {
+        node.content = ToDisk(path, node.content);
+        return;
+    }
+    fs::create_directory(path);
+    for (const auto& [key, child] : node.children) {
+        if (child->parent == &node && !child->trashed) {
+            Restore(*child);
+        }
+    }
+}
+
+void Tree::SetTrashed(Node& node, bool trashed) {
+    const std::string from = DiskPath(node);
+    node.trashed = trashed;
+    MoveOnDisk(node, from);
+    version_++;
 }
 
 Node& Tree::Copy(const Node& node, Node& parent, const std::string& name) {
@@ -142,11 +226,11 @@ Node& Tree::Copy(const Node& node, Node& parent, const std::string& name) {
 }
 
 void Tree::Remove(Node& node) {
-    const std::string path = DiskPath(*node.parent, node.name);
+    const std::string path = DiskPath(node);
     if (!path.empty()) {
         fs::remove_all(path);
     }
-    node.parent->children.erase(KeyOf(node));
+    Detach(node);
     version_++;
     Forget(node);
 }

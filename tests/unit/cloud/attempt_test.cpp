@@ -5,6 +5,7 @@
 #include <sys/mman.h>
 
 #include "core/handle.h"
+#include "support/bare_driver.h"
 #include "support/seams.h"
 #include "unit/cloud/attempt_plans.h"
 
@@ -54,6 +55,22 @@ TEST_F(Attempts, TheErrorIsCopiedBeforeOrBehindTheTestForACancel) {
     never.plan.copy = CopyError::kNever;
     EXPECT_FALSE(never.Go());
     EXPECT_EQ(never.cloud.GetErrorCode(), VFS_ERR_NONE);
+}
+
+class TokenlessDriver : public bare::Driver<PublicCloud> {
+  public:
+    bool SetRefreshTokenParam(APIHandler*) override { return false; }
+};
+
+TEST_F(Attempts, ATokenThatCannotBeRenewedEndsThemAndAnotherFailureIsJudgedAsAlways) {
+    TokenlessDriver drive;
+    XferContext context;
+    context.fd = 0;
+    EXPECT_EQ(JudgeRenewing(drive, context, VFS_ERR_UNAUTHORIZED).kind, NextStep::kEnd);
+    EXPECT_EQ(JudgeRenewing(drive, context, VFS_ERR_FORBIDDEN).kind, NextStep::kGiveUp);
+    EXPECT_EQ(JudgeRenewing(drive, context, VFS_ERR_RANGE_FAILED, true).kind, NextStep::kRetry);
+    context.fd = -1;
+    EXPECT_EQ(JudgeRenewing(drive, context, VFS_ERR_RANGE_FAILED, true).kind, NextStep::kGiveUp);
 }
 
 TEST_F(Attempts, LinesNameTheCallersUnitTheAttemptAndTheLimit) {
@@ -139,6 +156,19 @@ TEST_F(Attempts, PiecesOfAnUploadEndWithTheRest) {
             return true;
         }));
     EXPECT_EQ(sent, 2);
+}
+
+TEST_F(Attempts, ARequestBetweenTheAttemptsDoesNotHideTheFailure) {
+    // The handler's record is that of the look in the end, and the look went well.
+    Transfer run({});
+    DropboxDownload(run);
+    run.plan.send = [&] { return run.Note("send") && run.cloud.Meet(kGone); };
+    run.plan.judge = [&](__tag_vfs_err_) {
+        return run.cloud.Meet(kDone) ? NextStep::RetryAfter(10) : NextStep::End();
+    };
+    EXPECT_FALSE(run.Go());
+    EXPECT_EQ(run.cloud.GetErrorCode(), VFS_ERR_NOT_FOUND);
+    EXPECT_EQ(seams::Sleeps().size(), 6U);
 }
 
 }  // namespace

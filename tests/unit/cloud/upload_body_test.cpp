@@ -11,11 +11,10 @@
 #include "support/bare_driver.h"
 #include "support/seams.h"
 #include "support/wire_server.h"
+#include "unit/cloud/attempt_plans.h"
 
 namespace ZYROCloud {
 namespace {
-
-using namespace ZYROVFS;  // NOLINT(google-build-using-namespace)
 
 /** A file of 0123456789... and a driver whose uploads read it. */
 class UploadBodies : public testing::Test {
@@ -105,6 +104,44 @@ TEST_F(UploadBodies, AStreamThatHasBegunIsNotSentAgain) {
 TEST_F(UploadBodies, ADriverWithoutAContextSendsNothing) {
     xfer_.context = nullptr;
     EXPECT_FALSE(SendUpload(driver_, xfer_));
+}
+
+TEST_F(UploadBodies, AnUploadInOneRequestBeginsAgainAtTheFirstByteOfTheFile) {
+    seams::Reset();
+    ScriptedCloud cloud({kBusy, kLost, kDone});
+    const std::string what = "/a.txt";
+    AttemptPlan plan = WholeUploadPlan(cloud, xfer_, what);
+    std::vector<off_t> starts;
+    lseek(context_.fd, 5, SEEK_SET);
+    plan.send = [&] {
+        starts.push_back(lseek(context_.fd, 0, SEEK_CUR));
+        lseek(context_.fd, 7, SEEK_SET);
+        return cloud.Process();
+    };
+    EXPECT_TRUE(RunAttempts(cloud, plan)) << seams::LogDump();
+    EXPECT_THAT(starts, testing::ElementsAre(5, 0, 0));
+    EXPECT_TRUE(seams::Logged("Retry directly upload: 0/6")) << seams::LogDump();
+    EXPECT_TRUE(seams::Logged("Retry directly upload: 1/6"));
+}
+
+TEST_F(UploadBodies, AnUploadInOneRequestSaysWhatItGaveUp) {
+    seams::Reset();
+    ScriptedCloud cloud(std::deque<Outcome>(6, kBusy));
+    const std::string what = "/a.txt";
+    AttemptPlan plan = WholeUploadPlan(cloud, xfer_, what);
+    plan.send = [&] { return cloud.Process(); };
+    EXPECT_FALSE(RunAttempts(cloud, plan));
+    EXPECT_EQ(cloud.GetErrorCode(), VFS_ERR_SERVER_ERROR);
+    EXPECT_TRUE(seams::LoggedPart("Retry times reach max times, /a.txt, err: {"))
+        << seams::LogDump();
+
+    context_.fd = -1;
+    ScriptedCloud stream({kBusy});
+    AttemptPlan once = WholeUploadPlan(stream, xfer_, what);
+    once.send = [&] { return stream.Process(); };
+    seams::Reset();
+    EXPECT_FALSE(RunAttempts(stream, once));
+    EXPECT_TRUE(seams::Sleeps().empty());
 }
 
 }  // namespace

@@ -20,6 +20,7 @@ TEST(JsonText, IsOneLineWithoutANewline) {
     EXPECT_EQ(toString(Json::Value()), "null");
     EXPECT_EQ(toString(Document()), R"({"sftp://amy@h":{"alias":"nas","number":1}})");
     EXPECT_EQ(toString(Json::Value("a\nb")), R"("a\nb")");
+    EXPECT_EQ(toString(Json::Value("\xc3\xa4\x7f")), "\"\xc3\xa4\x7f\"");
 }
 
 TEST(JsonText, CommentsAreReadPastAndNeverWritten) {
@@ -145,6 +146,18 @@ TEST(JsonNumber, AnythingElseIsRefusedAndLeavesTheOutput) {
     uint64_t positive = 7;
     EXPECT_FALSE(toUInt64(Json::Value("-1"), positive));
     EXPECT_FALSE(toUInt64(Json::Value(-1), positive));
+}
+
+TEST(JsonText, AsciiTextHoldsWhatItWasMadeFrom) {
+    Json::Value in;
+    in["\xc3\xa4"] = "a\x7f\x7f\\ \xe2\x82\xac \xf0\x9f\x98\x80\t\"";
+    const std::string text = toAscii(in);
+    for (const char c : text) {
+        EXPECT_TRUE(c >= ' ' && c < '\x7f') << text;
+    }
+    Json::Value out;
+    ASSERT_TRUE(fromString(out, text)) << text;
+    EXPECT_EQ(out, in);
 }
 
 }  // namespace

@@ -96,6 +96,12 @@ TEST_F(Fault, InterimAnswersArePassedOver) {
            "final");
 }
 
+TEST_F(Fault, AResetBehindAnInterimAnswerIsAFailedReceive) {
+    Expect({56, 0, VFS_ERR_RECEIVE_FAILED, false},
+           {ReadRequest(), Send("HTTP/1.1 100 Continue\r\n\r\n"), wire::Drip("H", 1, 50),
+            wire::Reset()});
+}
+
 TEST_F(Fault, AnAnswerThatIsNoHttpFails) {
     Conversation<> talk;
     const wire::WireServer server({{ReadRequest(), Send("hello, who are you?\r\n")}});

@@ -31,8 +31,9 @@ TEST_F(Handler, ObjectFormsTakeOnlyObjectsAndReplaceTheWholeKey) {
         EXPECT_FALSE(talk.api.AddHeader(value)) << text;
         EXPECT_FALSE(talk.api.AddGetParam(value)) << text;
         EXPECT_FALSE(talk.api.AddPostParam(value)) << text;
-        EXPECT_FALSE(talk.api.AddPostRawParam(value)) << text;
+        EXPECT_EQ(talk.api.AddPostRawParam(value), value.isNull()) << text;
     }
+    talk.api.Init();
     EXPECT_TRUE(talk.api.AddHeader(Parsed(R"({"X-Old":"1"})")));
     EXPECT_TRUE(talk.api.AddHeader(Parsed(R"({"X-New":"2"})")));
     EXPECT_TRUE(talk.api.AddGetParam(Parsed(R"({"old":"1"})")));
@@ -111,6 +112,27 @@ TEST_F(Handler, ARawBodyIsOneLineOfJson) {
     EXPECT_THAT(Head(server), HasSubstr("PUT / HTTP/1.1\r\n"));
     EXPECT_EQ(Parsed(Body(server))["name"], "a\nb");
     EXPECT_THAT(Body(server), Not(HasSubstr("\n")));
+}
+
+TEST_F(Handler, ARawBodyMayBeNull) {
+    const wire::WireServer server({Once(wire::Answer(200))});
+    Conversation<> talk;
+    EXPECT_TRUE(talk.api.AddPostRawParam(Json::Value()));
+    EXPECT_TRUE(talk.Get(server.Url()));
+    EXPECT_THAT(Head(server), HasSubstr("POST / HTTP/1.1\r\n"));
+    EXPECT_EQ(Body(server), "null");
+}
+
+TEST_F(Handler, AnObjectInAHeaderIsPrintableAscii) {
+    const wire::WireServer server({Once(wire::Answer(200))});
+    Conversation<> talk;
+    Json::Value headers;
+    headers["X-Arg"]["path"] = "/\xc3\xa4\xf0\x9f\x98\x80\r\nX-Evil: \x7f\xff";
+    EXPECT_TRUE(talk.api.AddHeader(headers));
+    EXPECT_TRUE(talk.Get(server.Url()));
+    EXPECT_THAT(Head(server),
+                HasSubstr(R"(X-Arg: {"path":"/\u00e4\ud83d\ude00\r\nX-Evil: \u007f\ufffd"})"
+                          "\r\n"));
 }
 
 TEST_F(Handler, TheUrlIsEscapedUnlessToldOtherwise) {

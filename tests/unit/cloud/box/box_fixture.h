@@ -7,8 +7,6 @@
 #define ZYROVFS_TESTS_BOX_FIXTURE_H
 
 #include <gmock/gmock.h>
-#include <sys/mman.h>
-#include <unistd.h>
 #include <zosplatform/error.h>
 
 #include <memory>
@@ -16,13 +14,13 @@
 #include <vector>
 
 #include "cloud/box/box.h"
-#include "core/handle.h"
 #include "core/json.h"
 #include "core/paths.h"
 #include "http/api_handler.h"
 #include "support/cloudsim/cloudsim.h"
 #include "support/profiles.h"
 #include "support/seams.h"
+#include "support/transfer_bytes.h"
 #include "support/xattrtree/xattrtree.h"
 #include "zyrovfs/cloud_utils.h"
 
@@ -139,51 +137,6 @@ class BoxTest : public profiles::ProfileTest {
     XattrTree tree{"/tmp/box_tree"};
     cloudsim::Tokens granted;
     std::unique_ptr<Box> box;
-};
-
-/** The bytes of one upload or download, and a callback that behaves as a test wants. */
-struct Bytes {
-    explicit Bytes(int direction, const std::string& content = "")
-        : file(memfd_create("bytes", 0)),
-          xfer{direction == 1 ? &Bytes::Read : &Bytes::Write, direction, &context} {
-        now = this;
-        EXPECT_EQ(write(file.Get(), content.data(), content.size()),
-                  static_cast<ssize_t>(content.size()));
-        lseek(file.Get(), 0, SEEK_SET);
-        context.fd = file.Get();
-    }
-
-    static size_t Read(char* data, size_t size, size_t count, void*) {
-        if (now->cancel_at >= 0 && now->calls++ >= now->cancel_at) {
-            YLIBCErrSetEx(0xa600, "test", 1);
-            return CURL_READFUNC_ABORT;
-        }
-        return static_cast<size_t>(read(now->file.Get(), data, size * count));
-    }
-
-    static size_t Write(char* data, size_t size, size_t count, void*) {
-        now->context.can_retry = false;
-        if (now->cancel_at >= 0 && now->calls++ >= now->cancel_at) {
-            YLIBCErrSetEx(0xa600, "test", 1);
-            return 0;
-        }
-        if (now->impatient != nullptr) {
-            // The next second of silence is one too many.
-            curl_easy_setopt(now->impatient, CURLOPT_LOW_SPEED_LIMIT, 1000L);
-            curl_easy_setopt(now->impatient, CURLOPT_LOW_SPEED_TIME, 1L);
-        }
-        now->received.append(data, size * count);
-        return size * count;
-    }
-
-    static inline Bytes* now = nullptr;
-    UniqueFd file;
-    std::string received;
-    XferContext context;
-    XferData xfer;
-    int cancel_at = -1;  ///< number of the call that the user's cancel meets
-    int calls = 0;
-    CURL* impatient = nullptr;
 };
 
 }  // namespace ZYROCloud

@@ -1,0 +1,213 @@
+#include <algorithm>
+
+#include "cloud/answer_header.h"
+#include "cloud/attempt.h"
+#include "cloud/guard.h"
+#include "cloud/onedrive/onedrive.h"
+#include "cloud/onedrive/onedrive_api.h"
+#include "cloud/request.h"
+#include "cloud/upload_body.h"
+#include "core/handle.h"
+#include "core/json.h"
+#include "core/log.h"
+#include "http/api_handler.h"
+
+namespace ZYROCloud {
+
+using namespace ZYROVFS;
+using namespace onedrive;
+
+namespace {
+
+/** "bytes FIRST-LAST/TOTAL". */
+std::string RangeText(long long offset, long long length, long long total) {
+    return "bytes " + std::to_string(offset) + "-" + std::to_string(offset + length - 1) + "/" +
+           std::to_string(total);
+}
+
+/** Bytes of the file that the service has, by its last answer; 0 when it does not say. */
+long long Received(const APIHandler* api) {
+    int64_t received = 0;
+    if (api != nullptr) {
+        json::toInt64(AnswerHeader(*api, kReceived), received);
+    }
+    return std::max<int64_t>(received, 0);
+}
+
+}  // namespace
+
+bool OneDrive::StartUploadSession(const std::string& url, std::string& session) {
+    return Guard(*this, [&] {
+        Request request(*this, kFrame);
+        request.To(kBitsMethod, url)
+            .Header(kPacketType, "Create-Session")
+            .Header(kSupportedProtocols, kBitsProtocol)
+            .Retries(0);
+        if (!request.Send()) {
+            return false;
+        }
+        const std::string id = AnswerHeader(*api, kSessionId);
+        if (!id.empty()) {
+            session = id;
+        }
+        return !id.empty();
+    });
+}
+
+bool OneDrive::CloseUploadSession(const std::string& url, const std::string& session) {
+    return Request(*this, kFrame)
+        .To(kBitsMethod, url)
+        .Header(kPacketType, "Close-Session")
+        .Header(kSessionId, session)
+        .Header("Content-Length", 0)
+        .Retries(0)
+        .Send();
+}
+
+bool OneDrive::StartUpload(XferData* xfer, const std::string& url, const std::string& session,
+                           long long* offset, long long length, long long total) {
+    return Guard(*this, [&] {
+        const std::string range = RangeText(*offset, length, total);
+        // The service's word counts, however the request ended: that is where a repeat begins.
+        const ScopeExit believe([&] {
+            const long long received = Received(api);
+            *offset += length;
+            if (received > *offset) {
+                LOG_ERROR("Wrong size, %llu, %llu", static_cast<unsigned long long>(received),
+                          static_cast<unsigned long long>(*offset));
+                return;
+            }
+            *offset = received;
+        });
+        Request request(*this, kFrame);
+        request.To(kBitsMethod, url)
+            .Header(kPacketType, "Fragment")
+            .Header(kSessionId, session)
+            .Header("Content-Length", static_cast<Json::Int64>(length))
+            .Header("Content-Range", range);
+        return request.Prepare(xfer) && SendFragment(xfer, url, length);
+    });
+}
+
+bool OneDrive::SendFragment(XferData* xfer, const std::string& url, long long length) {
+    if (xfer == nullptr || xfer->context == nullptr || !api->SetUploadOpt(false) ||
+        // With the length as a header alone the body would go out in chunks, too.
+        !api->SetUploadSize(length)) {
+        SetError(VFS_ERR_CLOUD_FAILED, "");
+        return false;
+    }
+    xfer->context->chunk_size = static_cast<unsigned int>(length);
+    xfer->context->chunk_left = static_cast<unsigned int>(length);
+    if (SendUpload(*this, *xfer)) {
+        return true;
+    }
+    SetError(api->GetError());
+    LOG_ERROR(kRequestFailed, url.c_str(), json::toString(GetError()).c_str());
+    LOG_ERROR("%s", json::toString(api->GetHeaderResponse()).c_str());
+    return false;
+}
+
+namespace {
+
+/** One file on its way through a session. */
+class Fragments {
+  public:
+    Fragments(OneDrive& drive, XferData& xfer, const std::string& url, const std::string& session,
+              long long total)
+        : drive_(drive), xfer_(xfer), url_(url), session_(session), total_(total) {}
+
+    bool Send(long long length) {
+        if (position_ != offset_ && !GoOn()) {
+            return false;
+        }
+        AttemptPlan plan;
+        plan.send = [this, length] { return SendOnce(length); };
+        plan.judge = [this](__tag_vfs_err_ code) {
+            // Going back to where the service wants to go on cures a wrong range.
+            return JudgeRenewing(drive_, *xfer_.context, code, code == VFS_ERR_RANGE_FAILED);
+        };
+        plan.rewind = [this] { return GoBack(); };
+        plan.copy = CopyError::kAtEnd;
+        plan.retry = "Retry chunk upload";
+        plan.refused = kRefused;
+        plan.exhausted = kNoAttemptLeft;
+        plan.what = &url_;
+        return RunAttempts(drive_, plan);
+    }
+
+    bool Close() {
+        if (offset_ < total_) {
+            LOG_ERROR("The service has %lld of %lld bytes", offset_, total_);
+        }
+        return drive_.CloseUploadSession(url_, session_);
+    }
+
+  private:
+    static constexpr const char* kRefused = "Chunk upload failed and do not retry";
+
+    /** What the service has of a failed attempt it keeps, and a repeat goes that much further: but
+     * not beyond the file. */
+    bool SendOnce(long long length) {
+        const long long size = std::min(length, total_ - offset_);
+        if (size <= 0) {
+            return true;  // an answer was lost, and no bytes
+        }
+        position_ = offset_ + size;
+        return drive_.StartUpload(&xfer_, url_, session_, &offset_, size, total_);
+    }
+
+    bool GoBack() {
+        if (SeekSource(xfer_.context->fd, offset_,
+                       "Failed to seek file to back to last position, %m")) {
+            return true;
+        }
+        drive_.SetError(drive_.GetAPIHandler()->GetError());
+        return false;
+    }
+
+    /** The service has stored less than it was sent, and the next fragment begins there. */
+    bool GoOn() {
+        if (xfer_.context->fd != -1) {
+            return GoBack();
+        }
+        // What it lacks of a stream is gone, and what follows must not take its place.
+        drive_.SetError(VFS_ERR_RANGE_FAILED, "");
+        LOG_ERROR("%s", kRefused);
+        return false;
+    }
+
+    OneDrive& drive_;
+    XferData& xfer_;
+    const std::string& url_;
+    const std::string& session_;
+    const long long total_;
+    long long offset_ = 0;    ///< bytes that the service has
+    long long position_ = 0;  ///< where the source stands behind the last fragment
+};
+
+}  // namespace
+
+bool OneDrive::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
+    return Guard(*this, [&] {
+        const std::string url = meta.get("url", "").asString();
+        int64_t total = 0;
+        json::toInt64(meta.get("total_bytes", 0), total);
+        std::string session;
+        if (url.empty() || xfer == nullptr || xfer->context == nullptr ||
+            !StartUploadSession(url, session)) {
+            return false;
+        }
+        if (total < 0) {
+            LOG_ERROR("Wrong size when uploading");
+            return false;
+        }
+        xfer->context->limited = true;
+        Fragments file(*this, *xfer, url, session, total);
+        return ForEachChunk(
+            static_cast<unsigned long long>(total), kMostAtOnce,
+            [&](unsigned long long length) { return file.Send(static_cast<long long>(length)); },
+            [&] { return file.Close(); });
+    });
+}
+
+}  // namespace ZYROCloud

@@ -1,0 +1,98 @@
+/**
+ * Copies and moves of drivers that know items by id: from two server paths to the ids that the
+ * service wants. A driver has GetFileIDByPath and, for the rest, the operations that are used here.
+ */
+#ifndef ZYROVFS_CLOUD_TARGET_H
+#define ZYROVFS_CLOUD_TARGET_H
+
+#include <json/value.h>
+
+#include <string>
+
+#include "cloud/conflict.h"
+#include "cloud/path_walk.h"
+#include "core/log.h"
+#include "zyrovfs/cloud.h"
+
+namespace ZYROCloud {
+
+/** The folder and the name of a server path. VFS_ERR_NOT_FOUND, logged, for one without a slash. */
+inline bool CutTarget(Cloud& cloud, const std::string& path, std::string& parent, std::string& name,
+                      ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here()) {
+    if (CutAtLastSlash(path, parent, name)) {
+        return true;
+    }
+    cloud.SetError(ZYROVFS::VFS_ERR_NOT_FOUND, "");
+    LOG_ERROR_AT(at, "Failed to find / from [%s]", path.c_str());
+    return false;
+}
+
+/** The item at `from` and the folder that `to` is in. VFS_ERR_NOT_FOUND. */
+template <typename Driver>
+bool FindCopyIds(Driver& driver, const std::string& from, const std::string& to, std::string& id,
+                 std::string& parent_id, ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here()) {
+    std::string parent;
+    std::string name;
+    id = driver.GetFileIDByPath(from);
+    if (!CutTarget(driver, to, parent, name, at)) {
+        return false;
+    }
+    parent_id = driver.GetFileIDByPath(parent);
+    if (id.empty() || parent_id.empty()) {
+        driver.SetError(ZYROVFS::VFS_ERR_NOT_FOUND, "");
+        return false;
+    }
+    return true;
+}
+
+/**
+ * ReplaceFile by the driver's own operations. An item is never deleted to be replaced by itself:
+ * when `find` comes upon `id`, the source of the copy, the error of the conflict stays.
+ */
+template <typename Driver, typename Find, typename Again>
+bool ReplaceItem(Driver& driver, const std::string& id, Find find, Again again) {
+    return ReplaceFile(
+        driver, find, [&](const Json::Value& item) { return driver.IsDir(item); },
+        [&](const Json::Value& item) {
+            const std::string rival = driver.GetFileID(item);
+            return rival != id && driver.Delete(rival);
+        },
+        again);
+}
+
+/** Moves the item at `from` into the folder that `to` is in, by the driver's move of ids. Its name
+ * stays. VFS_ERR_NOT_FOUND. */
+template <typename Driver>
+bool MoveByPath(Driver& driver, const std::string& from, const std::string& to,
+                ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here()) {
+    std::string old_parent;
+    std::string new_parent;
+    std::string name;
+    const std::string id = driver.GetFileIDByPath(from);
+    if (id.empty()) {
+        driver.SetError(ZYROVFS::VFS_ERR_NOT_FOUND, "");
+        return false;
+    }
+    if (!CutTarget(driver, from, old_parent, name, at) ||
+        !CutTarget(driver, to, new_parent, name, at)) {
+        return false;
+    }
+    const std::string old_id = driver.GetFileIDByPath(old_parent);
+    return driver.Move(old_id, id, driver.GetFileIDByPath(new_parent));
+}
+
+/** The id that a walk of the remote tree finds. VFS_ERR_NOT_FOUND, whatever stood in the way. */
+template <typename Walk>
+bool FindOnServer(Cloud& cloud, Walk walk, std::string& out) {
+    std::string id;
+    if (!walk(id) || id.empty()) {
+        cloud.SetError(ZYROVFS::VFS_ERR_NOT_FOUND, "");
+        return false;
+    }
+    out = id;
+    return true;
+}
+
+}  // namespace ZYROCloud
+
+#endif
