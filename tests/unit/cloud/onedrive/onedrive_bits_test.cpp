@@ -186,6 +186,28 @@ TEST_F(OneDriveBits, AFailureWithoutTheServicesWordIsSentAgainFromTheVeryStart) 
     EXPECT_TRUE(seams::Logged("Wrong size, 41943040, 8388608")) << seams::LogDump();
 }
 
+TEST_F(OneDriveBits, ARepeatFromTheStartTellsWhereTheServiceIsAndTheRestFollows) {
+    // The service has the first 32 MiB; of the second fragment it got nothing, or half, or all.
+    Give({opened, Has(kFirst), Answer(500), Has(kFirst), Has(kTotal), ok});
+    EXPECT_TRUE(Upload()) << seams::LogDump();
+    EXPECT_THAT(Ranges(),
+                ElementsAre("bytes 0-33554431/41943040", "bytes 33554432-41943039/41943040",
+                            "bytes 0-8388607/41943040", "bytes 33554432-41943039/41943040"));
+    EXPECT_TRUE(IsPart(4, kFirst, kTotal - kFirst));
+
+    lseek(file.Get(), 0, SEEK_SET);
+    Give({opened, Has(kFirst), Answer(500), Has(kFirst + kMiB, 416), Has(kTotal), ok});
+    EXPECT_TRUE(Upload()) << seams::LogDump();
+    EXPECT_EQ(Ranges().back(), "bytes 34603008-41943039/41943040");
+    EXPECT_TRUE(IsPart(4, kFirst + kMiB, kTotal - kFirst - kMiB));
+
+    lseek(file.Get(), 0, SEEK_SET);
+    Give({opened, Has(kFirst), Answer(500), Has(kTotal), ok});
+    EXPECT_TRUE(Upload()) << seams::LogDump();
+    EXPECT_EQ(Ranges().back(), "bytes 0-8388607/41943040");
+    EXPECT_FALSE(seams::LoggedPart("The service has ")) << seams::LogDump();
+}
+
 TEST_F(OneDriveBits, AnAnswerThatIsLostIsAskedForAgain) {
     Serve({{wire::ReadRequest(), wire::Send(opened), wire::ReadRequest(), wire::Reset()},
            Answering({Has(kFirst), Has(kTotal), ok})});
