@@ -87,6 +87,7 @@ class OneDrive : public Service {
         Account* account = nullptr;
         std::vector<std::string> path;
         uint64_t total = 0, next = 0;
+        uint64_t replaced = 0;  ///< size of the file that was there
         std::unique_ptr<Sink> sink;
     };
     struct Window {

@@ -42,6 +42,12 @@ std::string MakeGuid() {
     return guid + "}";
 }
 
+bool SamePath(const std::vector<std::string>& a, const std::vector<std::string>& b) {
+    return std::equal(
+        a.begin(), a.end(), b.begin(), b.end(),
+        [](const std::string& x, const std::string& y) { return FoldCase(x) == FoldCase(y); });
+}
+
 }  // namespace
 
 /** Storage knows files by their path below the user's folder: /users/0xCID/LiveFolders/PATH. */
@@ -151,11 +157,12 @@ Reply OneDriveBits::Create() {
         return BitsError(400, kInvalid);
     }
     drive_.CheckName(path_.back());
-    Target(Parent());
+    const Node* old = Target(Parent());
     const std::string id = MakeGuid();
     Session& session = drive_.sessions_[id];
     session.account = &account_;
     session.path = path_;
+    session.replaced = old == nullptr ? 0 : old->Size();
     session.sink = drive_.NewSink();
     return Acknowledge(201)
         .With("BITS-Protocol", std::string("{") + kProtocol + "}")
@@ -197,7 +204,7 @@ void OneDriveBits::CheckRange(const Session& session, const Range& range) const 
     if (wanted > drive_.drive_options_.fragment_limit || range.total > account_.MaxUpload()) {
         Refuse(500, kTooLarge);
     }
-    if (drive_.tree_.Used(account_) + range.total > account_.Quota()) {
+    if (drive_.tree_.Used(account_) - session.replaced + range.total > account_.Quota()) {
         Refuse(500, kDiskFull);
     }
 }
@@ -231,7 +238,7 @@ Reply OneDriveBits::Take(Session& session, const Range& range) {
 /** The file appears, whole, when its session is closed. */
 Reply OneDriveBits::Close() {
     Session& session = Known();
-    if (session.next != session.total || session.path != path_) {
+    if (session.next != session.total || !SamePath(session.path, path_)) {
         return BitsError(400, kInvalid);
     }
     Node& parent = Parent();
