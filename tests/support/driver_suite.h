@@ -66,6 +66,8 @@ struct Capabilities {
     unsigned long long largest_direct = 0;  ///< sent in one request; 0: all are
     /** An upload whose token was refused goes through within the same call. */
     bool upload_survives_refusal = false;
+    /** How an upload ends that no token can be had for. */
+    __tag_vfs_err_ upload_without_token = VFS_ERR_UNAUTHORIZED;
     bool repeats_bad_answers = false;  ///< an answer that is no JSON is asked for again
     std::vector<StatusCase> statuses;
 };
@@ -91,6 +93,7 @@ std::ostream& operator<<(std::ostream& to, Op op);
 /** Beginning of the request of an operation on the stage, as faults and the journal take it. */
 struct Endpoint {
     std::string method, path;
+    bool exact = false;  ///< nothing behind it is another operation's
 };
 
 /** One service as the suite needs it. Paths are those of the account. */
@@ -107,13 +110,11 @@ class Rig {
     virtual std::string AccountInfo() { return "{}"; }
 
     /** Makes the mounted tree know what the account has at `path`. */
-    virtual void Show(XattrTree& tree, const std::string& path) {
-        tree.Set(path, "id::file", IdOf(path));
-    }
+    virtual void Show(XattrTree& tree, const std::string& path);
     /** The driver's own name for the item at `path`. */
     virtual std::string IdOf(const std::string& path) = 0;
     /** Address that ranged reads of `path` take. */
-    virtual std::string Address(PublicCloud& cloud, const std::string& path) = 0;
+    virtual std::string Address(const std::string& path) = 0;
 
     virtual std::string ItemName(const Json::Value& item) = 0;
     virtual std::string ItemId(PublicCloud& cloud, const Json::Value& item) = 0;

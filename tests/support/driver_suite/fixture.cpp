@@ -18,6 +18,12 @@ std::ostream& operator<<(std::ostream& to, Op op) {
     return to << kNames[static_cast<int>(op)];
 }
 
+void Rig::Show(XattrTree& tree, const std::string& path) {
+    for (const auto& [name, value] : Sim().Attributes(*amy, amy->Get(amy->Find(path)))) {
+        tree.Set(path, name, value);
+    }
+}
+
 DriverTest::DriverTest()
     : rig(GetParam()()),
       can(rig->Can()),
@@ -142,7 +148,11 @@ Fault DriverTest::On(Op op) const {
 
 size_t DriverTest::Count(Op op) const {
     const Endpoint& at = endpoints[static_cast<size_t>(op)];
-    return sim.Journal().Count(at.method, at.path);
+    size_t count = 0;
+    for (const cloudsim::JournalEntry& entry : sim.Journal().Find(at.method, at.path)) {
+        count += !at.exact || entry.Path() == at.path ? 1 : 0;
+    }
+    return count;
 }
 
 bool DriverTest::Upload(Source& source, const std::string& path) {

@@ -145,20 +145,34 @@ TEST_P(DriverItems, AWalkFindsNamesInAnotherCaseWhereTheServiceTakesThemForOne) 
     EXPECT_EQ(id, can.folds_case ? Id("/docs/Übung ΣΔ.txt") : "");
 }
 
-TEST_P(DriverItems, NamesakesAreAllListed) {
+TEST_P(DriverItems, NamesakesAreAllListedAndNoneIsTakenForThePath) {
     if (!can.namesakes) {
         GTEST_SKIP() << "one item of a name";
     }
+    constexpr unsigned kMany = 500;
     const std::string folder = amy.Find("/target");
-    for (int i = 0; i < 10000; i++) {
+    for (unsigned i = 0; i < kMany; i++) {
         amy.AddFile(folder, "same.txt", "");
     }
     Json::Value out;
     EXPECT_TRUE(cloud->ListFolder(Id("/target"), kNoParams, out)) << seams::LogDump();
-    EXPECT_EQ(out.size(), 10000U);
+    EXPECT_EQ(out.size(), kMany);
     std::string id;
-    EXPECT_TRUE(rig->Resolve(*cloud, "/target/same.txt", id)) << seams::LogDump();
-    EXPECT_NE(id, "");
+    EXPECT_FALSE(rig->Resolve(*cloud, "/target/same.txt", id));
+    EXPECT_EQ(Code(), VFS_ERR_NOT_FOUND);
+    EXPECT_EQ(id, "");
+}
+
+TEST_P(DriverItems, APageOfTenThousandItemsOfOneNameIsListedWhole) {
+    std::string items;
+    for (int i = 0; i < 10000; i++) {
+        items +=
+            (i == 0 ? "" : ",") + rig->ItemText("\"same.txt\"", "x" + std::to_string(i), false);
+    }
+    Add(On(Op::kList).Body(rig->PageText(items)));
+    Json::Value out;
+    EXPECT_TRUE(cloud->ListFolder(Id("/docs"), kNoParams, out)) << seams::LogDump();
+    EXPECT_EQ(out.size(), 10000U);
 }
 
 }  // namespace driver_suite

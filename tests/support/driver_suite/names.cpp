@@ -105,7 +105,9 @@ TEST_P(DriverNames, TheServiceHasTheLastWordOnNamesOfAnyLength) {
         EXPECT_TRUE(made || Code() != VFS_ERR_NONE) << length;
         Restore();
         const bool renamed = cloud->Rename(Id("/docs/a.txt"), name);
-        EXPECT_EQ(amy.Exists("/docs/a.txt"), !renamed) << length << seams::LogDump();
+        EXPECT_EQ(amy.List(amy.Find("/docs")).size(), 1U) << length;
+        // An empty name may also be taken for none.
+        EXPECT_TRUE(length == 0 || amy.Exists("/docs/a.txt") == !renamed) << length;
         Restore();
     }
 }
@@ -180,7 +182,7 @@ TEST_P(DriverNames, APageThatIsItsOwnNextOneEndsTheListingWithALine) {
     if (page.empty()) {
         GTEST_SKIP() << "pages have no names";
     }
-    Add(On(Op::kList).Forever().Body(page));
+    Add(On(Op::kList).Forever().Answer(200, page));
     Json::Value out;
     EXPECT_FALSE(cloud->ListFolder(Id("/docs"), kNoParams, out));
     EXPECT_EQ(Code(), VFS_ERR_CLOUD_FAILED);

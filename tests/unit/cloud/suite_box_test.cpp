@@ -1,7 +1,7 @@
 /** The suite of all drivers, for Box. */
 #include "cloud/box/box.h"
 #include "support/cloudsim/cloudsim.h"
-#include "support/driver_suite.h"
+#include "support/driver_suite/rig_of.h"
 
 namespace driver_suite {
 namespace {
@@ -12,50 +12,42 @@ Capabilities BoxCan() {
     can.page_size = 1000;
     can.largest_file = 262144000;
     can.refused_file = 5368709121;
-    can.statuses = {{403, VFS_ERR_FORBIDDEN, false},     {404, VFS_ERR_NOT_FOUND, false},
-                    {405, VFS_ERR_NOT_SUPPORTED, false}, {412, VFS_ERR_BAD_REQUEST, false},
-                    {429, VFS_ERR_RATE_LIMITED, true},   {500, VFS_ERR_SERVER_ERROR, true},
+    can.statuses = {{400, VFS_ERR_TOKEN_REVOKED, false},
+                    {400, VFS_ERR_INVALID_NAME, false, R"({"code":"item_name_invalid"})"},
+                    {403, VFS_ERR_FORBIDDEN, false},
+                    {404, VFS_ERR_NOT_FOUND, false},
+                    {405, VFS_ERR_NOT_SUPPORTED, false},
+                    {412, VFS_ERR_BAD_REQUEST, false},
+                    {429, VFS_ERR_RATE_LIMITED, true},
+                    {500, VFS_ERR_SERVER_ERROR, true},
                     {503, VFS_ERR_SERVER_ERROR, true}};
     return can;
 }
 
-class BoxRig : public Rig {
+class BoxRig : public KnowingRigOf<Box, cloudsim::BoxService> {
   public:
     const Capabilities& Can() const override {
         static const Capabilities kCan = BoxCan();
         return kCan;
     }
-    cloudsim::Service& Sim() override { return sim_; }
     Json::Value Hosts() override {
         Json::Value hosts;
         hosts["BoxApiHost"] = sim_.ApiHost();
         hosts["BoxUploadHost"] = sim_.UploadHost();
         return hosts;
     }
-    std::unique_ptr<PublicCloud> NewDriver(unsigned uid, const Json::Value& profile) override {
-        return std::make_unique<Box>(uid, profile);
-    }
-
     std::string IdOf(const std::string& path) override {
-        const cloudsim::Item item = amy->Get(amy->Find(path));
+        const cloudsim::Item item = ItemAt(path);
         return (item.folder ? "folders/" : "files/") + item.id;
     }
-    std::string Address(PublicCloud&, const std::string& path) override {
+    std::string Address(const std::string& path) override {
         return sim_.ApiHost() + "/2.0/" + IdOf(path) + "/content";
     }
-
-    std::string ItemName(const Json::Value& item) override { return item["name"].asString(); }
-    std::string ItemId(PublicCloud& cloud, const Json::Value& item) override {
-        return Driver(cloud).GetFileID(item);
-    }
-    bool IsFolder(PublicCloud& cloud, const Json::Value& item) override {
-        return Driver(cloud).IsDir(item);
-    }
     bool Resolve(PublicCloud& cloud, const std::string& path, std::string& id) override {
-        return Driver(cloud).GetFileIDByPathFromServer("", path, "", "", id);
+        return Of(cloud).GetFileIDByPathFromServer("", path, "", "", id);
     }
     bool MoveInto(PublicCloud& cloud, const std::string& path, const std::string& folder) override {
-        return Driver(cloud).Move("", IdOf(path), IdOf(folder));
+        return Of(cloud).Move("", IdOf(path), IdOf(folder));
     }
 
     Endpoint At(Op op) override {
@@ -95,11 +87,6 @@ class BoxRig : public Rig {
     std::string PageText(const std::string& items) override {
         return "{\"total_count\":1,\"entries\":[" + items + "]}";
     }
-
-  private:
-    static Box& Driver(PublicCloud& cloud) { return static_cast<Box&>(cloud); }
-
-    cloudsim::BoxService sim_;
 };
 
 std::unique_ptr<Rig> MakeRig() {
