@@ -22,12 +22,6 @@ namespace {
 constexpr unsigned kLookAfter = 3;
 constexpr int kCatchUp = 10;
 
-uint64_t TotalBytes(const Json::Value& meta) {
-    uint64_t total = 0;
-    json::toUInt64(meta["total_bytes"], total);
-    return total;
-}
-
 std::string ServerPath(const Json::Value& meta) {
     return meta.get("server_path", "").asString();
 }

@@ -120,13 +120,18 @@ class Fragments {
         if (position_ != offset_ && !GoOn()) {
             return false;
         }
+        begin_ = start_ = offset_;
         end_ = std::min(offset_ + length, total_);
         if (!SendWithRetries(length)) {
             return false;
         }
-        // A fragment whose answer was lost has been sent again from the start of the file, and the
-        // service has said where it really is.
-        return !Believe() || offset_ == end_ || (GoBack() && SendWithRetries(end_ - offset_));
+        if (start_ >= begin_) {
+            return true;
+        }
+        // An answer was lost, and with it where to go on: what went out was the start of the file,
+        // which the service knows. It has said where it really is; the fragment itself follows.
+        Believe();
+        return offset_ < begin_ || offset_ >= end_ || (GoBack() && SendWithRetries(end_ - offset_));
     }
 
     bool Close() {
@@ -165,19 +170,15 @@ class Fragments {
             return true;  // an answer was lost, and no bytes
         }
         const long long size = std::min(length, total_ - offset_);
+        start_ = offset_;
         position_ = offset_ + size;
         return drive_.StartUpload(&xfer_, url_, session_, &offset_, size, total_);
     }
 
-    /** Goes to where the service says it is, beyond what was repeated and within what has been sent
-     * of the file. False when it says no such thing. */
-    bool Believe() {
-        const long long received = std::min(Received(drive_.GetAPIHandler()), end_);
-        if (received <= offset_) {
-            return false;
-        }
-        offset_ = received;
-        return true;
+    /** Goes to where the service says it is, beyond what was repeated, but not beyond what has been
+     * sent. */
+    void Believe() {
+        offset_ = std::max(offset_, std::min(Received(drive_.GetAPIHandler()), end_));
     }
 
     bool GoBack() {
@@ -207,7 +208,9 @@ class Fragments {
     const std::string& session_;
     const long long total_;
     long long offset_ = 0;    ///< bytes that the service has
-    long long end_ = 0;       ///< of the fragment under way, in the file
+    long long begin_ = 0;     ///< of the fragment under way, in the file
+    long long end_ = 0;       ///< of the same
+    long long start_ = 0;     ///< where the last attempt began
     long long position_ = 0;  ///< where the source stands behind the last fragment
 };
 

@@ -14,6 +14,7 @@
 #define ZYROVFS_TESTS_CLOUDSIM_CLOUDSIM_H
 
 #include "support/cloudsim/box.h"
+#include "support/cloudsim/dropbox.h"
 #include "support/cloudsim/gdrive.h"
 #include "support/cloudsim/onedrive.h"
 

@@ -124,6 +124,28 @@ class FileContent : public Summed {
     const uint64_t size_;
 };
 
+class JoinedContent : public Summed {
+  public:
+    explicit JoinedContent(std::vector<ContentPtr> pieces) : pieces_(std::move(pieces)) {
+        for (const ContentPtr& piece : pieces_) {
+            ends_.push_back(Size() + piece->Size());
+        }
+    }
+    uint64_t Size() const override { return ends_.empty() ? 0 : ends_.back(); }
+    int64_t Read(uint64_t offset, char* to, size_t size) const override {
+        const auto end = std::upper_bound(ends_.begin(), ends_.end(), offset);
+        if (end == ends_.end()) {
+            return 0;
+        }
+        const Content& piece = *pieces_[static_cast<size_t>(end - ends_.begin())];
+        return piece.Read(offset - (*end - piece.Size()), to, size);
+    }
+
+  private:
+    const std::vector<ContentPtr> pieces_;
+    std::vector<uint64_t> ends_;
+};
+
 class CountedContent : public Content {
   public:
     CountedContent(uint64_t size, std::string sum) : size_(size), sum_(std::move(sum)) {}
@@ -282,6 +304,10 @@ ContentPtr MakeFile(const std::string& path) {
     ContentPtr content = MakeFile(fd);
     close(fd);
     return content;
+}
+
+ContentPtr MakeJoined(std::vector<ContentPtr> pieces) {
+    return pieces.size() == 1 ? pieces.front() : std::make_shared<JoinedContent>(std::move(pieces));
 }
 
 }  // namespace cloudsim

@@ -6,6 +6,7 @@
 #include <memory>
 #include <mutex>
 #include <string>
+#include <vector>
 
 namespace cloudsim {
 
@@ -49,6 +50,8 @@ ContentPtr MakePattern(uint64_t size, unsigned seed = 0);
 /** Reads from an open file; keeps a descriptor of its own. Null when it isn't a regular file. */
 ContentPtr MakeFile(int fd);
 ContentPtr MakeFile(const std::string& path);
+/** One after the other. */
+ContentPtr MakeJoined(std::vector<ContentPtr> pieces);
 
 }  // namespace cloudsim
 

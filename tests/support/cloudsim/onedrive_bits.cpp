@@ -164,7 +164,8 @@ Reply OneDriveBits::Create() {
     session.path = path_;
     session.replaced = old == nullptr ? 0 : old->Size();
     session.sink = drive_.NewSink();
-    return Acknowledge(201)
+    // The protocol says 200, the service's description of it 201.
+    return Acknowledge(drive_.drive_options_.strict_bits ? 200 : 201)
         .With("BITS-Protocol", std::string("{") + kProtocol + "}")
         .With("BITS-Session-Id", id)
         .With("Accept-Encoding", "Identity");
@@ -196,9 +197,9 @@ OneDriveBits::Range OneDriveBits::ParseRange() const {
 }
 
 void OneDriveBits::CheckRange(const Session& session, const Range& range) const {
-    const auto length = ParseNumber(request_.Header("Content-Length"));
-    const uint64_t wanted = range.last - range.first + 1;
-    if ((session.total != 0 && session.total != range.total) || (length && *length != wanted)) {
+    const auto told = ParseNumber(request_.Header("Content-Length"));
+    const uint64_t wanted = range.last - range.first + 1, length = told.value_or(received_);
+    if ((session.total != 0 && session.total != range.total) || length != wanted) {
         Refuse(400, kInvalid);
     }
     if (wanted > drive_.drive_options_.fragment_limit || range.total > account_.MaxUpload()) {

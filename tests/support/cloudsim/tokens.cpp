@@ -63,7 +63,16 @@ Account* TokenStore::Owner(const std::string& access_token) const {
 
 void TokenStore::Expire(const std::string& access_token) {
     const std::lock_guard<std::mutex> lock(mutex_);
-    access_.erase(access_token);
+    const auto found = access_.find(access_token);
+    if (found != access_.end()) {
+        found->second.expires = 0;
+    }
+}
+
+bool TokenStore::IsExpired(const std::string& access_token) const {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    const auto found = access_.find(access_token);
+    return found != access_.end() && found->second.expires <= now_();
 }
 
 void TokenStore::Drop(Grants& grants, const Account& account) {
@@ -74,7 +83,9 @@ void TokenStore::Drop(Grants& grants, const Account& account) {
 
 void TokenStore::ExpireAll(const Account& account) {
     const std::lock_guard<std::mutex> lock(mutex_);
-    Drop(access_, account);
+    for (auto& [token, grant] : access_) {
+        grant.expires = grant.account == &account ? 0 : grant.expires;
+    }
 }
 
 void TokenStore::RevokeAll(const Account& account) {

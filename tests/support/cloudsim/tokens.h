@@ -26,6 +26,8 @@ class TokenStore {
 
     /** Null when the token is unknown, expired or withdrawn. */
     Account* Owner(const std::string& access_token) const;
+    /** Known, but its life is over, or it was withdrawn. */
+    bool IsExpired(const std::string& access_token) const;
     void Expire(const std::string& access_token);
     void ExpireAll(const Account& account);
     void RevokeAll(const Account& account);

@@ -1,11 +1,20 @@
-#include "unit/cloud/gdrive/gdrive_service.h"
+#include <functional>
+
+#include "unit/cloud/gdrive/gdrive_fixture.h"
 
 namespace ZYROCloud {
 namespace {
 
 using testing::SizeIs;
 
-class GDriveWrite : public GDriveServiceTest {
+constexpr const char* kFilesPath = "/drive/v2/files";
+
+/** The folder of an item, as a request tells it. */
+Json::Value Into(const std::string& id) {
+    return Object(R"([{"id":")" + id + "\"}]");
+}
+
+class GDriveWrite : public GDriveTest {
   protected:
     static std::string Item(const std::string& id, const std::string& action = "") {
         return std::string(kFilesPath) + "/" + id + action;
