@@ -26,12 +26,12 @@ struct DropboxTest : testing::Test {
     cloudsim::Account& bob = dropbox.AddAccount("bob@example.com");
     cloudsim::Client client{amy.IssueTokens().access_token};
 
-    Got Call(const std::string& function, const std::string& body) {
+    Got CallText(const std::string& function, const std::string& body) {
         client.headers = {"Content-Type: application/json"};
         return client.Send("POST", dropbox.ApiHost() + "/2/" + function, &body);
     }
     Got Call(const std::string& function, const Json::Value& body) {
-        return Call(function, cloudsim::OneLine(body));
+        return CallText(function, cloudsim::OneLine(body));
     }
     static Json::Value Path(const std::string& path) {
         Json::Value args;

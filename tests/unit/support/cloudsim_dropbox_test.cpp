@@ -10,7 +10,7 @@ using testing::IsEmpty;
 using testing::UnorderedElementsAre;
 
 TEST_F(DropboxTest, TellsTheTokensUserWhenAskedWithNull) {
-    const Got got = Call("users/get_current_account", "null");
+    const Got got = CallText("users/get_current_account", "null");
     EXPECT_EQ(200, got.status);
     EXPECT_EQ("amy@example.com", got.Json()["email"].asString());
     EXPECT_EQ("Amy Adams", got.Json()["name"]["display_name"].asString());
@@ -18,16 +18,16 @@ TEST_F(DropboxTest, TellsTheTokensUserWhenAskedWithNull) {
 }
 
 TEST_F(DropboxTest, RefusesAnObjectWhereNullIsWanted) {
-    const Got got = Call("users/get_current_account", "{}");
+    const Got got = CallText("users/get_current_account", "{}");
     EXPECT_EQ(400, got.status);
     EXPECT_THAT(got.body, HasSubstr("expected null, got value"));
-    EXPECT_EQ(400, Call("users/get_current_account", "").status);
+    EXPECT_EQ(400, CallText("users/get_current_account", "").status);
 }
 
 TEST_F(DropboxTest, TellsTheSpaceUsedAndAllowed) {
     amy.SetQuota(1000);
     amy.AddPath("/a/b.txt", "12345");
-    const Json::Value space = Call("users/get_space_usage", "null").Json();
+    const Json::Value space = CallText("users/get_space_usage", "null").Json();
     EXPECT_EQ(5u, space["used"].asUInt64());
     EXPECT_EQ("individual", space["allocation"][".tag"].asString());
     EXPECT_EQ(1000u, space["allocation"]["allocated"].asUInt64());
@@ -35,14 +35,14 @@ TEST_F(DropboxTest, TellsTheSpaceUsedAndAllowed) {
 
 TEST_F(DropboxTest, TellsAnExpiredTokenFromAnUnknownOne) {
     client.UseToken("nonsense");
-    EXPECT_EQ("401 invalid_access_token/", Summary(Call("users/get_space_usage", "null")));
+    EXPECT_EQ("401 invalid_access_token/", Summary(CallText("users/get_space_usage", "null")));
     client.UseToken(amy.IssueTokens(5).access_token);
-    EXPECT_EQ(200, Call("users/get_space_usage", "null").status);
+    EXPECT_EQ(200, CallText("users/get_space_usage", "null").status);
     dropbox.AdvanceClock(5);
-    EXPECT_EQ("401 expired_access_token/", Summary(Call("users/get_space_usage", "null")));
+    EXPECT_EQ("401 expired_access_token/", Summary(CallText("users/get_space_usage", "null")));
     client.UseToken(amy.IssueTokens().access_token);
     amy.ExpireAccessTokens();
-    EXPECT_EQ("401 expired_access_token/", Summary(Call("users/get_space_usage", "null")));
+    EXPECT_EQ("401 expired_access_token/", Summary(CallText("users/get_space_usage", "null")));
 }
 
 TEST_F(DropboxTest, ComplainsInPlainWordsOfARequestWithoutAToken) {
@@ -66,11 +66,11 @@ TEST_F(DropboxTest, ComplainsInPlainWordsOfArgumentsItCannotRead) {
         {"{\"path\":\"\",\"recursive\":1}", "recursive: expected boolean"},
     };
     for (const auto& [body, complaint] : wrong) {
-        const Got got = Call("files/list_folder", body);
+        const Got got = CallText("files/list_folder", body);
         EXPECT_EQ(400, got.status) << body;
         EXPECT_THAT(got.body, HasSubstr(complaint)) << body;
     }
-    EXPECT_EQ(400, Call("files/no_such_function", "{}").status);
+    EXPECT_EQ(400, CallText("files/no_such_function", "{}").status);
 }
 
 TEST_F(DropboxTest, RefusesABodyOfAnotherType) {
@@ -83,12 +83,12 @@ TEST_F(DropboxTest, RefusesABodyOfAnotherType) {
 
 TEST_F(DropboxTest, TellsHowLongToWaitWhileItIsThrottled) {
     dropbox.Throttle(7);
-    const Got got = Call("users/get_space_usage", "null");
+    const Got got = CallText("users/get_space_usage", "null");
     EXPECT_EQ("429 too_many_requests/", Summary(got));
     EXPECT_EQ("too_many_requests", got.Json()["error"]["reason"][".tag"].asString());
     EXPECT_THAT(got.head, testing::ContainsRegex("Retry-After: [67]\r"));
     dropbox.AdvanceClock(7);
-    EXPECT_EQ(200, Call("users/get_space_usage", "null").status);
+    EXPECT_EQ(200, CallText("users/get_space_usage", "null").status);
 }
 
 TEST_F(DropboxTest, KnowsAFunctionOnlyAtItsHost) {
@@ -153,6 +153,12 @@ TEST_F(DropboxTest, TellsMissingMalformedAndUnsupportedPathsApart) {
     const Got root = Call("files/get_metadata", Path(""));
     EXPECT_EQ(400, root.status);
     EXPECT_THAT(root.body, HasSubstr("root folder is unsupported"));
+}
+
+TEST_F(DropboxTest, SeveralSlashesInFrontOfAPathAreAsGoodAsOne) {
+    amy.AddPath("/docs/a.txt", "hello");
+    EXPECT_EQ(200, Call("files/get_metadata", Path("//docs/a.txt")).status);
+    EXPECT_THAT(Names(Call("files/list_folder", Path("//docs")).Json()), ElementsAre("a.txt"));
 }
 
 TEST_F(DropboxTest, ErrorsStandBelowTheSummaryAsUnions) {
@@ -279,7 +285,7 @@ TEST_F(DropboxTest, RenewsATokenAndKeepsTheRefreshTokenAsTheServiceDoes) {
     EXPECT_FALSE(got.Json().isMember("refresh_token"));
     EXPECT_EQ(200, AskForToken(client, dropbox, tokens.refresh_token, kLogin).status);
     client.UseToken(got.Json()["access_token"].asString());
-    EXPECT_EQ(200, Call("users/get_space_usage", "null").status);
+    EXPECT_EQ(200, CallText("users/get_space_usage", "null").status);
 }
 
 TEST_F(DropboxTest, RotatesRefreshTokensWhenToldTo) {
