@@ -12,8 +12,8 @@
 #include <sstream>
 #include <stdexcept>
 
-#include "support/cloudsim/main_mount.h"
 #include "support/cloudsim/main_service.h"
+#include "support/cloudsim/mounted_account.h"
 #include "support/test_certs.h"
 
 namespace {

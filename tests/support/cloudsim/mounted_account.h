@@ -1,7 +1,7 @@
 /** What the box's backend would show of an account: a tree of names with attributes of the items.
  */
-#ifndef ZYROVFS_TESTS_CLOUDSIM_MAIN_MOUNT_H
-#define ZYROVFS_TESTS_CLOUDSIM_MAIN_MOUNT_H
+#ifndef ZYROVFS_TESTS_CLOUDSIM_MOUNTED_ACCOUNT_H
+#define ZYROVFS_TESTS_CLOUDSIM_MOUNTED_ACCOUNT_H
 
 #include <map>
 #include <string>

@@ -1,4 +1,4 @@
-#include "support/cloudsim/main_mount.h"
+#include "support/cloudsim/mounted_account.h"
 
 namespace cloudsim {
 namespace {
