@@ -76,7 +76,7 @@ TEST_F(DropboxUpload, OfThirtyTwoMiBGoesDirectAndOneByteMoreBySession) {
     EXPECT_TRUE(Upload(content, "/\"b\".txt")) << seams::LogDump();
     EXPECT_THAT(Requests(), ElementsAre(kStart, kAppend, kAppend, kFinish));
     const std::vector<Arrived> all = All();
-    EXPECT_FALSE(all[0].Has("Dropbox-API-Arg"));
+    EXPECT_EQ(all[0].Argument(), Object("{}"));
     EXPECT_TRUE(all[0].body.empty());
     EXPECT_EQ(all[1].Argument(), Object(R"({"cursor":{"session_id":"s","offset":0}})"));
     EXPECT_TRUE(all[1].body == content.substr(0, kPiece));
