@@ -106,12 +106,11 @@ bool Dropbox::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
 
 bool Dropbox::StartChunkUploadSession(std::string& out) {
     return Guard(*this, [&] {
-        // There is nothing to say, but a request for contents without arguments is refused.
-        const Json::Value no_arguments(Json::objectValue);
         Json::Value answer;
+        // The service wants an argument even of calls that need none.
         if (!Request(*this, kContentFrame)
                  .To("POST", Content("upload_session/start"))
-                 .Header(kArgument, no_arguments)
+                 .Header(kArgument, Json::Value(Json::objectValue))
                  .Send(answer)) {
             return false;
         }
