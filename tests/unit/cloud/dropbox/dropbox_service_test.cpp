@@ -161,6 +161,35 @@ TEST_F(DropboxService, AnAnswerLostAfterAPieceWasTakenLeavesNoFile) {
     EXPECT_FALSE(amy.Exists("/a.txt"));
 }
 
+TEST_F(DropboxService, ALostAnswerToTheBeginningOfASessionBeginsAnotherOne) {
+    service.AddFault(Fault::On("POST", "/2/files/upload_session/start").LoseAnswer());
+    EXPECT_TRUE(Upload(std::string(kPiece + 1, 'x'), "/a.txt")) << seams::LogDump();
+    EXPECT_EQ(Stored("/a.txt").size(), kPiece + 1);
+    EXPECT_EQ(service.Journal().Count("POST", "/2/files/upload_session/start"), 2U);
+}
+
+TEST_F(DropboxService, ALostAnswerToTheCommitIsAFailureAndTheFileIsThere) {
+    service.AddFault(Fault::On("POST", "/2/files/upload_session/finish").LoseAnswer());
+    EXPECT_FALSE(Upload(std::string(kPiece + 1, 'x'), "/a.txt"));
+    EXPECT_NE(drive->GetErrorCode(), VFS_ERR_NONE);
+    EXPECT_EQ(Stored("/a.txt").size(), kPiece + 1) << service.Journal().Text();
+    EXPECT_EQ(service.Journal().Count("POST", "/2/files/upload_session/finish"), 2U);
+}
+
+TEST_F(DropboxService, ASessionThatIsGoneEndsTheUpload) {
+    std::string session;
+    Bytes bytes(1, "hello");
+    unsigned long long offset = 0;
+    ASSERT_TRUE(drive->StartChunkUploadSession(session));
+    service.AdvanceClock(8 * 24 * 3600);
+    Renew();
+    EXPECT_FALSE(drive->StartChunkUpload(&bytes.xfer, session, &offset, 5));
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_NOT_FOUND) << seams::LogDump();
+    EXPECT_EQ(offset, 0U);
+    EXPECT_FALSE(drive->CommitChunkUpload(session, "/a.txt", 0));
+    EXPECT_FALSE(amy.Exists("/a.txt"));
+}
+
 TEST_F(DropboxService, ACopyBetweenAccountsMovesNoBytesThroughHere) {
     cloudsim::Account& bob = service.AddAccount("bob@example.com", "Bob Roe");
     amy.AddPath("/a.txt", "hello");
