@@ -196,7 +196,9 @@ TEST_F(DropboxUpload, ThatTheUserCancelsIsNotRepeated) {
     bytes.cancel_at = 2;
     EXPECT_FALSE(Upload(bytes, 3000000));
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CANCELLED);
-    EXPECT_EQ(server->Connections(), 1U);
+    // It may be over before the server has seen the connection.
+    EXPECT_LE(server->Connections(), 1U);
+    EXPECT_THAT(seams::Sleeps(), IsEmpty());
 }
 
 TEST_F(DropboxUpload, OfACancelledDriverIsNotSent) {
