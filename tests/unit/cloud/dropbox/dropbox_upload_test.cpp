@@ -76,7 +76,7 @@ TEST_F(DropboxUpload, OfThirtyTwoMiBGoesDirectAndOneByteMoreBySession) {
     EXPECT_TRUE(Upload(content, "/\"b\".txt")) << seams::LogDump();
     EXPECT_THAT(Requests(), ElementsAre(kStart, kAppend, kAppend, kFinish));
     const std::vector<Arrived> all = All();
-    EXPECT_FALSE(all[0].Has("Dropbox-API-Arg"));
+    EXPECT_EQ(all[0].Argument(), Object("{}"));
     EXPECT_TRUE(all[0].body.empty());
     EXPECT_EQ(all[1].Argument(), Object(R"({"cursor":{"session_id":"s","offset":0}})"));
     EXPECT_TRUE(all[1].body == content.substr(0, kPiece));
@@ -196,7 +196,9 @@ TEST_F(DropboxUpload, ThatTheUserCancelsIsNotRepeated) {
     bytes.cancel_at = 2;
     EXPECT_FALSE(Upload(bytes, 3000000));
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CANCELLED);
-    EXPECT_EQ(server->Connections(), 1U);
+    // It may be over before the server has seen the connection.
+    EXPECT_LE(server->Connections(), 1U);
+    EXPECT_THAT(seams::Sleeps(), IsEmpty());
 }
 
 TEST_F(DropboxUpload, OfACancelledDriverIsNotSent) {
