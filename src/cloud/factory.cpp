@@ -3,6 +3,7 @@
 
 #include "cloud/box/box.h"
 #include "cloud/dropbox/dropbox.h"
+#include "cloud/gdrive/gdrive.h"
 #include "cloud/onedrive/onedrive.h"
 #include "cloud/vfs/vfs_cloud.h"
 #include "core/log.h"
@@ -21,13 +22,6 @@ Cloud* New(unsigned int uid, const Json::Value& config) {
     return new (std::nothrow) Driver(uid, config);
 }
 
-/** A service that the library has no driver for says so in the log. */
-Cloud* NoDriver(unsigned int, const Json::Value& config) {
-    const Json::Value id = config.isObject() ? config.get("server_id", "") : Json::Value("");
-    LOG_ERROR("No driver for %s", id.isString() ? id.asCString() : "");
-    return nullptr;
-}
-
 /** Kinds that are known and that no connection has. */
 Cloud* Nothing(unsigned int, const Json::Value&) {
     return nullptr;
@@ -38,7 +32,7 @@ constexpr struct {
     _tag_cloud_type type;
     Make make;
 } kDrivers[] = {
-    {CLOUD_TYPE_VFS, New<VFSCloud>},    {CLOUD_TYPE_GOOGLE, NoDriver},
+    {CLOUD_TYPE_VFS, New<VFSCloud>},    {CLOUD_TYPE_GOOGLE, New<GDrive>},
     {CLOUD_TYPE_DROPBOX, New<Dropbox>}, {CLOUD_TYPE_ONEDRIVE, New<OneDrive>},
     {CLOUD_TYPE_BOX, New<Box>},         {CLOUD_TYPE_ONEDRIVE_SHORT, Nothing},
     {CLOUD_TYPE_HUBIC, Nothing},        {CLOUD_TYPE_AWSS3, Nothing},

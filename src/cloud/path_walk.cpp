@@ -1,6 +1,8 @@
 #include "cloud/path_walk.h"
 
 #include <algorithm>
+#include <set>
+#include <utility>
 
 #include "core/log.h"
 
@@ -53,6 +55,10 @@ class Walk {
     bool Follow(const std::vector<std::string>& ids, const std::string& rest, std::string& id) {
         for (const std::string& candidate : ids) {
             std::string found;
+            // Folders that hold each other would be walked through once for each way there is.
+            if (!rules_.first_only && !entered_.emplace(candidate, rest.size()).second) {
+                continue;
+            }
             const bool ok = Down(AsParent(candidate), rest, found);
             if (rules_.first_only || (ok && !found.empty())) {
                 id = found;
@@ -68,6 +74,8 @@ class Walk {
 
     const WalkRules& rules_;
     const ZYROVFS::SourceLine at_;
+    std::set<std::pair<std::string, size_t>>
+        entered_;  ///< an id, and how much of the path was left
 };
 
 }  // namespace

@@ -2,7 +2,15 @@
 
 #include <unistd.h>
 
+#include "core/json.h"
+
 namespace ZYROCloud {
+
+uint64_t TotalBytes(const Json::Value& meta) {
+    uint64_t total = 0;
+    ZYROVFS::json::toUInt64(meta["total_bytes"], total);
+    return total;
+}
 
 UploadBody::UploadBody(const XferData& xfer)
     : xfer_(xfer),
@@ -73,12 +81,14 @@ bool SendUpload(Cloud& cloud, const XferData& xfer) {
     return sent;
 }
 
-AttemptPlan WholeUploadPlan(Cloud& cloud, const XferData& xfer, const std::string& what) {
+AttemptPlan WholeUploadPlan(Cloud& cloud, const XferData& xfer, const std::string& what,
+                            ZYROVFS::SourceLine at) {
     AttemptPlan plan;
     plan.send = [&cloud, &xfer] { return SendUpload(cloud, xfer); };
     plan.judge = [&cloud, &xfer](__tag_vfs_err_) { return JudgeUpload(cloud, *xfer.context); };
-    plan.rewind = [&xfer] {
-        return SeekSource(xfer.context->fd, 0, "Failed to seek file to back to zero position, %m");
+    plan.rewind = [&xfer, at] {
+        return SeekSource(xfer.context->fd, 0, "Failed to seek file to back to zero position, %m",
+                          at);
     };
     plan.retry = "Retry directly upload";
     plan.exhausted = kNoAttemptLeft;

@@ -14,6 +14,10 @@
 
 namespace ZYROCloud {
 
+/** Bytes that an upload is to send, 0 without a number. Json::LogicError when `meta` is no object.
+ */
+uint64_t TotalBytes(const Json::Value& meta);
+
 class UploadBody {
   public:
     /** The body begins at the source's position of now. */
@@ -47,7 +51,8 @@ bool SendUpload(Cloud& cloud, const XferData& xfer);
  * service does about refusals, and its `refused` line, are the driver's to add. `xfer` and `what`,
  * the log's name for the upload, must outlive the loop.
  */
-AttemptPlan WholeUploadPlan(Cloud& cloud, const XferData& xfer, const std::string& what);
+AttemptPlan WholeUploadPlan(Cloud& cloud, const XferData& xfer, const std::string& what,
+                            ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
 
 }  // namespace ZYROCloud
 

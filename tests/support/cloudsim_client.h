@@ -37,6 +37,7 @@ class Client {
 
     std::string ca;  ///< PEM text that https is checked against
     bool follow = false;
+    bool fresh = false;                ///< on a kept connection libcurl itself tries again
     std::vector<std::string> headers;  ///< sent with every request
     double timeout = 20;
 
@@ -95,6 +96,7 @@ class Client {
         curl_easy_setopt(curl_, CURLOPT_NOSIGNAL, 1L);
         curl_easy_setopt(curl_, CURLOPT_TIMEOUT_MS, static_cast<long>(timeout * 1000));
         curl_easy_setopt(curl_, CURLOPT_FOLLOWLOCATION, follow ? 1L : 0L);
+        curl_easy_setopt(curl_, CURLOPT_FRESH_CONNECT, fresh ? 1L : 0L);
         if (!ca.empty()) {
             curl_blob blob = {const_cast<char*>(ca.data()), ca.size(), CURL_BLOB_COPY};
             curl_easy_setopt(curl_, CURLOPT_CAINFO_BLOB, &blob);

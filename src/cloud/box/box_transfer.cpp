@@ -26,12 +26,6 @@ Json::Value Attributes(const std::string& name, const std::string& parent_id, ui
     return attributes;
 }
 
-uint64_t TotalBytes(const Json::Value& meta) {
-    uint64_t total = 0;
-    json::toUInt64(meta["total_bytes"], total);
-    return total;
-}
-
 }  // namespace
 
 bool Box::PreflightCheck(const std::string& id, const std::string& name,
@@ -100,9 +94,7 @@ bool Box::SendForm(XferData* xfer, const Json::Value& meta) {
     const ScopeExit forget([this] { api->SetFormUploadData(nullptr); });
 
     const std::string url = meta["url"].asString();
-    const int fd = xfer->context->fd;
-    AttemptPlan plan;
-    plan.send = [this, xfer] { return SendUpload(*this, *xfer); };
+    AttemptPlan plan = WholeUploadPlan(*this, *xfer, url);
     plan.judge = [&](__tag_vfs_err_ code) {
         if (code == VFS_ERR_UNAUTHORIZED) {
             // The new token is for the caller's next upload: this request has the old one.
@@ -111,13 +103,7 @@ bool Box::SendForm(XferData* xfer, const Json::Value& meta) {
         }
         return JudgeUpload(*this, *xfer->context);
     };
-    plan.rewind = [fd] {
-        return SeekSource(fd, 0, "Failed to seek file to back to zero position, %m");
-    };
-    plan.retry = "Retry directly upload";
     plan.refused = "Failed to process  %s, err: %s";
-    plan.exhausted = kNoAttemptLeft;
-    plan.what = &url;
     return RunAttempts(*this, plan);
 }
 

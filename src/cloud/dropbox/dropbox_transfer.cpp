@@ -22,12 +22,6 @@ namespace {
 constexpr unsigned kLookAfter = 3;
 constexpr int kCatchUp = 10;
 
-uint64_t TotalBytes(const Json::Value& meta) {
-    uint64_t total = 0;
-    json::toUInt64(meta["total_bytes"], total);
-    return total;
-}
-
 std::string ServerPath(const Json::Value& meta) {
     return meta.get("server_path", "").asString();
 }
@@ -113,8 +107,10 @@ bool Dropbox::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
 bool Dropbox::StartChunkUploadSession(std::string& out) {
     return Guard(*this, [&] {
         Json::Value answer;
+        // The service wants an argument even of calls that need none.
         if (!Request(*this, kContentFrame)
                  .To("POST", Content("upload_session/start"))
+                 .Header(kArgument, Json::Value(Json::objectValue))
                  .Send(answer)) {
             return false;
         }

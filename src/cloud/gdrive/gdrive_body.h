@@ -37,13 +37,6 @@ inline Json::Value Uploaded(const Json::Value& meta) {
     return body;
 }
 
-/** Bytes to send; 0 without a number. */
-inline uint64_t TotalBytes(const Json::Value& meta) {
-    uint64_t total = 0;
-    ZYROVFS::json::toUInt64(meta.get("total_bytes", 0), total);
-    return total;
-}
-
 /** Size of the source, -1 when it is not known. */
 inline int64_t SourceSize(const Json::Value& meta) {
     int64_t size = -1;

@@ -120,19 +120,18 @@ class Fragments {
         if (position_ != offset_ && !GoOn()) {
             return false;
         }
-        AttemptPlan plan;
-        plan.send = [this, length] { return SendOnce(length); };
-        plan.judge = [this](__tag_vfs_err_ code) {
-            // Going back to where the service wants to go on cures a wrong range.
-            return JudgeRenewing(drive_, *xfer_.context, code, code == VFS_ERR_RANGE_FAILED);
-        };
-        plan.rewind = [this] { return GoBack(); };
-        plan.copy = CopyError::kAtEnd;
-        plan.retry = "Retry chunk upload";
-        plan.refused = kRefused;
-        plan.exhausted = kNoAttemptLeft;
-        plan.what = &url_;
-        return RunAttempts(drive_, plan);
+        begin_ = start_ = offset_;
+        end_ = std::min(offset_ + length, total_);
+        if (!SendWithRetries(length)) {
+            return false;
+        }
+        if (start_ >= begin_) {
+            return true;
+        }
+        // An answer was lost, and with it where to go on: what went out was the start of the file,
+        // which the service knows. It has said where it really is; the fragment itself follows.
+        Believe();
+        return offset_ < begin_ || offset_ >= end_ || (GoBack() && SendWithRetries(end_ - offset_));
     }
 
     bool Close() {
@@ -145,18 +144,45 @@ class Fragments {
   private:
     static constexpr const char* kRefused = "Chunk upload failed and do not retry";
 
+    bool SendWithRetries(long long length) {
+        AttemptPlan plan;
+        plan.send = [this, length] { return SendOnce(length); };
+        plan.judge = [this](__tag_vfs_err_ code) {
+            // Going back to where the service wants to go on cures a wrong range.
+            return JudgeRenewing(drive_, *xfer_.context, code, code == VFS_ERR_RANGE_FAILED);
+        };
+        plan.rewind = [this] {
+            Believe();
+            return GoBack();
+        };
+        plan.copy = CopyError::kAtEnd;
+        plan.retry = "Retry chunk upload";
+        plan.refused = kRefused;
+        plan.exhausted = kNoAttemptLeft;
+        plan.what = &url_;
+        return RunAttempts(drive_, plan);
+    }
+
     /** What the service has of a failed attempt it keeps, and a repeat goes that much further: but
      * not beyond the file. */
     bool SendOnce(long long length) {
-        const long long size = std::min(length, total_ - offset_);
-        if (size <= 0) {
+        if (offset_ >= end_) {
             return true;  // an answer was lost, and no bytes
         }
+        const long long size = std::min(length, total_ - offset_);
+        start_ = offset_;
         position_ = offset_ + size;
         return drive_.StartUpload(&xfer_, url_, session_, &offset_, size, total_);
     }
 
+    /** Goes to where the service says it is, beyond what was repeated, but not beyond what has been
+     * sent. */
+    void Believe() {
+        offset_ = std::max(offset_, std::min(Received(drive_.GetAPIHandler()), end_));
+    }
+
     bool GoBack() {
+        position_ = offset_;
         if (SeekSource(xfer_.context->fd, offset_,
                        "Failed to seek file to back to last position, %m")) {
             return true;
@@ -182,6 +208,9 @@ class Fragments {
     const std::string& session_;
     const long long total_;
     long long offset_ = 0;    ///< bytes that the service has
+    long long begin_ = 0;     ///< of the fragment under way, in the file
+    long long end_ = 0;       ///< of the same
+    long long start_ = 0;     ///< where the last attempt began
     long long position_ = 0;  ///< where the source stands behind the last fragment
 };
 

@@ -71,17 +71,13 @@ bool OneDrive::SendWhole(XferData& xfer, const Json::Value& meta, const std::str
         SetError(VFS_ERR_CLOUD_FAILED, "");
         return false;
     }
-    AttemptPlan plan;
-    plan.send = [&] { return SendUpload(*this, xfer); };
+    AttemptPlan plan = WholeUploadPlan(*this, xfer, url);
     // A new token is for the caller's next upload: this request has the old one.
     plan.judge = [&](__tag_vfs_err_ code) { return JudgeRenewing(*this, *xfer.context, code); };
     plan.rewind = [&] {
         return SeekSource(xfer.context->fd, 0, "Failed to seek file to zero position, %m");
     };
-    plan.retry = "Retry directly upload";
     plan.refused = "Direct upload failed and do not retry";
-    plan.exhausted = kNoAttemptLeft;
-    plan.what = &url;
     return RunAttempts(*this, plan);
 }
 

@@ -105,7 +105,7 @@ bool Exchange::Data(const char* data, size_t size) {
     }
     const size_t limit = server_.options.journal_body_limit;
     body_.append(data, std::min<uint64_t>(wanted, limit - std::min(limit, body_.size())));
-    handler_->Data(data, wanted);
+    Pass(data, wanted);
     received_ += wanted;
     if (wanted < size || (fault != nullptr && fault->cut_upload == received_)) {
         return Break(Effect::kCutUpload);
@@ -119,6 +119,20 @@ bool Exchange::Data(const char* data, size_t size) {
             began_, static_cast<double>(received_) / static_cast<double>(fault->upload_rate)));
     }
     return true;
+}
+
+void Exchange::Pass(const char* data, size_t size) {
+    uint64_t passed = size;
+    if (fault_ != nullptr && (*fault_)->short_upload) {
+        const uint64_t most = *(*fault_)->short_upload;
+        passed = std::min<uint64_t>(size, most - std::min(received_, most));
+    }
+    if (passed > 0) {
+        handler_->Data(data, passed);
+    }
+    if (passed < size) {
+        Happens(Effect::kShortUpload);
+    }
 }
 
 bool Exchange::Answer() {

@@ -38,6 +38,8 @@ class Exchange : public std::enable_shared_from_this<Exchange> {
     void ReadRequest(const char* method, const char* version);
     bool ApplyBeginning();
     bool Break(Effect effect);
+    /** To the handler, as far as no fault keeps it back. */
+    void Pass(const char* data, size_t size);
     void Reset();
     void Happens(Effect effect);
     /** Waits once, when `done` has reached the place of a declared pause. */

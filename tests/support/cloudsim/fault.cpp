@@ -95,6 +95,11 @@ Fault& Fault::CutUpload(uint64_t body_bytes) {
     return *this;
 }
 
+Fault& Fault::ShortUpload(uint64_t body_bytes) {
+    short_upload = body_bytes;
+    return *this;
+}
+
 Fault& Fault::Reset() {
     reset = true;
     return *this;

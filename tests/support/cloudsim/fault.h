@@ -73,7 +73,9 @@ struct Fault {
     Fault& PauseUpload(uint64_t body_bytes, double seconds);
     Fault& CutAnswer(uint64_t body_bytes);  ///< closes behind so many bytes of the answer's body
     Fault& CutUpload(uint64_t body_bytes);  ///< closes when so many bytes of the request's came
-    Fault& Reset();                         ///< what closes or cuts sends a reset
+    /** Only the first bytes of the request's body reach the service, which takes them for all. */
+    Fault& ShortUpload(uint64_t body_bytes);
+    Fault& Reset();  ///< what closes or cuts sends a reset
     Fault& Close(Break when);
     Fault& LoseAnswer() { return Close(Break::kAfterEffect); }
     /** Answers in full and closes the kept connection without having announced it. */
@@ -95,7 +97,7 @@ struct Fault {
     uint64_t answer_rate = 0, upload_rate = 0;
     std::optional<uint64_t> pause_answer, pause_upload;
     double pause = 0;
-    std::optional<uint64_t> cut_answer, cut_upload;
+    std::optional<uint64_t> cut_answer, cut_upload, short_upload;
     bool reset = false;
     Break close = Break::kNone;
     bool close_after_answer = false;
@@ -110,9 +112,9 @@ struct Fault {
  * "GET /2.0/users/me after=1 times=2 status=503 header=Retry-After:1 body=... delay=0.5". The
  * words: host= after= times= (a number or "forever") answer=STATUS status=STATUS body=TEXT
  * header=NAME:VALUE line=TEXT raw=TEXT delay= rate= upload-rate= pause=BYTES:SECONDS
- * pause-upload=BYTES:SECONDS cut= cut-upload= close=(before|after|effect) close-after-answer reset
- * range=(ignore|start|short) expire-token. In TEXT "\r", "\n", "\s" (blank), "\\" and "\xHH" stand
- * for themselves. Throws std::invalid_argument.
+ * pause-upload=BYTES:SECONDS cut= cut-upload= short-upload= close=(before|after|effect)
+ * close-after-answer reset range=(ignore|start|short) expire-token. In TEXT "\r", "\n", "\s"
+ * (blank), "\\" and "\xHH" stand for themselves. Throws std::invalid_argument.
  */
 Fault ParseFault(const std::string& text);
 

@@ -31,7 +31,7 @@ int Effects(const Fault& fault) {
            (fault.close != Break::kNone ? Use::kClose : 0) |
            (fault.range != RangeFault::kNone ? Use::kRange : 0) |
            (fault.pause_answer ? Use::kPause : 0) | (fault.pause_upload ? Use::kPauseUpload : 0) |
-           (fault.expire_token ? Use::kToken : 0);
+           (fault.short_upload ? Use::kShortUpload : 0) | (fault.expire_token ? Use::kToken : 0);
 }
 
 }  // namespace

@@ -39,7 +39,8 @@ class FaultPlan {
             kRange = 128,
             kToken = 256,
             kPause = 512,
-            kPauseUpload = 1024
+            kPauseUpload = 1024,
+            kShortUpload = 2048
         };
         /** This part of the fault takes place now; when it is the last one, the fault is used. */
         void Happens(Effect effect);

@@ -127,6 +127,7 @@ const std::map<std::string, Setter>& Setters() {
          }},
         {"cut", [](Fault& f, const std::string& v) { f.CutAnswer(Number(v)); }},
         {"cut-upload", [](Fault& f, const std::string& v) { f.CutUpload(Number(v)); }},
+        {"short-upload", [](Fault& f, const std::string& v) { f.ShortUpload(Number(v)); }},
         {"close", [](Fault& f, const std::string& v) { f.Close(Choice(kBreaks, v)); }},
         {"range", [](Fault& f, const std::string& v) { f.Range(Choice(kRanges, v)); }},
         {"reset", [](Fault& f, const std::string&) { f.Reset(); }},
@@ -171,6 +172,9 @@ void AddBreaks(std::ostream& text, const Fault& fault) {
     }
     if (fault.cut_upload) {
         text << " cut-upload=" << *fault.cut_upload;
+    }
+    if (fault.short_upload) {
+        text << " short-upload=" << *fault.short_upload;
     }
     if (fault.close != Break::kNone) {
         text << " close=" << NameOf(kBreaks, fault.close);

@@ -92,8 +92,6 @@ class GDrive : public Service {
     void DropUploadSessions();
     /** Sessions that are open and not complete. */
     size_t UploadSessions();
-    /** Of the next piece of a resumable upload no more than so many bytes are kept. */
-    void KeepOfNextPiece(uint64_t bytes);
 
     /** Body of an answer with this reason ("userRateLimitExceeded"), as the service words it. */
     static std::string ErrorText(int status, const std::string& reason);
@@ -194,7 +192,6 @@ class GDrive : public Service {
 
     const GDriveOptions drive_options_;
     uint64_t download_turn_ = 1, last_key_ = 0;
-    std::optional<uint64_t> keep_;
     std::map<std::string, SessionPtr> sessions_;
     std::map<std::string, Cursor> cursors_;
     std::deque<std::string> cursor_order_;

@@ -69,7 +69,7 @@ Node& GDrive::Create(const GDriveCall& call, const gdrive::Changes& changes, Con
     if (parents.size() > 1) {
         tree_.Place(node, parents, name);
     }
-    node.mime_type = folder ? "" : mime_type;
+    node.mime_type = folder ? "" : mime_type.empty() ? gdrive::MimeTypeOfTitle(name) : mime_type;
     node.weightless = gdrive::IsDocument(node);
     node.description = changes.description.value_or("");
     node.starred = changes.starred.value_or(false);
@@ -135,6 +135,8 @@ void GDrive::Apply(const GDriveCall& call, Node& node, const gdrive::Changes& ch
     const std::vector<Node*> parents = NewParents(call, node, changes);
     const std::string name = changes.title && !changes.title->empty() ? *changes.title : node.name;
     if (parents != node.Parents() || name != node.name) {
+        node.mime_type =
+            node.folder ? "" : gdrive::MimeType(node);  // a new title doesn't change it
         tree_.Place(node, parents, name);
     }
     node.description = changes.description.value_or(node.description);
@@ -162,7 +164,7 @@ Reply GDrive::Copy(const GDriveCall& call) {
     if (node.folder) {
         return gdrive::Error(403, "cannotCopyFile", "This file cannot be copied by the user.");
     }
-    CheckSize(call.account, node.weightless ? 0 : node.content->Size(), 0);
+    CheckSize(call.account, gdrive::IsDocument(node) ? 0 : node.content->Size(), 0);
     if (!changes.parents) {
         changes.parents.emplace();
         for (const Node* parent : node.Parents()) {

@@ -117,9 +117,4 @@ size_t GDrive::UploadSessions() {
                                              [](const auto& row) { return !row.second->done; }));
 }
 
-void GDrive::KeepOfNextPiece(uint64_t bytes) {
-    const Lock lock(mutex_);
-    keep_ = bytes;
-}
-
 }  // namespace cloudsim

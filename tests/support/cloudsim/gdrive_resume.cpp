@@ -69,7 +69,7 @@ void GDriveResume::Refuse(Reply reply) {
 void GDriveResume::ReadRange(const std::string& text) {
     if (text.empty()) {
         total_ = ParseNumber(request_.Header("Content-Length"));
-        size_ = total_.value_or(0);
+        size_ = total_.value_or(UINT64_MAX);
         return;
     }
     const size_t slash = text.find('/'), dash = text.find('-');
@@ -101,10 +101,13 @@ void GDriveResume::CheckPiece() {
     if (refused_) {
         return;
     }
+    const auto length = ParseNumber(request_.Header("Content-Length"));
     if (total_ && session_->total && *total_ != *session_->total) {
         Refuse(BadRange("The total size differs from the one that was announced."));
     } else if (!asks_ && first_ > session_->received) {
         Refuse(gdrive::Error(503, "backendError", "Backend Error"));
+    } else if (ranged_ && length && *length != size_) {
+        Refuse(BadRange("The body is not as long as the Content-Range header tells."));
     } else if (ranged_ && !IsLast() && size_ < kUnit) {
         Refuse(TooSmall(size_));
     }
@@ -119,19 +122,11 @@ void GDriveResume::Data(const char* data, size_t size) {
         came_ += size;
         return;
     }
-    if (came_ == 0 && drive_.keep_) {
-        room_ = drive_.keep_;
-        drive_.keep_.reset();
-    }
     // What has arrived before is let go by.
     const uint64_t place = first_ + came_, known = session_->received + tail_.size();
     const uint64_t skip = std::min<uint64_t>(size, known > place ? known - place : 0);
     uint64_t take = std::min<uint64_t>(size, came_ < size_ ? size_ - came_ : 0);
     take = take > skip ? take - skip : 0;
-    if (room_) {
-        take = std::min(take, *room_);
-        *room_ -= take;
-    }
     came_ += size;
     tail_.append(data + skip, take);
     Keep(false);
@@ -163,14 +158,15 @@ Reply GDriveResume::Answer() {
     if (asks_ && came_ != 0) {
         return BadRange("A status request has no body.");
     }
-    if (!ranged_ && !asks_ && !session_->total) {
-        session_->total = came_;  // it came without a length
-        size_ = came_;
+    if (!ranged_ && !asks_ && !total_) {
+        size_ = came_;  // it came without a length
+        session_->total = session_->total.value_or(came_);
     }
-    if (!asks_ && came_ != size_) {
-        return BadRange("The body is not as long as the Content-Range header tells.");
+    if (!asks_ && came_ > size_) {
+        return BadRange("The body is longer than the Content-Range header tells.");
     }
-    if (!asks_ && IsLast()) {
+    // Of a body that didn't arrive in full, as of a broken one, whole units are kept.
+    if (!asks_ && came_ == size_ && IsLast()) {
         Keep(true);
     }
     const bool all = session_->total && session_->received == *session_->total;

@@ -61,8 +61,7 @@ class GDriveResume : public Handler {
     std::optional<uint64_t> total_;  ///< of the file, as announced
     uint64_t came_ = 0;              ///< of this request's body
     uint64_t turn_ = 0;
-    std::optional<uint64_t> room_;  ///< how much of the piece is kept, when a test says so
-    std::string tail_;              ///< what isn't yet enough to be kept
+    std::string tail_;  ///< what isn't yet enough to be kept
 };
 
 }  // namespace cloudsim

@@ -31,8 +31,7 @@ Running StartBox(const ServiceOptions& options) {
 Running StartDropbox(const ServiceOptions& options) {
     auto own = Common<DropboxOptions>(options);
     if (options.names) {
-        own.api_name = (*options.names)[0];
-        own.content_name = (*options.names)[1];
+        std::tie(own.api_name, own.content_name, std::ignore) = std::tuple_cat(*options.names);
     }
     auto dropbox = std::make_unique<Dropbox>(own);
     Running running;

@@ -32,6 +32,16 @@ TreeRules Rules() {
     return rules;
 }
 
+Reply NoSuchPath(const Request& request) {
+    return onedrive::Error(
+        404, "request_url_invalid",
+        "The URL contains the path '" + request.path + "', which isn't supported.");
+}
+
+Reply WrongMethod() {
+    return onedrive::Error(405, "request_method_invalid", "The method isn't supported here.");
+}
+
 Reply BadJson() {
     return onedrive::Error(400, "request_body_invalid",
                            "The request entity body isn't a valid JSON object.");
@@ -44,6 +54,8 @@ const OneDrive::Route OneDrive::kRoutes[] = {
     {"GET", 2, "files", &OneDrive::List},
     {"GET", 2, "search", &OneDrive::Search},
     {"GET", 2, "quota", &OneDrive::GetQuota},
+    {"GET", 2, "albums", &OneDrive::ListAlbums},
+    {"POST", 2, "albums", &OneDrive::CreateAlbum},
     {"GET", 2, "content", &OneDrive::GetContent},
     {"HEAD", 2, "content", &OneDrive::GetContent},
     {"POST", 1, "", &OneDrive::CreateFolder},
@@ -158,27 +170,34 @@ std::unique_ptr<Handler> OneDrive::BeginCall(Request& request) {
     return Answered(request, *account, std::move(path));
 }
 
+/** "me/skydrive/..." is what lies in the top folder, "me/albums" those that lie there. */
 std::unique_ptr<Handler> OneDrive::Answered(Request& request, Account& account,
                                             std::vector<std::string> path) {
-    if (path[0] == "me" || path[0] == account.Id()) {
-        if (path.size() == 1) {
-            return request.method == "GET"
-                       ? Ready(GetUser({request, account, "", Json::nullValue}))
-                       : Ready(onedrive::Error(405, "request_method_invalid",
-                                               "The method isn't supported here."));
-        }
-        path.erase(path.begin());
-        path[0] = path[0] == "skydrive" ? account.Root() : "me." + path[0];
+    const bool own = path[0] == "me" || path[0] == account.Id();
+    if (own && path.size() == 1) {
+        return Ready(request.method == "GET" ? GetUser({request, account, "", Json::nullValue})
+                                             : WrongMethod());
     }
+    if (own && path[1] == "skydrive") {
+        path.erase(path.begin());
+    } else if (own && path[1] != "albums") {
+        return Ready(NoSuchPath(request));
+    }
+    path[0] = own ? account.Root() : path[0];
     const std::string verb = path.size() > 1 ? path[1] : "";
     const bool into = path.size() == 3 && verb == "files";
     if (request.method == "PUT" && (into || (path.size() == 2 && verb == "content"))) {
         return std::make_unique<OneDriveUpload>(*this, request, account, path[0],
                                                 into ? path[2] : "");
     }
-    bool known = into;
+    return into ? Ready(WrongMethod()) : Routed(request, account, path);
+}
+
+std::unique_ptr<Handler> OneDrive::Routed(Request& request, Account& account,
+                                          const std::vector<std::string>& path) {
+    bool known = false;
     for (const Route& route : kRoutes) {
-        if (path.size() != route.parts || verb != route.verb) {
+        if (path.size() != route.parts || (path.size() > 1 && path[1] != route.verb)) {
             continue;
         }
         known = true;
@@ -189,11 +208,7 @@ std::unique_ptr<Handler> OneDrive::Answered(Request& request, Account& account,
             });
         }
     }
-    return Ready(
-        known ? onedrive::Error(405, "request_method_invalid", "The method isn't supported here.")
-              : onedrive::Error(
-                    404, "request_url_invalid",
-                    "The URL contains the path '" + request.path + "', which isn't supported."));
+    return Ready(known ? WrongMethod() : NoSuchPath(request));
 }
 
 Reply OneDrive::Call(OneDriveCall call, Operation operation, const std::string& body) {

@@ -3,6 +3,7 @@
 #define ZYROVFS_TESTS_CLOUDSIM_ONEDRIVE_H
 
 #include <map>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -28,8 +29,8 @@ struct OneDriveOptions : ServerOptions {
     uint64_t fragment_limit = 60 * 1024 * 1024;
     /**
      * [MC-BUP] to the letter, where the service's own description of BITS is milder: a fragment has
-     * to begin at the next byte wanted, every packet has a Content-Length, and the protocol's GUID
-     * stands in braces.
+     * to begin at the next byte wanted, every packet has a Content-Length, the protocol's GUID
+     * stands in braces, and a session that was made is told by 200, not 201.
      */
     bool strict_bits = false;
     /** The documentation says that folders can't be copied. */
@@ -87,6 +88,7 @@ class OneDrive : public Service {
         Account* account = nullptr;
         std::vector<std::string> path;
         uint64_t total = 0, next = 0;
+        uint64_t replaced = 0;  ///< size of the file that was there
         std::unique_ptr<Sink> sink;
     };
     struct Window {
@@ -101,6 +103,8 @@ class OneDrive : public Service {
     std::unique_ptr<Handler> BeginStorage(Request& request);
     std::unique_ptr<Handler> Answered(Request& request, Account& account,
                                       std::vector<std::string> path);
+    std::unique_ptr<Handler> Routed(Request& request, Account& account,
+                                    const std::vector<std::string>& path);
     Reply Call(OneDriveCall call, Operation operation, const std::string& body);
     Account* Authorize(Request& request);
     /** Seconds until the account may ask again; 0: it may. */
@@ -116,11 +120,16 @@ class OneDrive : public Service {
     Reply GetItem(const OneDriveCall& call);
     Reply List(const OneDriveCall& call);
     Reply MakePage(const OneDriveCall& call);
+    Reply ShowTypes(const OneDriveCall& call, const std::set<std::string>& types);
     Reply ShowPage(const OneDriveCall& call, const std::vector<const Node*>& nodes) const;
     Reply Search(const OneDriveCall& call);
+    Reply ListAlbums(const OneDriveCall& call);
 
     // onedrive_change.cpp: what changes
     Reply CreateFolder(const OneDriveCall& call);
+    Reply CreateAlbum(const OneDriveCall& call);
+    Node& MakeFolder(const OneDriveCall& call);
+    Reply Made(const OneDriveCall& call, const Node& node) const;
     Reply Update(const OneDriveCall& call);
     Reply Delete(const OneDriveCall& call);
     Reply Move(const OneDriveCall& call);

@@ -42,6 +42,12 @@ std::string MakeGuid() {
     return guid + "}";
 }
 
+bool SamePath(const std::vector<std::string>& a, const std::vector<std::string>& b) {
+    return std::equal(
+        a.begin(), a.end(), b.begin(), b.end(),
+        [](const std::string& x, const std::string& y) { return FoldCase(x) == FoldCase(y); });
+}
+
 }  // namespace
 
 /** Storage knows files by their path below the user's folder: /users/0xCID/LiveFolders/PATH. */
@@ -151,13 +157,15 @@ Reply OneDriveBits::Create() {
         return BitsError(400, kInvalid);
     }
     drive_.CheckName(path_.back());
-    Target(Parent());
+    const Node* old = Target(Parent());
     const std::string id = MakeGuid();
     Session& session = drive_.sessions_[id];
     session.account = &account_;
     session.path = path_;
+    session.replaced = old == nullptr ? 0 : old->Size();
     session.sink = drive_.NewSink();
-    return Acknowledge(201)
+    // The protocol says 200, the service's description of it 201.
+    return Acknowledge(drive_.drive_options_.strict_bits ? 200 : 201)
         .With("BITS-Protocol", std::string("{") + kProtocol + "}")
         .With("BITS-Session-Id", id)
         .With("Accept-Encoding", "Identity");
@@ -189,15 +197,15 @@ OneDriveBits::Range OneDriveBits::ParseRange() const {
 }
 
 void OneDriveBits::CheckRange(const Session& session, const Range& range) const {
-    const auto length = ParseNumber(request_.Header("Content-Length"));
-    const uint64_t wanted = range.last - range.first + 1;
-    if ((session.total != 0 && session.total != range.total) || (length && *length != wanted)) {
+    const auto told = ParseNumber(request_.Header("Content-Length"));
+    const uint64_t wanted = range.last - range.first + 1, length = told.value_or(received_);
+    if ((session.total != 0 && session.total != range.total) || length != wanted) {
         Refuse(400, kInvalid);
     }
     if (wanted > drive_.drive_options_.fragment_limit || range.total > account_.MaxUpload()) {
         Refuse(500, kTooLarge);
     }
-    if (drive_.tree_.Used(account_) + range.total > account_.Quota()) {
+    if (drive_.tree_.Used(account_) - session.replaced + range.total > account_.Quota()) {
         Refuse(500, kDiskFull);
     }
 }
@@ -231,7 +239,7 @@ Reply OneDriveBits::Take(Session& session, const Range& range) {
 /** The file appears, whole, when its session is closed. */
 Reply OneDriveBits::Close() {
     Session& session = Known();
-    if (session.next != session.total || session.path != path_) {
+    if (session.next != session.total || !SamePath(session.path, path_)) {
         return BitsError(400, kInvalid);
     }
     Node& parent = Parent();

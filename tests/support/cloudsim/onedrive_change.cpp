@@ -25,17 +25,31 @@ std::string Text(const Json::Value& body, const char* name) {
 
 }  // namespace
 
-Reply OneDrive::CreateFolder(const OneDriveCall& call) {
+Node& OneDrive::MakeFolder(const OneDriveCall& call) {
     Node& parent = Folder(call.account, call.id);
     const std::string name = Text(call.body, "name");
+    const bool described = call.body.isMember("description");
+    const std::string description = described ? Text(call.body, "description") : "";
     CheckName(name);
     CheckFree(parent, name, nullptr);
     Node& made = tree_.AddFolder(parent, name);
-    if (call.body.isMember("description")) {
-        made.description = Text(call.body, "description");
-    }
-    return Answer(call.request, 201, Show(made))
-        .With("Location", ApiHost() + "/v5.0/" + made.id + "/");
+    made.description = description;
+    return made;
+}
+
+Reply OneDrive::Made(const OneDriveCall& call, const Node& node) const {
+    return Answer(call.request, 201, Show(node))
+        .With("Location", ApiHost() + "/v5.0/" + node.id + "/");
+}
+
+Reply OneDrive::CreateFolder(const OneDriveCall& call) {
+    return Made(call, MakeFolder(call));
+}
+
+Reply OneDrive::CreateAlbum(const OneDriveCall& call) {
+    const Node& made = MakeFolder(call);
+    types_[made.id] = "album";
+    return Made(call, made);
 }
 
 Reply OneDrive::Update(const OneDriveCall& call) {
@@ -74,8 +88,7 @@ Reply OneDrive::Move(const OneDriveCall& call) {
     }
     CheckFree(parent, node.name, &node);
     tree_.Move(node, parent, node.name);
-    return Answer(call.request, 201, Show(node))
-        .With("Location", ApiHost() + "/v5.0/" + node.id + "/");
+    return Made(call, node);
 }
 
 Reply OneDrive::Copy(const OneDriveCall& call) {
@@ -90,9 +103,7 @@ Reply OneDrive::Copy(const OneDriveCall& call) {
     }
     CheckFree(parent, node.name, nullptr);
     CheckSpace(call.account, node.Size(), 0);
-    Node& made = tree_.Copy(node, parent, node.name);
-    return Answer(call.request, 201, Show(made))
-        .With("Location", ApiHost() + "/v5.0/" + made.id + "/");
+    return Made(call, tree_.Copy(node, parent, node.name));
 }
 
 }  // namespace cloudsim

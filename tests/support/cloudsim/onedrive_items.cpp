@@ -99,7 +99,15 @@ Reply OneDrive::List(const OneDriveCall& call) {
 }
 
 Reply OneDrive::MakePage(const OneDriveCall& call) {
-    const std::set<std::string> types = TypesWanted(call.request.Query("filter"));
+    return ShowTypes(call, TypesWanted(call.request.Query("filter")));
+}
+
+/** Albums lie in the top folder alone. */
+Reply OneDrive::ListAlbums(const OneDriveCall& call) {
+    return ShowTypes(call, {"album"});
+}
+
+Reply OneDrive::ShowTypes(const OneDriveCall& call, const std::set<std::string>& types) {
     Nodes nodes;
     for (const auto& [key, child] : Folder(call.account, call.id).children) {
         if (types.empty() || types.count(TypeOf(*child)) > 0) {

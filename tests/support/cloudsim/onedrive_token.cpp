@@ -28,7 +28,7 @@ Reply OneDrive::Token(const std::string& text) {
         return TokenError("invalid_request",
                           "The request must include the input parameter 'refresh_token'.");
     }
-    // Clients without a secret, those of devices, don't send one.
+    // A client that was given no secret sends none.
     if (!tokens_.IsClient(client, form.Query("client_secret"))) {
         return TokenError("invalid_client",
                           "The client does not exist, or its secret is not the right one.");

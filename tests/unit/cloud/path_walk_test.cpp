@@ -110,6 +110,15 @@ TEST_F(PathWalk, ALookupThatFailsIsLoggedAndTheNextNamesakeTried) {
     EXPECT_FALSE(Walk("/docs/a.txt"));
 }
 
+TEST_F(PathWalk, FoldersThatHoldEachOtherAreEnteredOnceAtEachDepth) {
+    tree_ = {{":a", {"1", "2"}}, {"1:a", {"1", "2"}}, {"2:a", {"1", "2"}}, {"2:b", {"3"}}};
+    EXPECT_TRUE(Walk("/a/a/a/a/none"));
+    EXPECT_EQ(id_, "");
+    EXPECT_EQ(asked_.size(), 1U + 4U * 2U);
+    EXPECT_TRUE(Walk("/a/a/a/a/b"));
+    EXPECT_EQ(id_, "3");
+}
+
 TEST_F(PathWalk, AnEmptyPathFailsWithoutAQuestion) {
     EXPECT_FALSE(Walk(""));
     EXPECT_THAT(asked_, IsEmpty());

@@ -326,7 +326,8 @@ TEST(FaultText, ReadsWhatItWrites) {
          {"GET /2.0/users/me after=1 times=2 answer=503 body=not\\x20yet header=Retry-After:1",
           "* *content host=upload times=forever delay=0.5 rate=1000 upload-rate=7 pause=1:2.5 "
           "cut=4 "
-          "cut-upload=5 close=effect range=short reset close-after-answer expire-token",
+          "cut-upload=5 short-upload=6 close=effect range=short reset close-after-answer "
+          "expire-token",
           "GET / raw=HTTP/1.1\\x20200\\x0d\\x0a line=no\\x20colon status=207"}) {
         const std::string first = cloudsim::ParseFault(text).Text();
         EXPECT_EQ(first, cloudsim::ParseFault(first).Text());

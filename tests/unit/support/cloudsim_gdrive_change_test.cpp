@@ -51,6 +51,12 @@ TEST_F(GDriveTest, RenamesAndMovesBetweenParents) {
     EXPECT_EQ("text", amy.Bytes(file));
 }
 
+TEST_F(GDriveTest, ANewTitleLeavesTheTypeAlone) {
+    const std::string file = amy.AddFile(root, "a.txt", "text");
+    const Got got = Send("PATCH", "/drive/v2/files/" + file, R"({"title":"a.png"})");
+    EXPECT_EQ("text/plain", got.Json()["mimeType"].asString());
+}
+
 TEST_F(GDriveTest, AMoveWithinOneFolderChangesNothing) {
     const std::string file = amy.AddFile(root, "a", "");
     const std::string url = "/drive/v2/files/" + file;
@@ -179,6 +185,9 @@ TEST_F(GDriveTest, WhatOthersShareIsReadAndStarredAndNoMore) {
     EXPECT_EQ("insufficientFilePermissions", Reason(Send("PUT", url, R"({"title":"b"})")));
     EXPECT_EQ("insufficientFilePermissions", Reason(Send("POST", url + "/trash")));
     EXPECT_EQ("0", Get("/drive/v2/about").Json()["quotaBytesUsed"].asString());
+    EXPECT_EQ(200, Send("POST", url + "/copy", R"({"title":"own"})").status);
+    EXPECT_EQ("text", amy.Bytes(amy.Find("/own")));
+    EXPECT_EQ("4", Get("/drive/v2/about").Json()["quotaBytesUsed"].asString());
 }
 
 TEST_F(GDriveTest, AnswersBodiesOfTheWrongShapeWithBadRequest) {

@@ -31,7 +31,7 @@ TEST(GDriveTitle, ANameWithADateSearchesForBothAndTakesOnlyTheItemOfThatCreation
     EXPECT_FALSE(wanted.Means(Item("a - " + kDate + ".txt", kDate)));
 }
 
-TEST(GDriveTitle, ADocumentWithoutADateIsSearchedPlainToo_ButTakenOnlyWithoutACreationTime) {
+TEST(GDriveTitle, ADocumentWithoutADateIsSearchedPlainTooButTakenOnlyWithoutACreationTime) {
     const ShownTitle wanted("Report.gdoc");
     EXPECT_EQ(wanted.Query(""), "title='Report.gdoc' or title='Report'");
     EXPECT_FALSE(wanted.Means(Item("Report", kDate)));
@@ -128,7 +128,7 @@ TEST(GDriveTitle, DatesOfEveryMalformedKindAreNone) {
     }
 }
 
-TEST(GDriveTitle, DatesWithAnOffsetAreCompared_AsTheServiceWroteThem) {
+TEST(GDriveTitle, DatesWithAnOffsetAreComparedAsTheServiceWroteThem) {
     const ShownTitle wanted("a - 2015-03-02T11:11:12+01:00.txt");
     EXPECT_TRUE(wanted.Means(Item("a.txt", "2015-03-02T11:11:12+01:00")));
     EXPECT_FALSE(wanted.Means(Item("a.txt", kWhole))) << "the same moment, another text";

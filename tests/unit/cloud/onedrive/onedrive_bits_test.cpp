@@ -1,4 +1,5 @@
 // Sessions of fragments: a file of 40 MiB, in a fragment of 32 and one of 8.
+#include "cloud/transfer.h"
 #include "unit/cloud/onedrive/onedrive_fixture.h"
 
 namespace ZYROCloud {
@@ -26,6 +27,17 @@ class OneDriveBits : public OneDriveTest {
     bool Upload(long long size = kTotal, const std::string& path = "/docs/a b.bin") {
         return Cloud::UploadFile(drive.get(), kServerId + path, file.Get(), size, nullptr, nullptr,
                                  nullptr);
+    }
+    /** A session of one fragment of ten bytes. */
+    bool UploadTen() {
+        lseek(file.Get(), 0, SEEK_SET);
+        XferContext context;
+        context.fd = file.Get();
+        XferData xfer{FileReadCallback, 1, &context};
+        Json::Value meta;
+        meta["url"] = Api("/storage");
+        meta["total_bytes"] = "10";
+        return drive->ChunkedUpload(&xfer, meta);
     }
     std::string Part(long long from, long long size) const {
         return content.substr(static_cast<size_t>(from), static_cast<size_t>(size));
@@ -152,12 +164,14 @@ TEST_F(OneDriveBits, AFragmentThatTheServiceIsTooBusyForIsRepeatedFromWhereItSay
 }
 
 TEST_F(OneDriveBits, AWrongRangeIsCuredByGoingBackToWhereTheServiceIs) {
-    Give({opened, Has(kFirst), Has(kFirst - kMiB, 416), Has(kTotal - kMiB), ok});
+    Give({opened, Has(kFirst), Has(kFirst - kMiB, 416), Has(kTotal - kMiB), Has(kTotal), ok});
     EXPECT_TRUE(Upload()) << seams::LogDump();
-    EXPECT_THAT(Ranges(),
-                ElementsAre("bytes 0-33554431/41943040", "bytes 33554432-41943039/41943040",
-                            "bytes 32505856-40894463/41943040"));
+    EXPECT_THAT(
+        Ranges(),
+        ElementsAre("bytes 0-33554431/41943040", "bytes 33554432-41943039/41943040",
+                    "bytes 32505856-40894463/41943040", "bytes 40894464-41943039/41943040"));
     EXPECT_TRUE(IsPart(3, kFirst - kMiB, 8 * kMiB));
+    EXPECT_TRUE(IsPart(4, kTotal - kMiB, kMiB));
 }
 
 TEST_F(OneDriveBits, AFragmentThatWasStoredInPartGoesOnThereAndEndsWithTheFile) {
@@ -184,6 +198,28 @@ TEST_F(OneDriveBits, AFailureWithoutTheServicesWordIsSentAgainFromTheVeryStart) 
                             "bytes 0-8388607/41943040"));
     EXPECT_TRUE(IsPart(3, 0, 8 * kMiB));
     EXPECT_TRUE(seams::Logged("Wrong size, 41943040, 8388608")) << seams::LogDump();
+}
+
+TEST_F(OneDriveBits, ARepeatFromTheStartTellsWhereTheServiceIsAndTheRestFollows) {
+    // The service has the first 32 MiB; of the second fragment it got nothing, or half, or all.
+    Give({opened, Has(kFirst), Answer(500), Has(kFirst), Has(kTotal), ok});
+    EXPECT_TRUE(Upload()) << seams::LogDump();
+    EXPECT_THAT(Ranges(),
+                ElementsAre("bytes 0-33554431/41943040", "bytes 33554432-41943039/41943040",
+                            "bytes 0-8388607/41943040", "bytes 33554432-41943039/41943040"));
+    EXPECT_TRUE(IsPart(4, kFirst, kTotal - kFirst));
+
+    lseek(file.Get(), 0, SEEK_SET);
+    Give({opened, Has(kFirst), Answer(500), Has(kFirst + kMiB, 416), Has(kTotal), ok});
+    EXPECT_TRUE(Upload()) << seams::LogDump();
+    EXPECT_EQ(Ranges().back(), "bytes 34603008-41943039/41943040");
+    EXPECT_TRUE(IsPart(4, kFirst + kMiB, kTotal - kFirst - kMiB));
+
+    lseek(file.Get(), 0, SEEK_SET);
+    Give({opened, Has(kFirst), Answer(500), Has(kTotal), ok});
+    EXPECT_TRUE(Upload()) << seams::LogDump();
+    EXPECT_EQ(Ranges().back(), "bytes 0-8388607/41943040");
+    EXPECT_FALSE(seams::LoggedPart("The service has ")) << seams::LogDump();
 }
 
 TEST_F(OneDriveBits, AnAnswerThatIsLostIsAskedForAgain) {
@@ -223,14 +259,15 @@ TEST_F(OneDriveBits, AServiceThatClaimsMoreThanItWasSentIsNotBelieved) {
 
 TEST_F(OneDriveBits, AReceiptThatIsNoNumberCountsAsNothing) {
     for (const char* receipt : {"", "bytes=0-33554431", "many", "-5", "99999999999999999999"}) {
-        Give({opened,
-              Answer(200, "", std::string("BITS-Received-Content-Range: ") + receipt + "\r\n"),
-              Has(kTotal), ok});
-        drive->SetError(VFS_ERR_NONE, "");
+        Give({Answer(200, "", std::string("BITS-Received-Content-Range: ") + receipt + "\r\n")});
         lseek(file.Get(), 0, SEEK_SET);
-        EXPECT_TRUE(Upload()) << receipt << seams::LogDump();
-        EXPECT_THAT(Ranges(), ElementsAre("bytes 0-33554431/41943040", "bytes 0-8388607/41943040"))
-            << receipt;
+        XferContext context;
+        context.fd = file.Get();
+        XferData xfer{FileReadCallback, 1, &context};
+        long long offset = 3;
+        EXPECT_TRUE(drive->StartUpload(&xfer, Api("/x"), "s", &offset, 5, 10)) << receipt;
+        EXPECT_EQ(offset, 0) << receipt;
+        EXPECT_THAT(Ranges(), ElementsAre("bytes 3-7/10"));
     }
 }
 
@@ -244,27 +281,35 @@ TEST_F(OneDriveBits, AFragmentThatIsRefusedForGoodIsNotRetried) {
                 {418, VFS_ERR_UNKNOWN}};
     for (const auto& row : rows) {
         seams::Reset();
-        lseek(file.Get(), 0, SEEK_SET);
         Give({opened, Answer(row.status)});
-        EXPECT_FALSE(Upload()) << row.status;
+        EXPECT_FALSE(UploadTen()) << row.status;
         EXPECT_EQ(drive->GetErrorCode(), row.code) << row.status;
         EXPECT_THAT(Packets(), ElementsAre("Create-Session", "Fragment"));
         EXPECT_TRUE(seams::Logged("Chunk upload failed and do not retry")) << seams::LogDump();
     }
 }
 
-TEST_F(OneDriveBits, EachFragmentIsTriedSixTimes) {
+TEST_F(OneDriveBits, AFragmentIsTriedSixTimesInAll) {
+    std::vector<std::string> answers(7, Has(0, 500));
+    answers[0] = opened;
+    Give(answers);
+    EXPECT_FALSE(UploadTen());
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_SERVER_ERROR);
+    EXPECT_THAT(Ranges(), SizeIs(6));
+    EXPECT_TRUE(seams::LoggedPart("Retry times reach max times, " + Api("/storage") + ", err: {"))
+        << seams::LogDump();
+    EXPECT_TRUE(seams::Logged("Retry chunk upload: 5/6"));
+}
+
+TEST_F(OneDriveBits, TheCountOfTriesBeginsAnewForEachFragment) {
     std::vector<std::string> answers = {opened};
     answers.insert(answers.end(), 5, Has(0, 500));
     answers.push_back(Has(kFirst));
-    answers.insert(answers.end(), 6, Has(kFirst, 500));
+    answers.insert(answers.end(), 5, Has(kFirst, 500));
+    answers.insert(answers.end(), {Has(kTotal), ok});
     Give(answers);
-    EXPECT_FALSE(Upload());
-    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_SERVER_ERROR);
+    EXPECT_TRUE(Upload()) << seams::LogDump();
     EXPECT_THAT(Ranges(), SizeIs(12));
-    EXPECT_TRUE(seams::LoggedPart("Retry times reach max times, http://cid-a1b2."))
-        << seams::LogDump();
-    EXPECT_TRUE(seams::Logged("Retry chunk upload: 5/6"));
 }
 
 TEST_F(OneDriveBits, TheResultIsThatOfCloseSession) {
@@ -277,11 +322,10 @@ TEST_F(OneDriveBits, TheResultIsThatOfCloseSession) {
                 {500, VFS_ERR_SERVER_ERROR},
                 {507, VFS_ERR_QUOTA_EXCEEDED}};
     for (const auto& row : rows) {
-        lseek(file.Get(), 0, SEEK_SET);
-        Give({opened, Has(kFirst), Has(kTotal), Answer(row.status)});
-        EXPECT_FALSE(Upload()) << row.status;
+        Give({opened, Has(10), Answer(row.status)});
+        EXPECT_FALSE(UploadTen()) << row.status;
         EXPECT_EQ(drive->GetErrorCode(), row.code) << row.status;
-        EXPECT_THAT(Requests(), SizeIs(4));
+        EXPECT_THAT(Packets(), ElementsAre("Create-Session", "Fragment", "Close-Session"));
     }
 }
 

@@ -72,11 +72,7 @@ class OneDriveTest : public profiles::ProfileTest {
         std::filesystem::create_directories(paths::kConfigRoot);
         std::filesystem::remove(paths::kServiceConfig);
         ASSERT_TRUE(Utils::AddClient("onedrive", "fixed", kSecret));
-        Json::Value connections;
-        connections[kServerId] = Stored();
-        profiles::Put(profiles::VFS_CONFIG_SERVER, connections);
-        connections[kServerId]["path"] = tree.Folder();
-        profiles::Put(profiles::VFS_CONFIG_CONNECT, connections);
+        Store(kToken, kGrant);
         Renew();
         seams::Reset();
         YLIBCErrSetEx(0, "test", 1);
@@ -99,29 +95,38 @@ class OneDriveTest : public profiles::ProfileTest {
         drive = std::make_unique<OneDrive>(profiles::kUser, profile);
     }
 
-    /** The profile as it stands in a file. */
-    static Json::Value Stored() {
-        Json::Value profile;
+    /** Puts the profile into both files. */
+    void Store(const std::string& access_token, const std::string& refresh_token) {
+        Json::Value connections;
+        Json::Value& profile = connections[kServerId];
         profile["protocol"] = "onedrive";
         profile["alias"] = profile["email"] = "amy@example.com";
         profile["account_info"] = "{}";
         profile["client_id"] = "fixed";
         profile["expire_time"] = "500";
         profile["path"] = "";
-        profile["access_token"] = token_profile::Enciphered(kToken);
-        profile["refresh_token"] = token_profile::Enciphered(kGrant);
-        return profile;
+        profile["access_token"] = token_profile::Enciphered(access_token);
+        profile["refresh_token"] = token_profile::Enciphered(refresh_token);
+        profiles::Put(profiles::VFS_CONFIG_SERVER, connections);
+        profile["path"] = tree.Folder();
+        profiles::Put(profiles::VFS_CONFIG_CONNECT, connections);
+    }
+
+    static void SetHosts(const std::string& api, const std::string& login,
+                         const std::string& storage) {
+        Json::Value document;
+        ASSERT_TRUE(json::fromFile(document, paths::kServiceConfig));
+        document["hosts"]["LiveApiHost"] = api;
+        document["hosts"]["LiveLoginHost"] = login;
+        document["hosts"]["LiveStorageDomain"] = storage;
+        ASSERT_TRUE(json::toFile(document, paths::kServiceConfig, 0640));
     }
 
     /** Stands for the service from now on. */
     void Serve(const std::vector<wire::Script>& connections) {
         drive->GetAPIHandler()->Reset();
         server = std::make_unique<wire::WireServer>(connections);
-        Json::Value document;
-        ASSERT_TRUE(json::fromFile(document, paths::kServiceConfig));
-        document["hosts"]["LiveApiHost"] = document["hosts"]["LiveLoginHost"] = server->Url("");
-        document["hosts"]["LiveStorageDomain"] = ".localhost:" + std::to_string(server->Port());
-        ASSERT_TRUE(json::toFile(document, paths::kServiceConfig, 0640));
+        SetHosts(server->Url(""), server->Url(""), ".localhost:" + std::to_string(server->Port()));
     }
     void Give(const std::vector<std::string>& answers) { Serve({Answering(answers)}); }
 
