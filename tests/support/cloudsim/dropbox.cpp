@@ -45,11 +45,9 @@ namespace dropbox {
 
 Arguments ReadHeader(const Request& request, const std::string& function) {
     const std::string text = HeaderArguments(request, function);
-    const bool ascii = text.find_first_of("\x7f") == std::string::npos &&
-                       std::none_of(text.begin(), text.end(), [](char c) { return c < 0; });
-    // What isn't safe in a header has to be escaped.
+    // Letters beyond ASCII should be escaped, but are read as UTF-8 when they aren't.
     return {function, "HTTP header \"Dropbox-API-Arg\"",
-            ascii || request.Header("Dropbox-API-Arg").empty() ? text : ""};
+            text.find('\x7f') == std::string::npos && IsUtf8(text) ? text : ""};
 }
 
 void CheckType(const Request& request, const std::string& function, bool may_be_none,

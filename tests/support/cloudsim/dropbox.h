@@ -108,6 +108,7 @@ class Dropbox : public Service {
     Reply ListFolder(const DropboxCall& call);
     Reply ListMore(const DropboxCall& call);
     Reply LatestCursor(const DropboxCall& call);
+    std::shared_ptr<dropbox::Listing> Keep(std::shared_ptr<dropbox::Listing> listing);
     std::shared_ptr<dropbox::Listing> Listed(const DropboxCall& call);
     std::shared_ptr<dropbox::Listing> Changed(const dropbox::Listing& listing);
     void Gather(const Node& node, dropbox::Listing& listing);
@@ -170,6 +171,7 @@ class Dropbox : public Service {
     std::map<std::string, dropbox::Cursor> cursors_;
     std::map<std::string, std::shared_ptr<dropbox::Listing>> listings_;
     uint64_t listings_version_ = 0;
+    size_t entries_kept_ = 0;
     struct Reference {
         const Account* owner;
         std::string id;

@@ -177,13 +177,36 @@ std::string HeaderText(const Json::Value& document) {
     return text;
 }
 
+bool IsUtf8(const std::string& text) {
+    // Lowest letter of each length: what could be written shorter is no UTF-8.
+    static constexpr uint32_t kLowest[] = {0, 0, 0x80, 0x800, 0x10000};
+    for (size_t i = 0; i < text.size();) {
+        const auto lead = static_cast<unsigned char>(text[i]);
+        const size_t length = lead < 0x80   ? 1
+                              : lead < 0xc0 ? 0
+                              : lead < 0xe0 ? 2
+                              : lead < 0xf0 ? 3
+                                            : 4;
+        uint32_t letter = length < 2 ? lead : lead & (0xffU >> (length + 1));
+        for (size_t k = 1; k < length; k++) {
+            const uint32_t next = i + k < text.size() ? static_cast<unsigned char>(text[i + k]) : 0;
+            letter = (next & 0xc0) == 0x80 ? letter << 6 | (next & 0x3f) : UINT32_MAX;
+        }
+        if (length == 0 || letter < kLowest[length] || letter > 0x10ffff || letter >> 11 == 0x1b) {
+            return false;
+        }
+        i += length;
+    }
+    return true;
+}
+
 bool IsName(const std::string& name) {
     const auto letters =
         std::count_if(name.begin(), name.end(), [](char c) { return (c & 0xc0) != 0x80; });
     const bool odd = std::any_of(name.begin(), name.end(), [](char c) {
         return static_cast<unsigned char>(c) < 0x20 || c == 0x7f || c == '/' || c == '\\';
     });
-    return !name.empty() && letters <= 255 && !odd && name != "." && name != ".." &&
+    return !name.empty() && IsUtf8(name) && letters <= 255 && !odd && name != "." && name != ".." &&
            name.back() != ' ';
 }
 

@@ -78,6 +78,7 @@ Json::Value User(const Account& account);
 /** ASCII alone, as a header has to be. */
 std::string HeaderText(const Json::Value& document);
 
+bool IsUtf8(const std::string& text);
 /** Whether an item may be called so. */
 bool IsName(const std::string& name);
 /** "a (2).txt" for "a.txt". */

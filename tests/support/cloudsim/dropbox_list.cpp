@@ -12,8 +12,8 @@ namespace {
 using dropbox::Entry;
 using dropbox::Listing;
 
-/** So many are kept; one that was forgotten is as good as one that never was. */
-constexpr size_t kMostCursors = 20000;
+/** Of all listings that are kept; a cursor that was forgotten is as good as one that never was. */
+constexpr size_t kMostEntries = 1000000;
 
 Entry DeletedEntry(const std::string& path) {
     return {FoldCase(path), "deleted", OneLine(dropbox::Deleted(path))};
@@ -54,6 +54,16 @@ void Dropbox::GatherDeleted(const Node& folder, Listing& listing) {
     }
 }
 
+std::shared_ptr<Listing> Dropbox::Keep(std::shared_ptr<Listing> listing) {
+    entries_kept_ += listing->seen.size() + 1;
+    if (entries_kept_ > kMostEntries) {
+        cursors_.clear();
+        listings_.clear();
+        entries_kept_ = listing->seen.size() + 1;
+    }
+    return listing;
+}
+
 std::shared_ptr<Listing> Dropbox::Listed(const DropboxCall& call) {
     const std::string path = call.args.Text("path");
     if (path == "/") {
@@ -82,7 +92,7 @@ std::shared_ptr<Listing> Dropbox::Listed(const DropboxCall& call) {
         GatherDeleted(folder, *listing);
     }
     ShowAll(*listing);
-    return listing;
+    return Keep(listing);
 }
 
 /** What is new, other or gone since the listing was made. */
@@ -116,15 +126,12 @@ std::shared_ptr<Listing> Dropbox::Changed(const Listing& listing) {
                 DeletedEntry(ParseObject(entry->text)["path_display"].asString()));
         }
     }
-    return now;
+    return Keep(now);
 }
 
 std::string Dropbox::Cursor(const std::shared_ptr<Listing>& listing, size_t page) {
     std::string& name = listing->cursors[page];
     if (name.empty()) {
-        if (cursors_.size() >= kMostCursors) {
-            cursors_.clear();
-        }
         name = "AAF" + RandomText(80);
     }
     cursors_[name] = {listing->account, listing, page};
@@ -153,15 +160,12 @@ Reply Dropbox::ListFolder(const DropboxCall& call) {
         listings_version_ = tree_.Version();
     }
     const std::string key = call.account.Id() + call.args.Written();
-    std::shared_ptr<Listing>& listing = listings_[key];
-    if (listing == nullptr) {
-        try {
-            listing = Listed(call);
-        } catch (const dropbox::Failure&) {
-            listings_.erase(key);
-            throw;
-        }
+    const auto known = listings_.find(key);
+    if (known != listings_.end()) {
+        return Page(known->second, 0);
     }
+    const std::shared_ptr<Listing> listing = Listed(call);
+    listings_[key] = listing;
     return Page(listing, 0);
 }
 

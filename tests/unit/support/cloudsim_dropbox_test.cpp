@@ -221,6 +221,21 @@ TEST_F(DropboxTest, DownloadsWithTheMetadataInAHeaderOfAsciiAlone) {
     EXPECT_THAT(got.head, HasSubstr("gr\\u00fc\\u00dfe"));
 }
 
+TEST_F(DropboxTest, ReadsUtf8InTheHeaderButNoOtherBytes) {
+    amy.AddPath("/gr\xc3\xbc", "hello");
+    const std::string url = dropbox.ContentHost() + "/2/files/download";
+    client.headers = {"Dropbox-API-Arg: {\"path\":\"/gr\xc3\xbc\"}"};
+    EXPECT_EQ("hello", client.Get(url).body);
+    for (const std::string bytes :
+         {"\xfc", "\xc3", "\xc0\xaf", "\xe0\x80\xaf", "\xed\xa0\x80", "\xf4\x90\x80\x80", "\xff"}) {
+        client.headers = {"Dropbox-API-Arg: {\"path\":\"/" + bytes + "\"}"};
+        const Got got = client.Get(url);
+        EXPECT_EQ(400, got.status);
+        EXPECT_THAT(got.body,
+                    HasSubstr("HTTP header \"Dropbox-API-Arg\": could not decode input as JSON"));
+    }
+}
+
 TEST_F(DropboxTest, DownloadsARangeAndNothingBehindTheEnd) {
     amy.AddPath("/a", "0123456789");
     const Got part = Download("/a", {"Range: bytes=3-5"});
@@ -246,11 +261,6 @@ TEST_F(DropboxTest, DownloadsNeitherFoldersNorWhatIsMissing) {
     amy.AddFolder("root", "docs");
     EXPECT_EQ("409 path/not_file/", Summary(Download("/docs")));
     EXPECT_EQ("409 path/not_found/", Summary(Download("/none")));
-    client.headers = {"Dropbox-API-Arg: {\"path\":\"/gr\xc3\xbc\"}"};
-    const Got raw = client.Get(dropbox.ContentHost() + "/2/files/download");
-    EXPECT_EQ(400, raw.status);
-    EXPECT_THAT(raw.body,
-                HasSubstr("HTTP header \"Dropbox-API-Arg\": could not decode input as JSON"));
     client.headers = {};
     EXPECT_THAT(client.Get(dropbox.ContentHost() + "/2/files/download").body,
                 HasSubstr("Must provide HTTP header \"Dropbox-API-Arg\""));

@@ -168,6 +168,15 @@ TEST_F(DropboxUploadTest, ASessionTakesPiecesAndEndsInAFile) {
     EXPECT_EQ("409 lookup_failed/not_found/", Summary(Finish(session, 10, "/b.bin")));
 }
 
+TEST_F(DropboxUploadTest, ASessionMayBeBegunWithoutArgumentsButNothingElse) {
+    client.headers = {"Content-Type: application/octet-stream"};
+    const std::string url = dropbox.ContentHost() + "/2/files/upload_session/", bytes = "0123";
+    const Json::Value begun = client.Send("POST", url + "start", &bytes).Json();
+    EXPECT_EQ(400, client.Send("POST", url + "append_v2", &bytes).status);
+    EXPECT_EQ(200, Finish(begun["session_id"].asString(), 4, "/a").status);
+    EXPECT_EQ("0123", Bytes("/a"));
+}
+
 TEST_F(DropboxUploadTest, ASessionTellsTheOffsetWhereItStands) {
     const std::string session = Start("0123");
     Append(session, 4, "456");
