@@ -117,11 +117,13 @@ std::unique_ptr<Handler> OneDrive::Begin(Request& request) {
         return BeginLogin(request);
     }
     if (role == kContent) {
-        return request.method == "GET" || request.method == "HEAD"
-                   ? Ready(Download(request))
-                   : Ready(Reply(405).With("Allow", "GET, HEAD"));
+        const bool reads = request.method == "GET" || request.method == "HEAD";
+        return Ready(reads ? Download(request) : Reply(405).With("Allow", "GET, HEAD"));
     }
-    return role == kStorage ? BeginStorage(request) : BeginCall(request);
+    if (role == kStorage) {
+        return BeginStorage(request);
+    }
+    return BeginCall(request);
 }
 
 std::unique_ptr<Handler> OneDrive::BeginLogin(const Request& request) {
