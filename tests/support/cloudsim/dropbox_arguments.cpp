@@ -46,7 +46,7 @@ bool Arguments::Flag(const std::string& name, bool missing) const {
 
 uint64_t Arguments::Number(const std::string& name) const {
     const Json::Value& value = values_[name];
-    return Member(name, "integer", value.isUInt64() && !value.isDouble()).asUInt64();
+    return Member(name, "integer", value.isUInt64() && value.type() != Json::realValue).asUInt64();
 }
 
 uint64_t Arguments::NumberOr(const std::string& name, uint64_t missing) const {

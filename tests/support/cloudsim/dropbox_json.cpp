@@ -148,7 +148,7 @@ Json::Value User(const Account& account) {
     const std::string& name = account.Name();
     const size_t blank = name.find(' ');
     Json::Value user;
-    user["account_id"] = "dbid:AAH4f99T0taONIb-OurWxbNQ6ywGRop" + account.Id().substr(4);
+    user["account_id"] = "dbid:AAH4f99T0taONIb-OurWxbNQ6ywGRo" + account.Id().substr(4);
     user["name"]["given_name"] = user["name"]["familiar_name"] = name.substr(0, blank);
     user["name"]["surname"] = blank == std::string::npos ? "" : name.substr(blank + 1);
     user["name"]["display_name"] = name;

@@ -8,10 +8,12 @@
 namespace cloudsim {
 namespace {
 
-/** All between the slashes, also where that is nothing. */
+/** All between the slashes, also where that is nothing; how many there are in front is no matter.
+ */
 std::vector<std::string> Split(const std::string& path) {
     std::vector<std::string> names;
-    for (size_t start = 1; start <= path.size();) {
+    const size_t first = path.find_first_not_of('/');
+    for (size_t start = first == std::string::npos ? 1 : first; start <= path.size();) {
         const size_t end = std::min(path.find('/', start), path.size());
         names.push_back(path.substr(start, end - start));
         start = end + 1;

@@ -11,24 +11,24 @@ bool Dropbox::IsSame(const Node& file, const Content& content) {
 /** By the mode alone; a folder in the place is always in the way. */
 bool Dropbox::MayOverwrite(const dropbox::Arguments& commit, const Node& taken) const {
     const std::string mode = commit.Tag("mode", "add");
-    if (mode == "update") {
-        return !taken.folder && commit.Object("mode").Text("update") == dropbox::Revision(taken);
-    }
-    if (mode != "add" && mode != "overwrite") {
-        commit.Refuse("mode: unknown tag '" + mode + "'");
-    }
-    return !taken.folder && mode == "overwrite";
+    return !taken.folder &&
+           (mode == "overwrite" ||
+            (mode == "update" && commit.Object("mode").Text("update") == dropbox::Revision(taken)));
 }
 
 Node& Dropbox::Commit(const DropboxCall& call, const dropbox::Arguments& commit,
                       const ContentPtr& content) {
     const Target target = TargetOf(call, commit.Text("path"), "path");
-    const bool update = commit.Tag("mode", "add") == "update";
+    const std::string mode = commit.Tag("mode", "add");
+    const bool update = mode == "update";
+    if (mode != "add" && mode != "overwrite" && !update) {
+        commit.Refuse("mode: unknown tag '" + mode + "'");
+    }
     if (target.taken == nullptr && update && commit.Flag("strict_conflict")) {
         throw dropbox::Fail({"path", "conflict", "file"});
     }
-    Node& file = Store(call, commit, target, content);
     const auto modified = commit.Date("client_modified");
+    Node& file = Store(call, commit, target, content);
     file.content_modified = modified ? *modified : file.content_modified;
     return file;
 }

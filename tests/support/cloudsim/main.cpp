@@ -25,8 +25,8 @@ cloudsim --make-tls FOLDER [NAME]...    makes ca.pem, cert.pem and key.pem for t
 
 Serves a simulated cloud on loopback until it is told to end (SIGTERM, SIGINT), and prints how to
 reach it, as NAME=VALUE lines, the last of them "ready". Its exit status is 3 when a declared fault
-was not used. Hosts are api, upload and download of Box, api, accounts and content of Google, api,
-content and notify of Dropbox, api, login and content of OneDrive.
+was not used. Hosts are api, upload and download of Box, api and content of Dropbox (a third is
+not used), api, accounts and content of Google, api, login and content of OneDrive.
 
   --tls CERT KEY        PEM files of the server; without, plain HTTP
   --port N              0, the default, takes any

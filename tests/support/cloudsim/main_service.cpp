@@ -28,6 +28,18 @@ Running StartBox(const ServiceOptions& options) {
     return running;
 }
 
+Running StartDropbox(const ServiceOptions& options) {
+    auto own = Common<DropboxOptions>(options);
+    if (options.names) {
+        std::tie(own.api_name, own.content_name, std::ignore) = std::tuple_cat(*options.names);
+    }
+    auto dropbox = std::make_unique<Dropbox>(own);
+    Running running;
+    running.hosts = {{"api", dropbox->ApiHost()}, {"content", dropbox->ContentHost()}};
+    running.service = std::move(dropbox);
+    return running;
+}
+
 Running StartGoogle(const ServiceOptions& options) {
     auto own = Common<GDriveOptions>(options);
     if (options.names) {
@@ -58,8 +70,10 @@ Running StartOneDrive(const ServiceOptions& options) {
     return running;
 }
 
-constexpr ServiceKind kKinds[] = {
-    {"--box", StartBox}, {"--google", StartGoogle}, {"--onedrive", StartOneDrive}};
+constexpr ServiceKind kKinds[] = {{"--box", StartBox},
+                                  {"--dropbox", StartDropbox},
+                                  {"--google", StartGoogle},
+                                  {"--onedrive", StartOneDrive}};
 
 }  // namespace
 
