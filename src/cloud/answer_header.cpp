@@ -2,6 +2,8 @@
 
 #include <strings.h>
 
+#include "http/error_handler_table.h"
+
 namespace ZYROCloud {
 
 std::string AnswerHeader(const APIHandler& api, const char* name) {
@@ -12,6 +14,16 @@ std::string AnswerHeader(const APIHandler& api, const char* name) {
         }
     }
     return "";
+}
+
+int AnswerStatus(const APIHandler& api) {
+    const Json::Value error = api.GetError();
+    const Json::Value& status = MemberOf(error, "response_code");
+    return status.isInt() ? status.asInt() : 0;
+}
+
+bool IsStored(const APIHandler& api) {
+    return AnswerStatus(api) / 100 == 2;
 }
 
 }  // namespace ZYROCloud

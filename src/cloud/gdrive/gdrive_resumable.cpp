@@ -22,18 +22,6 @@ using namespace gdrive;
 
 namespace {
 
-/** HTTP status of the handler's last answer, 0 for none. */
-int LastStatus(const APIHandler& api) {
-    const Json::Value error = api.GetError();
-    const Json::Value& status = MemberOf(error, "response_code");
-    return status.isInt() ? status.asInt() : 0;
-}
-
-/** A status below 400 is no failure to the handler; a file is stored with these alone. */
-bool IsStored(const APIHandler& api) {
-    return LastStatus(api) / 100 == 2;
-}
-
 /**
  * "bytes=0-41", also without its unit: 42 bytes, the first ones, have arrived. Anything else is
  * refused: with a wrong guess a part of the file would be left out, or stand in it twice.
@@ -166,7 +154,7 @@ bool GDrive::SendRest(const XferData& xfer, const std::string& session_uri) {
         return true;
     }
     SetError(VFS_ERR_RANGE_FAILED, "");
-    LOG_ERROR("The service has not got all of the file, status %d", LastStatus(*api));
+    LOG_ERROR("The service has not got all of the file, status %d", AnswerStatus(*api));
     return false;
 }
 

@@ -113,6 +113,8 @@ class OneDrive : public PublicCloud {
 
   private:
     bool SendWhole(XferData& xfer, const Json::Value& meta, const std::string& url);
+    /** Whether the last request's status says so. VFS_ERR_TRANSFER_ABORTED. */
+    bool HasTaken();
     bool SendFragment(XferData* xfer, const std::string& url, long long length);
 };
 

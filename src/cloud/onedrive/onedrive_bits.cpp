@@ -55,13 +55,13 @@ bool OneDrive::StartUploadSession(const std::string& url, std::string& session) 
 }
 
 bool OneDrive::CloseUploadSession(const std::string& url, const std::string& session) {
-    return Request(*this, kFrame)
-        .To(kBitsMethod, url)
+    Request request(*this, kFrame);
+    request.To(kBitsMethod, url)
         .Header(kPacketType, "Close-Session")
         .Header(kSessionId, session)
         .Header("Content-Length", 0)
-        .Retries(0)
-        .Send();
+        .Retries(0);
+    return request.Send() && HasTaken();
 }
 
 bool OneDrive::StartUpload(XferData* xfer, const std::string& url, const std::string& session,
@@ -99,7 +99,7 @@ bool OneDrive::SendFragment(XferData* xfer, const std::string& url, long long le
     xfer->context->chunk_size = static_cast<unsigned int>(length);
     xfer->context->chunk_left = static_cast<unsigned int>(length);
     if (SendUpload(*this, *xfer)) {
-        return true;
+        return HasTaken();
     }
     SetError(api->GetError());
     LOG_ERROR(kRequestFailed, url.c_str(), json::toString(GetError()).c_str());
@@ -160,7 +160,14 @@ class Fragments {
         plan.refused = kRefused;
         plan.exhausted = kNoAttemptLeft;
         plan.what = &url_;
-        return RunAttempts(drive_, plan);
+        if (RunAttempts(drive_, plan)) {
+            return true;
+        }
+        if (drive_.GetErrorCode() == VFS_ERR_NONE) {
+            // The handler, whose error counts, knows of none behind a status below 400.
+            drive_.SetError(VFS_ERR_TRANSFER_ABORTED, "");
+        }
+        return false;
     }
 
     /** What the service has of a failed attempt it keeps, and a repeat goes that much further: but

@@ -1,3 +1,4 @@
+#include "cloud/answer_header.h"
 #include "cloud/attempt.h"
 #include "cloud/guard.h"
 #include "cloud/onedrive/onedrive.h"
@@ -5,6 +6,7 @@
 #include "cloud/request.h"
 #include "cloud/upload_body.h"
 #include "core/json.h"
+#include "core/log.h"
 #include "http/api_handler.h"
 
 namespace ZYROCloud {
@@ -78,7 +80,16 @@ bool OneDrive::SendWhole(XferData& xfer, const Json::Value& meta, const std::str
         return SeekSource(xfer.context->fd, 0, "Failed to seek file to zero position, %m");
     };
     plan.refused = "Direct upload failed and do not retry";
-    return RunAttempts(*this, plan);
+    return RunAttempts(*this, plan) && HasTaken();
+}
+
+bool OneDrive::HasTaken() {
+    if (IsStored(*api)) {
+        return true;
+    }
+    SetError(VFS_ERR_TRANSFER_ABORTED, "");
+    LOG_ERROR("The service has not taken the file, status %d", AnswerStatus(*api));
+    return false;
 }
 
 }  // namespace ZYROCloud

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include "support/seams.h"
 #include "support/wire_server.h"
 
 namespace ZYROCloud {
@@ -13,7 +14,7 @@ TEST(AnswerHeader, IsFoundInAnyCase) {
           wire::Send(
               wire::Answer(200, "", "LOCATION: http://x/\r\nrange: bytes=0-4\r\nX-Empty: \r\n"))}});
     APIHandler api;
-    api.SetErrorHandler(new ZYROCloud::BoxErrorHandler);
+    api.SetErrorHandler(new BoxErrorHandler);
     ASSERT_TRUE(api.Init());
     EXPECT_EQ(AnswerHeader(api, "Location"), "");
     api.SetURL(server.Url(), false);
@@ -22,6 +23,24 @@ TEST(AnswerHeader, IsFoundInAnyCase) {
     EXPECT_EQ(AnswerHeader(api, "Range"), "bytes=0-4");
     EXPECT_EQ(AnswerHeader(api, "X-Empty"), "");
     EXPECT_EQ(AnswerHeader(api, "Loc"), "");
+}
+
+TEST(AnswerStatus, OfTwoHundredsAloneMeansStored) {
+    for (const int status : {200, 201, 204, 299, 304, 308, 400, 503}) {
+        const wire::WireServer server({{wire::ReadRequest(), wire::Send(wire::Answer(status))}});
+        APIHandler api;
+        api.SetErrorHandler(new BoxErrorHandler);
+        api.SetReturnOnError(false);
+        ASSERT_TRUE(api.Init());
+        EXPECT_EQ(AnswerStatus(api), 0);
+        EXPECT_FALSE(IsStored(api));
+        api.SetURL(server.Url(), false);
+        EXPECT_EQ(api.Process(0), status < 400);
+        EXPECT_EQ(AnswerStatus(api), status);
+        EXPECT_EQ(IsStored(api), status < 300) << status;
+    }
+    const APIHandler none;
+    EXPECT_EQ(AnswerStatus(none), 0);
 }
 
 }  // namespace

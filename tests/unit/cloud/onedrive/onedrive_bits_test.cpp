@@ -289,6 +289,20 @@ TEST_F(OneDriveBits, AFragmentThatIsRefusedForGoodIsNotRetried) {
     }
 }
 
+TEST_F(OneDriveBits, AStatusBelowFourHundredThatStoresNothingIsNoSuccess) {
+    for (const int status : {300, 304, 308}) {
+        drive->SetError(VFS_ERR_NONE, "");
+        Give({opened, Answer(status)});
+        EXPECT_FALSE(UploadTen()) << status;
+        EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_TRANSFER_ABORTED) << status;
+        EXPECT_THAT(Packets(), ElementsAre("Create-Session", "Fragment"));
+        drive->SetError(VFS_ERR_NONE, "");
+        Give({opened, Has(10), Answer(status)});
+        EXPECT_FALSE(UploadTen()) << status;
+        EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_TRANSFER_ABORTED) << status;
+    }
+}
+
 TEST_F(OneDriveBits, AFragmentIsTriedSixTimesInAll) {
     std::vector<std::string> answers(7, Has(0, 500));
     answers[0] = opened;

@@ -171,6 +171,18 @@ TEST_F(OneDriveUpload, ThatIsRefusedForGoodIsNotRetried) {
     }
 }
 
+TEST_F(OneDriveUpload, AnsweredBelowFourHundredWithoutBeingStoredFails) {
+    for (const int status : {300, 304, 308}) {
+        drive->SetError(VFS_ERR_NONE, "");
+        Give({Answer(status)});
+        EXPECT_FALSE(Upload(10)) << status;
+        EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_TRANSFER_ABORTED) << status;
+        EXPECT_TRUE(seams::LoggedPart("The service has not taken the file, status " +
+                                      std::to_string(status)))
+            << seams::LogDump();
+    }
+}
+
 TEST_F(OneDriveUpload, WithARefusedTokenRenewsItAndTriesWithTheOldOne) {
     // The request keeps the token that it was made with; the new one is for the next request.
     Serve({Answering({Answer(401), Answer(201, "{}"), Answer(201, "{}")}),
