@@ -101,6 +101,15 @@ class DropboxRig : public KnowingRigOf<Dropbox, cloudsim::Dropbox> {
     Fault& Conflict(Fault&& fault) override {
         return fault.Answer(409, R"({"error":{".tag":"to","to":{".tag":"conflict"}}})");
     }
+    std::vector<SessionStep> SessionSteps() override {
+        // A piece, or the end, that arrived is refused when it comes again.
+        return {{"start", {"POST", "/2/files/upload_session/start"}, 0, true, true},
+                {"append", {"POST", "/2/files/upload_session/append_v2"}, 0, true, false},
+                {"finish", {"POST", "/2/files/upload_session/finish"}, 0, true, false}};
+    }
+    bool SendInSession(PublicCloud& cloud, XferData& xfer, const Json::Value& meta) override {
+        return Of(cloud).ChunkedUpload(&xfer, meta);
+    }
     std::string ItemText(const std::string& name, const std::string& id, bool folder) override {
         return "{\".tag\":\"" + std::string(folder ? "folder" : "file") + "\",\"path\":\"/" + id +
                "\",\"name\":" + name + ",\"is_dir\":" + (folder ? "true" : "false") + "}";
