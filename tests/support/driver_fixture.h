@@ -101,6 +101,7 @@ class DriverFixture : public profiles::ProfileTest {
         profile["expire_time"] = expire_time;
         profile["client_id"] = "mine";
         profile["server_id"] = server_id;
+        profile["account_info"] = account_info;
         drive = std::make_unique<Driver>(profiles::kUser, profile);
     }
 
@@ -137,6 +138,8 @@ class DriverFixture : public profiles::ProfileTest {
 
     static constexpr const char* kSecret = "secret-of-mine";
     const std::string protocol, server_id;
+    /** What the profile knows of the account, for a driver that looks at it. */
+    std::string account_info = "{}";
     Service service;
     cloudsim::Account& amy;
     const std::string root;

@@ -107,8 +107,10 @@ bool Dropbox::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
 bool Dropbox::StartChunkUploadSession(std::string& out) {
     return Guard(*this, [&] {
         Json::Value answer;
+        // The service wants an argument even of calls that need none.
         if (!Request(*this, kContentFrame)
                  .To("POST", Content("upload_session/start"))
+                 .Header(kArgument, Json::Value(Json::objectValue))
                  .Send(answer)) {
             return false;
         }

@@ -1,3 +1,6 @@
+#include <algorithm>
+#include <utility>
+
 #include "cloud/fuse_attr.h"
 #include "cloud/gdrive/gdrive.h"
 #include "cloud/gdrive/gdrive_api.h"
@@ -27,15 +30,15 @@ bool IsLink(const std::string& url) {
 std::string LinkText(const std::string& url, const Json::Value& meta) {
     Json::Value document;
     document["url"] = url.substr(std::string(kLinkScheme).size());
-    const std::string text = json::toString(document).substr(0, kMostLinkText);
+    std::string text = json::toString(document).substr(0, kMostLinkText);
     uint64_t from = 0;
     uint64_t length = 0;
     json::toUInt64(meta["from_bytes"], from);
     json::toUInt64(meta["len"], length);
-    if (length == 0) {
-        return text;
+    if (length != 0) {
+        text = text.substr(std::min<uint64_t>(from, text.size()), length);
     }
-    return from < text.size() ? text.substr(from, length) : "";
+    return text;
 }
 
 }  // namespace

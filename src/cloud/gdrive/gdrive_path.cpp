@@ -35,7 +35,7 @@ std::string InAnyOf(const std::vector<std::string>& ids, const std::string& name
 /** The first parent of an item that is one of these; "" for none. */
 std::string ParentAmong(const Json::Value& item, const std::vector<std::string>& ids) {
     for (const Json::Value& parent : item.get("parents", Json::Value())) {
-        const std::string id = parent.get("id", "").asString();
+        std::string id = parent.get("id", "").asString();
         if (!id.empty() && std::find(ids.begin(), ids.end(), id) != ids.end()) {
             return id;
         }

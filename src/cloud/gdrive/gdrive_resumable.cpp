@@ -127,17 +127,18 @@ bool GDrive::GetResumableStartByte(const std::string& session_uri, unsigned long
 bool GDrive::StartUpload(const std::string& session_uri, XferData* xfer, unsigned long long start,
                          unsigned long long total) {
     return Guard(*this, [&] {
-        if (xfer == nullptr || xfer->context == nullptr || start > total) {
+        const bool known = total != kSizeNotKnown;
+        // A rest has its place in a whole that is known.
+        if (xfer == nullptr || xfer->context == nullptr || start > (known ? total : 0)) {
             SetError(VFS_ERR_CLOUD_FAILED, "");
             return false;
         }
-        const bool known = total != kSizeNotKnown;
         Request request(*this, kFrame);
         request.Put(session_uri).Unescaped();
         if (known) {
             request.Header("Content-Length", static_cast<Json::UInt64>(total - start));
         }
-        if (known && start != 0) {
+        if (start != 0) {
             // Without it the service takes a rest for the whole.
             request.Header("Content-Range", RangeText(start, total));
         }
@@ -229,6 +230,9 @@ class Session {
     bool Seek() {
         if (xfer_.context->fd == -1) {
             return IsAtStart();
+        }
+        if (total_ == kSizeNotKnown) {
+            start_ = 0;  // a rest of it cannot be named
         }
         if (SeekSource(xfer_.context->fd, static_cast<off64_t>(start_),
                        "Failed to seek file to %llu, %m")) {

@@ -68,18 +68,14 @@ bool GDrive::Move(const std::string& from, const std::string& to) {
 }
 
 bool GDrive::Copy(const std::string& from, const std::string& to) {
-    std::string parent;
+    std::string folder;
     std::string name;
-    std::string new_name;
-    const std::string id = GetFileIDByPath(from);
-    if (!CutTarget(*this, from, parent, name) || !CutTarget(*this, to, parent, new_name)) {
+    std::string id;
+    std::string parent_id;
+    if (!CutTarget(*this, from, folder, name) || !FindCopyIds(*this, from, to, id, parent_id)) {
         return false;
     }
-    const std::string parent_id = GetFileIDByPath(parent);
-    if (id.empty() || parent_id.empty()) {
-        SetError(VFS_ERR_NOT_FOUND, "");
-        return false;
-    }
+    const std::string new_name = to.substr(to.rfind('/') + 1);
     Json::Value body;
     body["title"] = Utils::EscapeDoubleQuote(new_name.empty() ? name : new_name);
     body["parents"] = Parents(parent_id);

@@ -114,12 +114,7 @@ std::string OneDrive::Role(const Request& request) const {
 std::unique_ptr<Handler> OneDrive::Begin(Request& request) {
     const std::string role = Role(request);
     if (role == kLogin) {
-        if (request.path != kTokenPath) {
-            return Ready(Reply(404));
-        }
-        return request.method == "POST"
-                   ? Collect([this](const std::string& form) { return Token(form); })
-                   : Ready(Reply(405).With("Allow", "POST"));
+        return BeginLogin(request);
     }
     if (role == kContent) {
         return request.method == "GET" || request.method == "HEAD"
@@ -127,6 +122,13 @@ std::unique_ptr<Handler> OneDrive::Begin(Request& request) {
                    : Ready(Reply(405).With("Allow", "GET, HEAD"));
     }
     return role == kStorage ? BeginStorage(request) : BeginCall(request);
+}
+
+std::unique_ptr<Handler> OneDrive::BeginLogin(const Request& request) {
+    if (request.path == kTokenPath && request.method == "POST") {
+        return Collect([this](const std::string& form) { return Token(form); });
+    }
+    return Ready(request.path == kTokenPath ? Reply(405).With("Allow", "POST") : Reply(404));
 }
 
 /** The token may stand in the query as well. */

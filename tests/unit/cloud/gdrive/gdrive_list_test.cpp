@@ -113,7 +113,7 @@ TEST_F(GDriveListing, AnAnswerThatIsNoJsonHasALineOfItsOwn) {
 
 TEST_F(GDriveListing, APageThatFailsFailsTheListingAndItemsStay) {
     service.AddFault(Page(R"({"items":[{"title":"a"}],"nextPageToken":"2"})"));
-    service.AddFault(Fault::On("GET", kFiles).After(1).Answer(403, "{}"));
+    service.AddFault(Fault::On("GET", kFiles).After(1).Times(7).Answer(403, "{}"));
     Json::Value out;
     EXPECT_FALSE(drive->ListFolder("root", Json::Value(), out));
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_FORBIDDEN);

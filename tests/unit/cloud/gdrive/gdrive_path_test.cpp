@@ -18,6 +18,11 @@ Fault Found(const std::string& items) {
     return Fault::On("GET", kFiles).Answer(200, R"({"items":[)" + items + "]}");
 }
 
+/** This service's 403 is asked again, since it may be a limit of its rate. */
+Fault Refused() {
+    return Fault::On("GET", kFiles).Times(7).Answer(403, "{}");
+}
+
 TEST_F(GDriveTreeId, TheSlashAndTheEmptyPathAreTheRootWithoutARequest) {
     EXPECT_EQ(drive->GetFileIDByPath("/"), "root");
     EXPECT_EQ(drive->GetFileIDByPath(""), "root");
@@ -53,14 +58,17 @@ TEST_F(GDriveTreeId, AWalkMayBeginAtTheDeepestFolderThatTheTreeKnows) {
 }
 
 TEST_F(GDriveTreeId, NoWalkBeginsWhereTheTreeKnowsNothing) {
-    tree.Set("/", "id::file", "never asked");
-    for (const char* path : {"", "/", "/none", "none", "/none/a", "a/b", "//", "///"}) {
+    tree.Set("/", "id::file", "top");
+    for (const char* path : {"", "/none", "/none/a"}) {
         std::string found = "before";
-        EXPECT_EQ(drive->FindListStartID(path, found),
-                  std::string(path) == "/" ? "never asked" : "")
-            << path;
+        EXPECT_EQ(drive->FindListStartID(path, found), "") << path << ": the top is never asked";
+        EXPECT_EQ(found, "before") << path;
     }
     EXPECT_EQ(seams::LogDump(), "");
+    std::string found;
+    EXPECT_EQ(drive->FindListStartID("/", found), "top");
+    EXPECT_EQ(drive->FindListStartID("none", found), "") << "not inside the connection";
+    EXPECT_EQ(drive->FindListStartID("a/b", found), "");
 }
 
 TEST_F(GDriveTreeId, NoWalkBeginsInALostConnectionAndItIsAskedForOnce) {
@@ -124,12 +132,13 @@ TEST_F(GDriveNames, QuotesAreSentAndComparedAsUploadsWriteThem) {
     EXPECT_THAT(ids, ElementsAre("2"));
 }
 
-TEST_F(GDriveNames, ABackslashThatBreaksTheSearchIsAFailureAndNoMore) {
+TEST_F(GDriveNames, ABackslashInFrontOfAQuoteIsASearchThatTheServiceRefuses) {
     amy.AddPath("/a", "x");
-    for (const char* name : {"a\\", "a\\' or title='a"}) {
+    for (const char* name : {"a\\", "a\\' or title='a", "a\\' or title contains \"a"}) {
         std::vector<std::string> ids;
-        drive->GetFileIDByNameFromServer("root", name, "", ids);
+        EXPECT_FALSE(drive->GetFileIDByNameFromServer("root", name, "", ids)) << name;
         EXPECT_THAT(ids, IsEmpty()) << name;
+        EXPECT_EQ(Last().status, 400) << name;
     }
 }
 
@@ -168,7 +177,7 @@ TEST_F(GDriveNames, TenThousandItemsOfOneNameAreAllFound) {
 }
 
 TEST_F(GDriveNames, ThatCannotBeListedFail) {
-    service.AddFault(Fault::On("GET", kFiles).Answer(403, "{}"));
+    service.AddFault(Refused());
     std::vector<std::string> ids;
     EXPECT_FALSE(drive->GetFileIDByNameFromServer("root", "a", "", ids));
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_FORBIDDEN);
@@ -223,20 +232,43 @@ TEST_F(GDrivePick, LooksAtTheFirstItemAloneAndItsParentsInOrder) {
     }
 }
 
-TEST_F(GDrivePick, OfAnAnswerOfTheWrongTypesFails) {
-    for (const char* item : {R"({"parents":"1"})", R"({"parents":["1"]})", R"({"parents":[7]})",
-                             R"({"parents":[{"id":{}}]})", R"({"parents":7})"}) {
+TEST_F(GDrivePick, ParentsThatAreNoListAreNone) {
+    for (const char* item : {R"({"parents":"1"})", R"({"parents":7})", R"({"parents":true})"}) {
         service.AddFault(Found(item));
-        drive->SetError(VFS_ERR_NONE, "");
         std::vector<std::string> ids = {"1", "2"};
         std::string id;
-        drive->GetFileIDFromListByName("a", ids, id);
+        EXPECT_TRUE(drive->GetFileIDFromListByName("a", ids, id)) << item << seams::LogDump();
         EXPECT_EQ(id, "") << item;
     }
 }
 
+TEST_F(GDrivePick, ParentsOfTheWrongTypesAreAFailureOfTheCloud) {
+    for (const char* item : {R"({"parents":["1"]})", R"({"parents":[7]})",
+                             R"({"parents":[{"id":{}}]})", R"({"parents":[{"id":["1"]}]})"}) {
+        service.AddFault(Found(item));
+        drive->SetError(VFS_ERR_NONE, "");
+        std::vector<std::string> ids = {"1", "2"};
+        std::string id;
+        EXPECT_FALSE(drive->GetFileIDFromListByName("a", ids, id)) << item;
+        EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CLOUD_FAILED) << item;
+        EXPECT_EQ(id, "") << item;
+    }
+}
+
+TEST_F(GDrivePick, OfTenThousandThatAnAddressCannotNameFails) {
+    std::vector<std::string> ids;
+    for (int i = 0; i < 10000; ++i) {
+        ids.push_back("0B-" + std::to_string(5000000000 + i));
+    }
+    std::string id;
+    EXPECT_FALSE(drive->GetFileIDFromListByName("a", ids, id));
+    EXPECT_EQ(id, "");
+    EXPECT_NE(drive->GetErrorCode(), VFS_ERR_NONE);
+    EXPECT_TRUE(seams::Logged("Failed to list folder, a"));
+}
+
 TEST_F(GDrivePick, ThatCannotBeListedFailsWithALine) {
-    service.AddFault(Fault::On("GET", kFiles).Answer(403, "{}"));
+    service.AddFault(Refused());
     std::vector<std::string> ids = {"1", "2"};
     std::string id;
     EXPECT_FALSE(drive->GetFileIDFromListByName("a", ids, id));
@@ -257,6 +289,35 @@ TEST_F(GDriveWalk, LooksForTheFirstNameInAllTheDrive) {
                                          "' in parents and (title='old')",
                                      "trashed=false and '" + amy.Find("/deep/docs/old") +
                                          "' in parents and (title='a.txt')"));
+}
+
+TEST_F(GDriveWalk, OfTenNamesTakesTenRequests) {
+    const std::string path = "/a/b/c/d/e/f/g/h/i/j.txt";
+    const std::string id = amy.AddPath(path, "x");
+    std::string out;
+    EXPECT_TRUE(drive->GetFileIDByPathFromServer("", path, "", "", out));
+    EXPECT_EQ(out, id);
+    EXPECT_EQ(Requests().size(), 10U);
+}
+
+TEST_F(GDriveWalk, AlongAPathThatNoTreeHoldsAsksNothing) {
+    std::string out;
+    EXPECT_FALSE(drive->GetFileIDByPathFromServer("", "/" + std::string(5000, 'a'), "", "", out));
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_NOT_FOUND);
+    EXPECT_THAT(Requests(), IsEmpty());
+}
+
+TEST_F(GDriveWalk, ByNamesOfAnyKindFindsThem) {
+    for (const std::string& name :
+         {std::string(255, 'n'), std::string("\xf0\x9f\x98\x80 & + % # ?.txt"),
+          std::string("\xe2\x80\x8f.txt"), std::string("\xc4\xb0"), std::string("it's - it"),
+          std::string("%s%n"), std::string("a=b&q=c")}) {
+        const std::string id = amy.AddFile(root, name, "x");
+        std::string out;
+        EXPECT_TRUE(drive->GetFileIDByPathFromServer("", "/" + name, "", "", out))
+            << name << seams::LogDump();
+        EXPECT_EQ(out, id) << name;
+    }
 }
 
 TEST_F(GDriveWalk, ToAnEmptyPathIsTheRootWithoutARequest) {
@@ -336,7 +397,7 @@ TEST_F(GDriveWalk, ThatFindsNothingIsTrueWithoutAnIdOnItsWay) {
 }
 
 TEST_F(GDriveWalk, AFolderThatCannotBeListedIsLoggedAndNotFound) {
-    service.AddFault(Fault::On("GET", kFiles).Answer(403, "{}"));
+    service.AddFault(Refused());
     std::string out;
     EXPECT_FALSE(drive->GetFileIDByPathFromServer("", "/docs", "", "", out));
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_NOT_FOUND);

@@ -231,6 +231,7 @@ TEST_F(GDriveResumable, RestThatBeginsBehindItsEndIsNotSent) {
     Bytes bytes(1, content);
     EXPECT_FALSE(drive->StartUpload(Host() + kUploadPath, &bytes.xfer, 11, 10));
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CLOUD_FAILED);
+    EXPECT_FALSE(drive->StartUpload(Host() + kUploadPath, &bytes.xfer, 1, ~0ULL));
     EXPECT_FALSE(drive->StartUpload(Host() + kUploadPath, nullptr, 0, 10));
     EXPECT_THAT(Requests(), IsEmpty());
 }

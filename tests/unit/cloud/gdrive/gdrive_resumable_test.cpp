@@ -1,3 +1,5 @@
+#include <algorithm>
+
 #include "unit/cloud/gdrive/gdrive_upload_fixture.h"
 
 namespace ZYROCloud {
@@ -23,6 +25,10 @@ TEST_F(GDriveResumable, OpensASessionAsksForItsOffsetAndSendsAll) {
     EXPECT_EQ(Put(0).Header("Content-Range"), "bytes */*");
     EXPECT_EQ(Put(0).Header("Content-Length"), "0");
     EXPECT_EQ(Put(1).Header("Content-Length"), std::to_string(kAllBytes));
+    const cloudsim::Headers sent = Put(1).headers;
+    EXPECT_EQ(std::count_if(sent.begin(), sent.end(),
+                            [](const auto& line) { return line.first == "Content-Length"; }),
+              1);
     EXPECT_FALSE(Put(1).HasHeader("Content-Range"));
     EXPECT_FALSE(Put(1).HasHeader("Transfer-Encoding"));
     for (const JournalEntry& entry : service.Journal().All()) {
@@ -231,6 +237,14 @@ TEST_F(GDriveFile, OfASizeThatNobodyKnowsIsStoredWhole) {
     EXPECT_TRUE(Upload(-1)) << seams::LogDump();
     EXPECT_TRUE(Stored() == whole);
     EXPECT_EQ(Put(1).Header("Transfer-Encoding"), "chunked");
+}
+
+TEST_F(GDriveFile, OfASizeThatNobodyKnowsIsSentAgainFromItsStart) {
+    service.AddFault(OnPut(1).Answer(503));
+    service.AddFault(Arrived(2, "bytes=0-524287"));
+    EXPECT_TRUE(Upload(-1)) << seams::LogDump();
+    EXPECT_TRUE(Stored() == whole);
+    EXPECT_FALSE(Put(3).HasHeader("Content-Range"));
 }
 
 // --- tokens and cancels --------------------------------------------------------------------------

@@ -334,29 +334,23 @@ TEST_F(OneDriveBits, TheResultIsThatOfCloseSession) {
 
 class OneDriveBitsStream : public OneDriveBits {
   protected:
-    /** Bytes of the file as a stream gives them. */
-    static size_t Read(char* data, size_t size, size_t count, void* context) {
-        auto& self = *static_cast<XferContext*>(context);
-        const ssize_t n = read(file.Get(), data, std::min<size_t>(size * count, self.chunk_left));
-        self.chunk_left -= static_cast<unsigned int>(n);
-        return static_cast<size_t>(n);
-    }
+    OneDriveBitsStream() { bytes.context.fd = -1; }
+
     bool Stream() {
         Json::Value meta;
         EXPECT_TRUE(drive->GetMetaDataByURI(std::string(kServerId) + "/a", meta, "Upload"));
         meta["total_bytes"] = static_cast<Json::Int64>(kTotal);
-        return drive->UploadProcess(&xfer, meta);
+        return drive->UploadProcess(&bytes.xfer, meta);
     }
 
-    XferContext context;
-    XferData xfer{Read, 1, &context};
+    Bytes bytes{1, content};
 };
 
 TEST_F(OneDriveBitsStream, GoesInFragmentsToo) {
     Give({opened, Has(kFirst), Has(kTotal), ok});
     EXPECT_TRUE(Stream()) << seams::LogDump();
-    EXPECT_TRUE(context.limited);
-    EXPECT_EQ(context.chunk_size, 8 * kMiB);
+    EXPECT_TRUE(bytes.context.limited);
+    EXPECT_EQ(bytes.context.chunk_size, 8 * kMiB);
     EXPECT_TRUE(IsPart(2, kFirst, kTotal - kFirst));
 }
 
@@ -381,7 +375,7 @@ TEST_F(OneDriveBitsStream, OfWhatCannotSeekBackEndsWithALine) {
     ASSERT_EQ(pipe(ends), 0);
     const UniqueFd in(ends[0]);
     const UniqueFd out(ends[1]);
-    context.fd = in.Get();
+    bytes.context.fd = in.Get();
     Give({opened, Has(0, 503)});
     EXPECT_FALSE(Stream());
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_SERVER_ERROR);

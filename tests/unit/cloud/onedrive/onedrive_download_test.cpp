@@ -3,20 +3,8 @@
 namespace ZYROCloud {
 namespace {
 
-std::string received;
-
 class OneDriveDownload : public OneDriveTest {
   protected:
-    static size_t Write(char* data, size_t size, size_t count, void* context) {
-        static_cast<XferContext*>(context)->can_retry = false;
-        if (cancel) {
-            YLIBCErrSetEx(0xa600, "test", 1);
-            return 0;
-        }
-        received.append(data, size * count);
-        return size * count;
-    }
-
     /** libcurl leaves a connection on which it failed a status. */
     void Give(const std::vector<std::string>& answers) {
         std::vector<wire::Script> scripts;
@@ -25,22 +13,19 @@ class OneDriveDownload : public OneDriveTest {
         }
         Serve(scripts);
         meta["url"] = Api("/file.1!2/content");
-        received.clear();
-        cancel = false;
-        context = XferContext();
+        bytes.received.clear();
+        bytes.context = XferContext();
     }
-    bool Download() { return drive->DownloadProcess(&xfer, meta); }
+    bool Download() { return drive->DownloadProcess(&bytes.xfer, meta); }
 
-    static inline bool cancel = false;
+    Bytes bytes{0};
     Json::Value meta;
-    XferContext context;
-    XferData xfer{Write, 0, &context};
 };
 
 TEST_F(OneDriveDownload, OfAllIsOneRequestForItsEscapedUrl) {
     Give({Answer(200, "0123456789")});
     EXPECT_TRUE(Download()) << seams::LogDump();
-    EXPECT_EQ(received, "0123456789");
+    EXPECT_EQ(bytes.received, "0123456789");
     EXPECT_THAT(Requests(), ElementsAre("GET /v5.0/file.1%212/content?pretty=false"));
     EXPECT_EQ(HeaderOf(Request(0), "Authorization"), "Bearer token-canary");
     EXPECT_EQ(HeaderOf(Request(0), "Range"), "-");
@@ -58,7 +43,7 @@ TEST_F(OneDriveDownload, IsRepeatedBeforeItsFirstByte) {
     Give({Answer(503, "unseen"), Refusal(420, "request_throttled", "Wait 9 seconds"),
           Answer(200, "x")});
     EXPECT_TRUE(Download()) << seams::LogDump();
-    EXPECT_EQ(received, "x");
+    EXPECT_EQ(bytes.received, "x");
     // Behind a failure that libcurl tells, there is no body with a time to wait. The handler waits
     // behind each failure, and so does the loop.
     EXPECT_THAT(seams::Sleeps(), ElementsAre(5, 5, 5, 5));
@@ -83,7 +68,7 @@ TEST_F(OneDriveDownload, ThatIsForbiddenOrGoneFailsAtOnce) {
         Give({Answer(status, "unseen")});
         EXPECT_FALSE(Download());
         EXPECT_EQ(drive->GetErrorCode(), code);
-        EXPECT_EQ(received, "");
+        EXPECT_EQ(bytes.received, "");
         EXPECT_THAT(Requests(), SizeIs(1));
     }
     EXPECT_THAT(tree.Writes(), IsEmpty());
@@ -91,7 +76,7 @@ TEST_F(OneDriveDownload, ThatIsForbiddenOrGoneFailsAtOnce) {
 
 TEST_F(OneDriveDownload, ThatMayNotBeRepeatedIsNot) {
     Give({Answer(503)});
-    context.can_retry = false;
+    bytes.context.can_retry = false;
     EXPECT_FALSE(Download());
     EXPECT_THAT(Requests(), SizeIs(1));
     EXPECT_FALSE(seams::LoggedPart("Retry Download")) << seams::LogDump();
@@ -99,7 +84,7 @@ TEST_F(OneDriveDownload, ThatMayNotBeRepeatedIsNot) {
 
 TEST_F(OneDriveDownload, CancelledEndsThere) {
     Give({Answer(200, "0123")});
-    cancel = true;
+    bytes.cancel_at = 0;
     EXPECT_FALSE(Download());
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CANCELLED);
     EXPECT_THAT(seams::Sleeps(), IsEmpty());
@@ -119,7 +104,7 @@ TEST_F(OneDriveDownload, WithoutAUrlOrAPlaceToGoToFails) {
     Give({});
     for (const char* text : {"{}", R"({"url":""})", R"({"url":{}})", "[]", "7"}) {
         drive->SetError(VFS_ERR_NONE, "");
-        EXPECT_FALSE(drive->DownloadProcess(&xfer, Object(text))) << text;
+        EXPECT_FALSE(drive->DownloadProcess(&bytes.xfer, Object(text))) << text;
         EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CLOUD_FAILED) << text;
     }
     EXPECT_TRUE(seams::Logged("Downlaod URL is empty")) << seams::LogDump();

@@ -17,34 +17,18 @@
 
 #include "cloud/onedrive/onedrive.h"
 #include "core/handle.h"
-#include "core/json.h"
-#include "core/paths.h"
-#include "http/api_handler.h"
-#include "support/profiles.h"
-#include "support/seams.h"
-#include "support/token_profile.h"
+#include "support/cloudsim/onedrive.h"
+#include "support/driver_fixture.h"
 #include "support/wire_server.h"
-#include "support/xattrtree/xattrtree.h"
-#include "zyrovfs/cloud_utils.h"
 
 namespace ZYROCloud {
 
-using namespace ZYROVFS;  // NOLINT(google-build-using-namespace)
-using testing::ElementsAre;
-using testing::HasSubstr;
-using testing::IsEmpty;
 using testing::Not;
 using testing::SizeIs;
 using wire::Answer;
 
 inline constexpr const char* kServerId = "onedrive://amy@example.com";
 inline constexpr long long kMiB = 1048576;
-
-inline Json::Value Object(const std::string& text) {
-    Json::Value value;
-    EXPECT_TRUE(json::fromString(value, text)) << text;
-    return value;
-}
 
 /** A script that gives these answers, each to a whole request. */
 inline wire::Script Answering(const std::vector<std::string>& answers) {
@@ -180,13 +164,19 @@ class OneDriveTest : public profiles::ProfileTest {
     std::unique_ptr<OneDrive> drive;
 };
 
-/** A file of so many bytes, no two parts of it alike. */
+/** A file of so many bytes, with no period that a fragment could be shifted by. */
 inline UniqueFd PatternFile(long long size, std::string* text = nullptr) {
+    constexpr size_t kPeriod = 65537;
     UniqueFd file(memfd_create("pattern", MFD_CLOEXEC));
-    std::string bytes(static_cast<size_t>(size), '\0');
-    for (size_t i = 0; i < bytes.size(); ++i) {
-        bytes[i] = static_cast<char>(i ^ (i >> 8) ^ (i >> 16));
+    std::string bytes;
+    for (size_t i = 0; i < kPeriod; ++i) {
+        bytes += static_cast<char>(i ^ (i >> 8));
     }
+    bytes.reserve(static_cast<size_t>(size) + kPeriod);
+    while (bytes.size() < static_cast<size_t>(size)) {
+        bytes.append(bytes, 0, kPeriod);
+    }
+    bytes.resize(static_cast<size_t>(size));
     EXPECT_EQ(write(file.Get(), bytes.data(), bytes.size()), size);
     lseek(file.Get(), 0, SEEK_SET);
     if (text != nullptr) {
@@ -194,6 +184,30 @@ inline UniqueFd PatternFile(long long size, std::string* text = nullptr) {
     }
     return file;
 }
+
+/** Conflicts as the driver's table has them; the service's description has two forms. */
+struct LiveService : cloudsim::OneDrive {
+    LiveService() : OneDrive(Options()) {}
+    static cloudsim::OneDriveOptions Options() {
+        cloudsim::OneDriveOptions options;
+        options.conflict_status = 400;
+        options.journal_hashes = options.hash_uploads = false;
+        return options;
+    }
+};
+
+/** The driver before a service that keeps what it is given. */
+class OneDriveServiceTest : public DriverFixture<OneDrive, LiveService> {
+  protected:
+    OneDriveServiceTest() : DriverFixture("onedrive") {
+        account_info = R"({"id":")" + amy.Id() + "\"}";
+    }
+    std::map<std::string, std::string> Hosts() const override {
+        return {{"LiveApiHost", service.ApiHost()},
+                {"LiveLoginHost", service.LoginHost()},
+                {"LiveStorageDomain", service.StorageDomain()}};
+    }
+};
 
 }  // namespace ZYROCloud
 
