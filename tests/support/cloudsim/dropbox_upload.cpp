@@ -57,7 +57,8 @@ Reply DropboxUpload::Finish() {
     return dropbox_.Answer([&] {
         CheckSize(came_);
         const DropboxCall call = {request_, account_, dropbox::ReadHeader(request_, kind_.name)};
-        return (this->*kind_.store)(call);
+        const auto store = kind_.store;
+        return (this->*store)(call);
     });
 }
 
