@@ -2,6 +2,7 @@
 // account is told, and what is said when its owner took the grant back.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <json/reader.h>
 #include <json/value.h>
 #include <sys/stat.h>
 
@@ -79,10 +80,7 @@ class Clouds : public testing::Environment {
         Add("dropbox", std::move(dropbox));
         Add("google", std::move(google));
         Add("onedrive", std::move(onedrive));
-        // Stands for the mounts: the box's own backends serve the trees that drivers look at.
-        Must(R"(sed -E 's|"path":"","protocol":"([a-z]+)"|"path":"/tmp/clouds/\1",)"
-             R"("protocol":"\1"|g' /usr/zyro/etc/zyrovfs/4001/servers.conf )"
-             ">/var/tmp/zyrovfs/4001/connect.conf");
+        RecordConnections();
     }
     void TearDown() override { places.clear(); }
 
@@ -91,6 +89,14 @@ class Clouds : public testing::Environment {
         const cloudsim::Tokens tokens = place.account->IssueTokens();
         std::ofstream("/tmp/access") << tokens.access_token << '\n';
         std::ofstream("/tmp/refresh") << tokens.refresh_token << '\n';
+    }
+
+    /** Stands for the mounts: the box's own backends serve the trees that drivers look at. */
+    static void RecordConnections() {
+        Must(
+            "sed -E 's|\"path\":\"\",\"protocol\":\"([a-z]+)\"|"
+            "\"path\":\"/tmp/clouds/\\1\",\"protocol\":\"\\1\"|g' "
+            "/usr/zyro/etc/zyrovfs/4001/servers.conf >/var/tmp/zyrovfs/4001/connect.conf");
     }
 
     std::vector<Place> places;
@@ -181,7 +187,8 @@ TEST(ToolClouds, AnAccountIsShownWithItsNameAndSpace) {
                     AllOf(HasSubstr("Name:   Amy\n"), HasSubstr("E-mail: amy@example.com\n"),
                           HasSubstr(" of 50.0 MiB used\n")));
         Json::Value account;
-        std::istringstream(ForAmy("account --json " + place.Id()).output) >> account;
+        std::istringstream text(ForAmy("account --json " + place.Id()).output);
+        text >> account;
         EXPECT_EQ(account["email"], "amy@example.com");
         EXPECT_EQ(account["total"].asUInt64(), 50 * kMiB);
         EXPECT_EQ(account["used"].asUInt64(), place.account->Used());
@@ -209,9 +216,7 @@ TEST(ToolClouds, WhenAGrantWasTakenBackTheWayOutIsTold) {
                    " --access-token-file /tmp/access --refresh-token-file /tmp/refresh "
                    "--expires-in 3600");
         EXPECT_EQ(saved.status, 0) << saved.output;
-        Must(R"(sed -E 's|"path":"","protocol":"([a-z]+)"|"path":"/tmp/clouds/\1",)"
-             R"("protocol":"\1"|g' /usr/zyro/etc/zyrovfs/4001/servers.conf )"
-             ">/var/tmp/zyrovfs/4001/connect.conf");
+        Clouds::RecordConnections();
         const Outcome again = ForAmy("account " + place.Id());
         EXPECT_EQ(again.status, 0) << again.output;
     }

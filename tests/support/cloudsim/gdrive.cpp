@@ -54,8 +54,10 @@ GDrive::GDrive(const GDriveOptions& options) : Service(options, Rules()), drive_
 }
 
 std::string GDrive::Role(const Request& request) const {
-    const std::string &host = request.host, &path = request.path;
-    const bool bare = IsBareAddress(host);
+    const std::string& path = request.path;
+    const bool bare = IsBareAddress(request.host);
+    // At a bare address only the path tells.
+    const std::string host = bare ? "" : request.host;
     if (host == drive_options_.accounts_name || BeginsWith(host, "accounts.") ||
         BeginsWith(path, "/oauth2/") || (bare && IsTokenPath(path))) {
         return kAccount;
