@@ -170,4 +170,17 @@ TEST_F(Served, ANameThatTheDiskRefusesChangesNothing) {
     EXPECT_FALSE(amy.Exists("/" + name));
 }
 
+TEST(JoinedContent, ReadsAcrossItsPiecesAndNothingBehindThem) {
+    const auto joined = cloudsim::MakeJoined({cloudsim::MakeBytes("012"), cloudsim::MakeBytes(""),
+                                              cloudsim::MakeBytes("34"), cloudsim::MakeBytes("5")});
+    EXPECT_EQ(6u, joined->Size());
+    EXPECT_EQ("012345", joined->Bytes());
+    EXPECT_EQ(cloudsim::MakeBytes("012345")->Sha1(), joined->Sha1());
+    char byte = 0;
+    EXPECT_EQ(1, joined->Read(3, &byte, 1));
+    EXPECT_EQ('3', byte);
+    EXPECT_EQ(0, joined->Read(6, &byte, 1));
+    EXPECT_EQ(0u, cloudsim::MakeJoined({})->Size());
+}
+
 }  // namespace
