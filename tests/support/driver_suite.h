@@ -96,6 +96,15 @@ struct Endpoint {
     bool exact = false;  ///< nothing behind it is another operation's
 };
 
+/** One request of an upload in a session, for a file that is one piece. */
+struct SessionStep {
+    const char* name;
+    Endpoint at;
+    int after;           ///< requests of this address that come before it
+    bool repeats;        ///< made again when a status passes
+    bool survives_loss;  ///< the upload is a success when the answer is lost
+};
+
 /** One service as the suite needs it. Paths are those of the account. */
 class Rig {
   public:
@@ -138,6 +147,10 @@ class Rig {
     virtual std::string PageText(const std::string& items) = 0;
     /** A page that names itself as the next one; "" where pages have no names. */
     virtual std::string CircularPage() { return ""; }
+
+    virtual std::vector<SessionStep> SessionSteps() { return {}; }
+    /** The upload that large files take. */
+    virtual bool SendInSession(PublicCloud&, XferData&, const Json::Value&) { return false; }
 
     cloudsim::Account* amy = nullptr;  ///< whose items all this is about
 };
@@ -197,6 +210,11 @@ class DriverItems : public DriverTest {};
 class DriverChanges : public DriverTest {};
 class DriverTransfer : public DriverTest {};
 class DriverCancel : public DriverTest {};
+class DriverSessions : public DriverTest {
+  protected:
+    bool UploadBySession(Source& source);
+    void ExpectAt(const SessionStep& step, const Fault& fault, bool success);
+};
 class DriverToken : public DriverTest {};
 class DriverFaults : public DriverTest {};
 class DriverNames : public DriverTest {};
@@ -210,6 +228,7 @@ class DriverNames : public DriverTest {};
     INSTANTIATE_TEST_SUITE_P(Service, DriverChanges, testing::Values(maker));  \
     INSTANTIATE_TEST_SUITE_P(Service, DriverTransfer, testing::Values(maker)); \
     INSTANTIATE_TEST_SUITE_P(Service, DriverCancel, testing::Values(maker));   \
+    INSTANTIATE_TEST_SUITE_P(Service, DriverSessions, testing::Values(maker)); \
     INSTANTIATE_TEST_SUITE_P(Service, DriverToken, testing::Values(maker));    \
     INSTANTIATE_TEST_SUITE_P(Service, DriverFaults, testing::Values(maker));   \
     INSTANTIATE_TEST_SUITE_P(Service, DriverNames, testing::Values(maker));    \

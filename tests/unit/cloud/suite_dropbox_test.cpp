@@ -23,17 +23,17 @@ Capabilities DropboxCan() {
     can.refused_file = 10737418241;
     can.largest_direct = 33554432;
     can.repeats_bad_answers = true;
-    can.statuses = {{400, VFS_ERR_TOKEN_REVOKED, false},
-                    {409, VFS_ERR_BAD_REQUEST, false},
-                    {409, VFS_ERR_NOT_FOUND, false,
-                     R"({"error":{".tag":"path","path":{".tag":"not_found"}}})"},
-                    {409, VFS_ERR_PERMISSION_DENIED, false,
-                     R"({"error":{".tag":"path","path":{".tag":"no_write_permission"}}})"},
-                    {409, VFS_ERR_NO_SPACE, false,
-                     R"({"error":{".tag":"path","reason":{".tag":"insufficient_space"}}})"},
-                    {429, VFS_ERR_RATE_LIMITED, true},
-                    {503, VFS_ERR_RATE_LIMITED, true},
-                    {507, VFS_ERR_QUOTA_EXCEEDED, false}};
+    can.statuses = {
+        {400, VFS_ERR_TOKEN_REVOKED, false},
+        {409, VFS_ERR_BAD_REQUEST, false},
+        {409, VFS_ERR_NOT_FOUND, false, R"({"error":{".tag":"path","path":{".tag":"not_found"}}})"},
+        {409, VFS_ERR_PERMISSION_DENIED, false,
+         R"({"error":{".tag":"path","path":{".tag":"no_write_permission"}}})"},
+        {409, VFS_ERR_NO_SPACE, false,
+         R"({"error":{".tag":"path","reason":{".tag":"insufficient_space"}}})"},
+        {429, VFS_ERR_RATE_LIMITED, true},
+        {503, VFS_ERR_RATE_LIMITED, true},
+        {507, VFS_ERR_QUOTA_EXCEEDED, false}};
     return can;
 }
 
@@ -59,6 +59,16 @@ class DropboxRig : public KnowingRigOf<Dropbox, cloudsim::Dropbox> {
     }
     bool MoveInto(PublicCloud& cloud, const std::string& path, const std::string& folder) override {
         return cloud.Move(path, folder + path.substr(path.rfind('/')));
+    }
+
+    // An item of a listing has no member that its description by path has.
+    std::string ItemId(PublicCloud& cloud, const Json::Value& item) override {
+        return item.isMember("path") ? KnowingRigOf::ItemId(cloud, item)
+                                     : item["path_display"].asString();
+    }
+    bool IsFolder(PublicCloud& cloud, const Json::Value& item) override {
+        return item.isMember("is_dir") ? KnowingRigOf::IsFolder(cloud, item)
+                                       : item[".tag"] == "folder";
     }
 
     Endpoint At(Op op) override {
@@ -90,6 +100,15 @@ class DropboxRig : public KnowingRigOf<Dropbox, cloudsim::Dropbox> {
     Fault AnyListing() override { return Fault::On("POST", "/2/files/list_folder"); }
     Fault& Conflict(Fault&& fault) override {
         return fault.Answer(409, R"({"error":{".tag":"to","to":{".tag":"conflict"}}})");
+    }
+    std::vector<SessionStep> SessionSteps() override {
+        // A piece, or the end, that arrived is refused when it comes again.
+        return {{"start", {"POST", "/2/files/upload_session/start"}, 0, true, true},
+                {"append", {"POST", "/2/files/upload_session/append_v2"}, 0, true, false},
+                {"finish", {"POST", "/2/files/upload_session/finish"}, 0, true, false}};
+    }
+    bool SendInSession(PublicCloud& cloud, XferData& xfer, const Json::Value& meta) override {
+        return Of(cloud).ChunkedUpload(&xfer, meta);
     }
     std::string ItemText(const std::string& name, const std::string& id, bool folder) override {
         return "{\".tag\":\"" + std::string(folder ? "folder" : "file") + "\",\"path\":\"/" + id +

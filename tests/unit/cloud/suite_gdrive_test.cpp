@@ -98,6 +98,16 @@ class GDriveRig : public RigOf<GDrive, cloudsim::GDrive> {
         return Address(path).substr(sim_.ContentHost().size());
     }
     Fault AnyListing() override { return Fault::On("GET", std::string(kFiles) + "?"); }
+    std::vector<SessionStep> SessionSteps() override {
+        // Only the bytes are tried again, each time from where the service says. A question whose
+        // answer is lost on a kept connection is repeated by libcurl itself.
+        return {{"start", {"POST", "/upload/drive/v2/files?uploadType=resumable"}, 0, false, false},
+                {"ask", {"PUT", "/upload/drive/v2/files?"}, 0, false, true},
+                {"send", {"PUT", "/upload/drive/v2/files?"}, 1, true, true}};
+    }
+    bool SendInSession(PublicCloud& cloud, XferData& xfer, const Json::Value& meta) override {
+        return Of(cloud).ResumableUpload(&xfer, meta);
+    }
     std::string ItemText(const std::string& name, const std::string& id, bool folder) override {
         return R"({"kind":"drive#file","id":")" + id + R"(","title":)" + name +
                (folder ? R"(,"mimeType":"application/vnd.google-apps.folder"})" : "}");

@@ -97,6 +97,16 @@ class OneDriveRig : public KnowingRigOf<OneDrive, cloudsim::OneDrive> {
     Fault& Conflict(Fault&& fault) override {
         return fault.Answer(400, R"({"error":{"code":"resource_already_exists"}})");
     }
+    std::vector<SessionStep> SessionSteps() override {
+        // Only the bytes are tried again, from where the service says.
+        const Endpoint storage = {"BITS_POST", "/users/0x" + amy->Id() + "/LiveFolders/up.txt"};
+        return {{"create", storage, 0, false, false},
+                {"fragment", storage, 1, true, true},
+                {"close", storage, 2, false, false}};
+    }
+    bool SendInSession(PublicCloud& cloud, XferData& xfer, const Json::Value& meta) override {
+        return Of(cloud).ChunkedUpload(&xfer, meta);
+    }
     std::string ItemText(const std::string& name, const std::string& id, bool folder) override {
         return "{\"type\":\"" + std::string(folder ? "folder" : "file") + "\",\"id\":\"" + id +
                "\",\"name\":" + name + "}";
