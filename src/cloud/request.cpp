@@ -94,7 +94,7 @@ bool Request::Start(APIHandler& api, XferData* xfer) {
         // In force from the next Init on, so it cannot wait.
         api.SetReturnOnError(true);
     }
-    return api.Init() && (xfer == nullptr || cloud_.InitXferData(xfer));
+    return api.Init() && api.AllowOnlyHttp() && (xfer == nullptr || cloud_.InitXferData(xfer));
 }
 
 bool Request::Describe(APIHandler& api) {

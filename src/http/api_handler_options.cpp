@@ -154,6 +154,10 @@ bool APIHandler::SetSeekFunAndData(SeekCallback function, void* data) {
             Accept(curl_easy_setopt(curl_, CURLOPT_SEEKDATA, data), "seek data"));
 }
 
+bool APIHandler::AllowOnlyHttp() {
+    return Accept(curl_easy_setopt(curl_, CURLOPT_PROTOCOLS_STR, "http,https"), "protocols");
+}
+
 void APIHandler::ForgetSeek() {
     seek_function_ = nullptr;
     seek_data_ = nullptr;

@@ -265,5 +265,13 @@ TEST_F(RequestFrame, FailingOnErrorsStaysInForceForLaterRequests) {
     EXPECT_EQ(cloud_.GetErrorCode(), VFS_ERR_NOT_FOUND);
 }
 
+TEST_F(RequestFrame, NoOtherProtocolThanHttpIsSpoken) {
+    for (const char* url : {"file:///etc/passwd", "ftp://127.0.0.1/x", "dict://127.0.0.1/x"}) {
+        EXPECT_FALSE(Request(cloud_, kRenewing).Get(url).Retries(0).Send()) << url;
+        EXPECT_EQ(cloud_.GetError()["curl_code"], 1) << url;
+        EXPECT_EQ(cloud_.GetAPIHandler()->GetResponse(), "") << url;
+    }
+}
+
 }  // namespace
 }  // namespace ZYROCloud
