@@ -11,6 +11,7 @@
 
 #include "cloud/conflict.h"
 #include "cloud/path_walk.h"
+#include "cloud/request.h"
 #include "core/log.h"
 #include "zyrovfs/cloud.h"
 
@@ -58,6 +59,29 @@ bool ReplaceItem(Driver& driver, const std::string& id, Find find, Again again) 
             return rival != id && driver.Delete(rival);
         },
         again);
+}
+
+/**
+ * Copies the item at `from` into the folder that `to` is in; `describe` makes the service's request
+ * from the ids of both. With `overwrite` a file in the way, which `find` describes, gives way once:
+ * the driver's DoCopy is then called without it. VFS_ERR_NOT_FOUND, VFS_ERR_IS_DIRECTORY.
+ */
+template <typename Driver, typename Describe, typename Find>
+bool CopyByPath(Driver& driver, const std::string& from, const std::string& to, bool overwrite,
+                Describe describe, Find find,
+                ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here()) {
+    std::string id;
+    std::string parent_id;
+    if (!FindCopyIds(driver, from, to, id, parent_id, at)) {
+        return false;
+    }
+    Request request = describe(id, parent_id);
+    const auto again = [&] { return driver.DoCopy(from, to, false); };
+    if (overwrite) {
+        request.Unless(ZYROVFS::VFS_ERR_CONFLICT,
+                       [&] { return ReplaceItem(driver, id, find, again); });
+    }
+    return request.Send();
 }
 
 /** Moves the item at `from` into the folder that `to` is in, by the driver's move of ids. Its name

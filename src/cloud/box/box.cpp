@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <ctime>
 #include <limits>
-#include <new>
 
 #include "cloud/box/box_api.h"
 #include "cloud/guard.h"
@@ -13,7 +12,6 @@
 #include "cloud/size_limit.h"
 #include "core/log.h"
 #include "http/api_handler.h"
-#include "http/error_handler.h"
 
 namespace ZYROCloud {
 
@@ -38,23 +36,6 @@ std::string ItemsOf(const std::string& id) {
 }
 
 }  // namespace
-
-Box::Box() {
-    Box::Init();
-}
-
-Box::Box(unsigned int owner, const Json::Value& profile) : PublicCloud(owner, profile) {
-    Box::Init();
-}
-
-bool Box::Init() {
-    // Refusals are told apart by the body of the answer.
-    return Box::SetAPIErrorHandler(api) && api->SetReturnOnError(false);
-}
-
-bool Box::SetAPIErrorHandler(APIHandler* handler) {
-    return handler != nullptr && handler->SetErrorHandler(new (std::nothrow) BoxErrorHandler);
-}
 
 bool Box::SetRefreshTokenParam(APIHandler* handler) {
     return handler != nullptr &&

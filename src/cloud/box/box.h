@@ -11,14 +11,13 @@
 #include <string>
 #include <vector>
 
-#include "cloud/public_cloud.h"
+#include "cloud/driver_of.h"
 
 namespace ZYROCloud {
 
-class Box : public PublicCloud {
+class Box : public DriverOf<BoxErrorHandler> {
   public:
-    Box();
-    Box(unsigned int uid, const Json::Value& profile);
+    using DriverOf::DriverOf;
 
     // --- account and metadata ------------------------------------------------------------------
 
@@ -39,8 +38,6 @@ class Box : public PublicCloud {
     /** Item id of a description. */
     std::string GetFileID(const Json::Value& item);
 
-    bool Init() override;
-    bool SetAPIErrorHandler(APIHandler* handler) override;
     bool UpdateAccountInfo() override;
     bool SetRefreshTokenParam(APIHandler* handler) override;
 

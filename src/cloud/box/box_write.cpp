@@ -56,22 +56,16 @@ bool Box::Copy(const std::string& from, const std::string& to) {
 }
 
 bool Box::DoCopy(const std::string& from, const std::string& to, bool overwrite) {
-    std::string id;
-    std::string parent_id;
-    if (!FindCopyIds(*this, from, to, id, parent_id)) {
-        return false;
-    }
+    // Without a name in the body the copy has its source's name, whatever `to` ends in.
+    const auto describe = [this](const std::string& id, const std::string& parent_id) {
+        Request request(*this, kFrame);
+        request.Post(Api(id + "/copy")).Body(Into(parent_id));
+        return request;
+    };
     const auto find = [&](Json::Value& item) {
         return GetFileInfoByPathFromServer("", to, Json::Value(Json::objectValue), "", item);
     };
-    const auto again = [&] { return DoCopy(from, to, false); };
-    // Without a name in the body the copy has its source's name, whatever `to` ends in.
-    Request request(*this, kFrame);
-    request.Post(Api(id + "/copy")).Body(Into(parent_id));
-    if (overwrite) {
-        request.Unless(VFS_ERR_CONFLICT, [&] { return ReplaceItem(*this, id, find, again); });
-    }
-    return request.Send();
+    return CopyByPath(*this, from, to, overwrite, describe, find);
 }
 
 bool Box::SetModifiedDate(const std::string& /*id*/, const std::string& /*date*/) {

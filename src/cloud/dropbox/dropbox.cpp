@@ -5,7 +5,6 @@
 #include <algorithm>
 #include <cstring>
 #include <iterator>
-#include <new>
 
 #include "cloud/dropbox/dropbox_api.h"
 #include "cloud/guard.h"
@@ -14,7 +13,6 @@
 #include "cloud/size_limit.h"
 #include "core/log.h"
 #include "http/api_handler.h"
-#include "http/error_handler.h"
 
 namespace ZYROCloud {
 
@@ -48,23 +46,6 @@ bool KeepAll(const Json::Value& /*item*/) {
 }
 
 }  // namespace
-
-Dropbox::Dropbox() {
-    Dropbox::Init();
-}
-
-Dropbox::Dropbox(unsigned int owner, const Json::Value& profile) : PublicCloud(owner, profile) {
-    Dropbox::Init();
-}
-
-bool Dropbox::Init() {
-    // What went wrong stands in the body of the answer: a status of 409 can be anything.
-    return Dropbox::SetAPIErrorHandler(api) && api->SetReturnOnError(false);
-}
-
-bool Dropbox::SetAPIErrorHandler(APIHandler* handler) {
-    return handler != nullptr && handler->SetErrorHandler(new (std::nothrow) DropboxErrorHandler);
-}
 
 bool Dropbox::SetRefreshTokenParam(APIHandler* /*handler*/) {
     return false;

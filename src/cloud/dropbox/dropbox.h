@@ -9,14 +9,13 @@
 
 #include <string>
 
-#include "cloud/public_cloud.h"
+#include "cloud/driver_of.h"
 
 namespace ZYROCloud {
 
-class Dropbox : public PublicCloud {
+class Dropbox : public DriverOf<DropboxErrorHandler> {
   public:
-    Dropbox();
-    Dropbox(unsigned int uid, const Json::Value& profile);
+    using DriverOf::DriverOf;
 
     // --- account and metadata ------------------------------------------------------------------
 
@@ -40,8 +39,6 @@ class Dropbox : public PublicCloud {
     bool IsDir(const Json::Value& item);
     std::string GetFileID(const Json::Value& item);
 
-    bool Init() override;
-    bool SetAPIErrorHandler(APIHandler* handler) override;
     /** Never: there is nothing to renew a token with. */
     bool SetRefreshTokenParam(APIHandler* handler) override;
 

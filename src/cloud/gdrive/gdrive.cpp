@@ -1,7 +1,5 @@
 #include "cloud/gdrive/gdrive.h"
 
-#include <new>
-
 #include "cloud/gdrive/gdrive_api.h"
 #include "cloud/guard.h"
 #include "cloud/pager.h"
@@ -9,7 +7,6 @@
 #include "cloud/size_limit.h"
 #include "core/log.h"
 #include "http/api_handler.h"
-#include "http/error_handler.h"
 
 namespace ZYROCloud {
 
@@ -35,23 +32,6 @@ bool IsTrashed(const Json::Value& item) {
 }
 
 }  // namespace
-
-GDrive::GDrive() {
-    GDrive::Init();
-}
-
-GDrive::GDrive(unsigned int owner, const Json::Value& profile) : PublicCloud(owner, profile) {
-    GDrive::Init();
-}
-
-bool GDrive::Init() {
-    // Refusals are told apart by the body of the answer.
-    return GDrive::SetAPIErrorHandler(api) && api->SetReturnOnError(false);
-}
-
-bool GDrive::SetAPIErrorHandler(APIHandler* handler) {
-    return handler != nullptr && handler->SetErrorHandler(new (std::nothrow) GDriveErrorHandler);
-}
 
 bool GDrive::SetRefreshTokenParam(APIHandler* handler) {
     return handler != nullptr &&

@@ -12,14 +12,13 @@
 #include <string>
 #include <vector>
 
-#include "cloud/public_cloud.h"
+#include "cloud/driver_of.h"
 
 namespace ZYROCloud {
 
-class GDrive : public PublicCloud {
+class GDrive : public DriverOf<GDriveErrorHandler> {
   public:
-    GDrive();
-    GDrive(unsigned int uid, const Json::Value& profile);
+    using DriverOf::DriverOf;
 
     // --- account and metadata ------------------------------------------------------------------
 
@@ -39,8 +38,6 @@ class GDrive : public PublicCloud {
     bool ListFolder(const std::string& folder_id, const Json::Value& params, Json::Value& out,
                     const std::string& page_token);
 
-    bool Init() override;
-    bool SetAPIErrorHandler(APIHandler* handler) override;
     bool UpdateAccountInfo() override;
     bool SetRefreshTokenParam(APIHandler* handler) override;
 

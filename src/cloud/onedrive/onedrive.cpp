@@ -1,14 +1,11 @@
 #include "cloud/onedrive/onedrive.h"
 
-#include <new>
-
 #include "cloud/onedrive/onedrive_api.h"
 #include "cloud/secret.h"
 #include "cloud/size_limit.h"
 #include "core/json.h"
 #include "core/log.h"
 #include "http/api_handler.h"
-#include "http/error_handler.h"
 
 namespace ZYROCloud {
 
@@ -32,23 +29,6 @@ bool TakeItems(Cloud& cloud, Json::Value& answer, Json::Value& out,
 }
 
 }  // namespace
-
-OneDrive::OneDrive() {
-    OneDrive::Init();
-}
-
-OneDrive::OneDrive(unsigned int owner, const Json::Value& profile) : PublicCloud(owner, profile) {
-    OneDrive::Init();
-}
-
-bool OneDrive::Init() {
-    // Refusals are told apart by the body of the answer.
-    return OneDrive::SetAPIErrorHandler(api) && api->SetReturnOnError(false);
-}
-
-bool OneDrive::SetAPIErrorHandler(APIHandler* handler) {
-    return handler != nullptr && handler->SetErrorHandler(new (std::nothrow) OneDriveErrorHandler);
-}
 
 bool OneDrive::SetRefreshTokenParam(APIHandler* handler) {
     if (handler == nullptr) {

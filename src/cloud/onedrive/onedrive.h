@@ -12,14 +12,13 @@
 #include <string>
 #include <vector>
 
-#include "cloud/public_cloud.h"
+#include "cloud/driver_of.h"
 
 namespace ZYROCloud {
 
-class OneDrive : public PublicCloud {
+class OneDrive : public DriverOf<OneDriveErrorHandler> {
   public:
-    OneDrive();
-    OneDrive(unsigned int uid, const Json::Value& profile);
+    using DriverOf::DriverOf;
 
     // --- account and metadata ------------------------------------------------------------------
 
@@ -46,8 +45,6 @@ class OneDrive : public PublicCloud {
     /** Asked anew each time; "" on failure. */
     std::string GetRootFileID();
 
-    bool Init() override;
-    bool SetAPIErrorHandler(APIHandler* handler) override;
     bool UpdateAccountInfo() override;
     /** Takes the one OAuth client of this service, whatever the profile says. */
     bool SetRefreshTokenParam(APIHandler* handler) override;

@@ -50,22 +50,16 @@ bool OneDrive::Copy(const std::string& from, const std::string& to) {
 }
 
 bool OneDrive::DoCopy(const std::string& from, const std::string& to, bool overwrite) {
-    std::string id;
-    std::string parent_id;
-    if (!FindCopyIds(*this, from, to, id, parent_id)) {
-        return false;
-    }
+    // The copy has its source's name, whatever `to` ends in.
+    const auto describe = [this](const std::string& id, const std::string& parent_id) {
+        Request request(*this, kFrame);
+        request.To("COPY", Api(id)).Body(Only("destination", parent_id));
+        return request;
+    };
     const auto find = [&](Json::Value& item) {
         return GetFileInfoByPathFromServer(to, "", Json::Value(Json::objectValue), "", item);
     };
-    const auto again = [&] { return DoCopy(from, to, false); };
-    // The copy has its source's name, whatever `to` ends in.
-    Request request(*this, kFrame);
-    request.To("COPY", Api(id)).Body(Only("destination", parent_id));
-    if (overwrite) {
-        request.Unless(VFS_ERR_CONFLICT, [&] { return ReplaceItem(*this, id, find, again); });
-    }
-    return request.Send();
+    return CopyByPath(*this, from, to, overwrite, describe, find);
 }
 
 bool OneDrive::SetModifiedDate(const std::string& /*id*/, const std::string& /*date*/) {
