@@ -82,8 +82,8 @@ class APIHandler {
     /** A multipart body. Not owned, must outlive Process; null for none. */
     bool SetFormUploadData(FormUploadData* form);
     bool IsForm() const { return form_data_ != nullptr; }
-    /** Behind Init: no other protocol than HTTP, whatever the URL says; one that came from a service
-     * or from the mounted tree may name a file of this machine. */
+    /** Behind Init: no other protocol than HTTP, whatever the URL says; one that came from a
+     * service or from the mounted tree may name a file of this machine. */
     bool AllowOnlyHttp();
     /** Before Init: whether libcurl fails a status of 400 or more, without its body. Default true,
      * and stays set for later requests. */
