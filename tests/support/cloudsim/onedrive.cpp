@@ -114,19 +114,23 @@ std::string OneDrive::Role(const Request& request) const {
 std::unique_ptr<Handler> OneDrive::Begin(Request& request) {
     const std::string role = Role(request);
     if (role == kLogin) {
-        if (request.path != kTokenPath) {
-            return Ready(Reply(404));
-        }
-        return request.method == "POST"
-                   ? Collect([this](const std::string& form) { return Token(form); })
-                   : Ready(Reply(405).With("Allow", "POST"));
+        return BeginLogin(request);
     }
     if (role == kContent) {
-        return request.method == "GET" || request.method == "HEAD"
-                   ? Ready(Download(request))
-                   : Ready(Reply(405).With("Allow", "GET, HEAD"));
+        const bool reads = request.method == "GET" || request.method == "HEAD";
+        return Ready(reads ? Download(request) : Reply(405).With("Allow", "GET, HEAD"));
     }
-    return role == kStorage ? BeginStorage(request) : BeginCall(request);
+    if (role == kStorage) {
+        return BeginStorage(request);
+    }
+    return BeginCall(request);
+}
+
+std::unique_ptr<Handler> OneDrive::BeginLogin(const Request& request) {
+    if (request.path == kTokenPath && request.method == "POST") {
+        return Collect([this](const std::string& form) { return Token(form); });
+    }
+    return Ready(request.path == kTokenPath ? Reply(405).With("Allow", "POST") : Reply(404));
 }
 
 /** The token may stand in the query as well. */

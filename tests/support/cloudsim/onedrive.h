@@ -99,6 +99,7 @@ class OneDrive : public Service {
     std::unique_ptr<Handler> Begin(Request& request) override;
     std::string Role(const Request& request) const override;
     std::string AccountId(size_t index) const override;
+    std::unique_ptr<Handler> BeginLogin(const Request& request);
     std::unique_ptr<Handler> BeginCall(Request& request);
     std::unique_ptr<Handler> BeginStorage(Request& request);
     std::unique_ptr<Handler> Answered(Request& request, Account& account,

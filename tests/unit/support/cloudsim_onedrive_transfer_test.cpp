@@ -11,7 +11,6 @@ using cloudsim::Fault;
 using cloudsim::Got;
 using cloudsim::HeaderOf;
 using testing::HasSubstr;
-using testing::IsEmpty;
 using testing::SizeIs;
 
 struct OneDriveTransfer : cloudsim::OneDriveFixture {
