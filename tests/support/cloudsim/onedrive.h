@@ -86,6 +86,7 @@ class OneDrive : public Service {
     /** One upload by BITS. */
     struct Session {
         Account* account = nullptr;
+        std::string folder;  ///< "CID!NNN" of the one that `path` begins in; "": the top one
         std::vector<std::string> path;
         uint64_t total = 0, next = 0;
         uint64_t replaced = 0;  ///< size of the file that was there
