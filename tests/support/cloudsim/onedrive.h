@@ -102,6 +102,7 @@ class OneDrive : public Service {
     std::string AccountId(size_t index) const override;
     std::unique_ptr<Handler> BeginLogin(const Request& request);
     std::unique_ptr<Handler> BeginCall(Request& request);
+    std::unique_ptr<Handler> Admit(Request& request);
     std::unique_ptr<Handler> BeginStorage(Request& request);
     std::unique_ptr<Handler> Answered(Request& request, Account& account,
                                       std::vector<std::string> path);

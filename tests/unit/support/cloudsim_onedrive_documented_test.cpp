@@ -47,6 +47,89 @@ TEST_F(OneDriveDocumented, FilterAllListsWhatNoFilterLists) {
     EXPECT_THAT(NamesOf(Get("me/skydrive/files?filter=folders").Json()), ElementsAre("docs"));
 }
 
+TEST_F(OneDriveDocumented, SomeFoldersHaveFriendlyNames) {
+    const std::string id = amy.AddFolder(amy.Root(), "Documents");
+    amy.AddFile(id, "a", "x");
+    EXPECT_EQ(id, Get("me/skydrive/my_documents").Json()["id"].asString());
+    EXPECT_THAT(NamesOf(Get("me/skydrive/my_documents/files").Json()), ElementsAre("a"));
+    EXPECT_EQ("resource_not_found", ErrorOf(Get("me/skydrive/my_photos")));
+}
+
+TEST_F(OneDriveDocumented, ErrorsComeWith200WhenStatusCodesAreSuppressed) {
+    const Got got = Get("file.none?suppress_response_codes=true");
+    EXPECT_EQ(200, got.status);
+    EXPECT_EQ("resource_not_found", ErrorOf(got));
+    EXPECT_EQ(404, Get("file.none?suppress_response_codes=false").status);
+}
+
+TEST_F(OneDriveDocumented, AGetMayNameAnotherMethod) {
+    const std::string id = amy.AddFile(amy.Root(), "a", "x");
+    EXPECT_EQ(204, Get(id + "?method=DELETE").status);
+    EXPECT_FALSE(amy.Exists("/a"));
+}
+
+struct OneDriveForm : OneDriveDocumented {
+    static std::string Part(const std::string& name, const std::string& bytes) {
+        return "--A300x\r\nContent-Disposition: form-data; name=\"file\"; filename=\"" + name +
+               "\"\r\nContent-Type: application/octet-stream\r\n\r\n" + bytes + "\r\n";
+    }
+    Got Post(const std::string& body, const std::string& query = "") {
+        client.headers = {"Content-Type: multipart/form-data; boundary=A300x"};
+        return Send("POST", "me/skydrive/files" + query, body);
+    }
+};
+
+TEST_F(OneDriveForm, APostWithOnePartIsAnUploadUnderThePartsFileName) {
+    const Got made = Post(Part("HelloWorld.txt", "Hello, World!") + "--A300x--\r\n");
+    EXPECT_EQ(201, made.status);
+    const std::string id = amy.Find("/HelloWorld.txt");
+    EXPECT_EQ(id, made.Json()["id"].asString());
+    EXPECT_EQ("HelloWorld.txt", made.Json()["name"].asString());
+    EXPECT_TRUE(made.Json()["source"].isString());
+    EXPECT_EQ("Hello, World!", amy.Bytes(id));
+    EXPECT_EQ(200, Post(Part("HelloWorld.txt", "again") + "--A300x--\r\n").status);
+    EXPECT_EQ("again", amy.Bytes(id));
+    EXPECT_EQ("resource_already_exists",
+              ErrorOf(Post(Part("HelloWorld.txt", "") + "--A300x--\r\n", "?overwrite=false")));
+}
+
+TEST_F(OneDriveForm, OnlyOnePartIsSupported) {
+    EXPECT_EQ(400, Post(Part("a", "x") + Part("b", "y") + "--A300x--\r\n").status);
+    EXPECT_EQ(400, Post(Part("a", "x")).status);
+    EXPECT_EQ(400, Post("x").status);
+    EXPECT_FALSE(amy.Exists("/a"));
+    EXPECT_FALSE(amy.Exists("/b"));
+}
+
+struct OneDrivePhotos : OneDriveDocumented {
+    /** A PNG file as far as its header, of 4096 x 1024 points, and some more bytes. */
+    std::string photo =
+        std::string("\x89PNG\r\n\x1a\n\0\0\0\rIHDR\0\0\x10\0\0\0\x04\0", 24) + "points";
+    std::string Stored(const std::string& path) {
+        EXPECT_EQ(201, Send("PUT", "me/skydrive/files/" + path, photo).status);
+        return amy.Bytes(amy.Find("/" + path.substr(0, path.find('?'))));
+    }
+};
+
+TEST_F(OneDrivePhotos, LargePhotosAreMadeSmallerUnlessTheRequestForbidsIt) {
+    EXPECT_EQ(photo, Stored("a.png?downsize_photo_uploads=false"));
+    EXPECT_EQ(std::string("\0\0\x08\0\0\0\x02\0", 8), Stored("b.png").substr(16));
+    EXPECT_NE(photo, Stored("c.png?downsize_photo_uploads=true"));
+}
+
+TEST_F(OneDrivePhotos, OtherFilesStayAsTheyAre) {
+    EXPECT_EQ(photo, Stored("a.bin"));
+    photo[18] = '\x08';
+    EXPECT_EQ(photo, Stored("b.png"));
+}
+
+TEST_F(OneDrivePhotos, BitsNeverMakesPhotosSmaller) {
+    const std::string session = Begin(Url("/a.png"));
+    EXPECT_EQ(200, Fragment(Url("/a.png"), session, "0-29/30", photo).status);
+    EXPECT_EQ(200, End(Url("/a.png"), "Close-Session", session).status);
+    EXPECT_EQ(photo, amy.Bytes(amy.Find("/a.png")));
+}
+
 TEST_F(OneDriveDocumented, ATokenRequestWithoutAGrantTypeIsInvalid) {
     const Got got = client.Send("POST", drive.TokenUrl(), "client_id=x&refresh_token=y");
     EXPECT_EQ(400, got.status);
@@ -63,7 +146,7 @@ TEST_F(OneDriveDocumented, BitsPutsAFileIntoTheFolderWhoseResourceIdIsNamed) {
     EXPECT_EQ(200, Fragment(url, session, "0-3/4", "0123").status);
     EXPECT_EQ(400, End(Url("/new.bin"), "Close-Session", session).status);
     EXPECT_EQ(200, End(url, "Close-Session", session).status);
-    EXPECT_EQ("0123", amy.Content("/docs/new.bin"));
+    EXPECT_EQ("0123", amy.Bytes(amy.Find("/docs/new.bin")));
     const std::string nowhere = drive.StorageHost(amy) + "/items/" + resource + "0/new.bin";
     EXPECT_THAT(Begin(nowhere), IsEmpty());
 }
