@@ -184,7 +184,10 @@ std::unique_ptr<Handler> OneDrive::BeginCall(Request& request) {
     const bool hushed = get && request.Query("suppress_response_codes") == "true";
     request.method = get ? request.Query("method", "GET") : request.method;
     std::unique_ptr<Handler> handler = Admit(request);
-    return hushed ? std::make_unique<Hushed>(std::move(handler)) : std::move(handler);
+    if (hushed) {
+        handler = std::make_unique<Hushed>(std::move(handler));
+    }
+    return handler;
 }
 
 std::unique_ptr<Handler> OneDrive::Admit(Request& request) {
@@ -200,9 +203,10 @@ std::unique_ptr<Handler> OneDrive::Admit(Request& request) {
     }
     const int64_t wait = TooSoon(*account);
     if (wait > 0) {
-        return Ready(
-            onedrive::Error(420, "request_throttled", "The client has sent too many requests.")
-                .With("Retry-After", std::to_string(wait)));
+        return Ready(onedrive::Error(420, "request_throttled",
+                                     "This type of request came too often. Wait " +
+                                         std::to_string(wait) + " seconds and try again.")
+                         .With("Retry-After", std::to_string(wait)));
     }
     path.erase(path.begin());
     return Answered(request, *account, std::move(path));

@@ -8,7 +8,9 @@ using cloudsim::Got;
 using cloudsim::HeaderOf;
 using cloudsim::NamesOf;
 using testing::ElementsAre;
+using testing::HasSubstr;
 using testing::IsEmpty;
+using testing::Not;
 
 using Headers = std::vector<std::string>;
 
@@ -66,6 +68,18 @@ TEST_F(OneDriveDocumented, AGetMayNameAnotherMethod) {
     const std::string id = amy.AddFile(amy.Root(), "a", "x");
     EXPECT_EQ(204, Get(id + "?method=DELETE").status);
     EXPECT_FALSE(amy.Exists("/a"));
+}
+
+TEST_F(OneDriveDocumented, AThrottledRequestIsAnswered420AndItsMessageTellsTheSecondsToWait) {
+    drive.LimitRate(1, 100000);
+    EXPECT_EQ(200, Get("me").status);
+    const Got got = Get("me");
+    EXPECT_EQ(420, got.status);
+    EXPECT_EQ("request_throttled", ErrorOf(got));
+    const std::string wait = HeaderOf(got, "Retry-After");
+    EXPECT_THAT(wait, Not(IsEmpty()));
+    EXPECT_THAT(got.Json()["error"]["message"].asString(),
+                HasSubstr("Wait " + wait + " seconds and try again."));
 }
 
 struct OneDriveForm : OneDriveDocumented {
