@@ -88,9 +88,8 @@ bool Multipart::StepHeaders() {
         const size_t next = std::min(buffer_.find("\r\n", start + 2), end);
         const std::string line = buffer_.substr(start + 2, next - start - 2);
         if (SameText(line.substr(0, 20), "Content-Disposition:")) {
-            std::string ignored;
             Parameter(line, "name", part_.name);
-            part_.file = Parameter(line, "filename", ignored);
+            part_.file = Parameter(line, "filename", part_.file_name);
         } else if (SameText(line.substr(0, 13), "Content-Type:")) {
             part_.type = line.substr(std::min(line.find_first_not_of(" \t", 13), line.size()));
         }

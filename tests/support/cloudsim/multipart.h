@@ -12,7 +12,8 @@ class Multipart {
     struct Part {
         std::string name;
         bool file = false;  ///< it came with a file name
-        std::string type;   ///< value of its Content-Type
+        std::string file_name;
+        std::string type;  ///< value of its Content-Type
     };
     using OnData = std::function<void(const Part&, const char* data, size_t size)>;
 

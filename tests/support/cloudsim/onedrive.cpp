@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <map>
 
 #include "support/cloudsim/onedrive_json.h"
 #include "support/cloudsim/onedrive_upload.h"
@@ -45,6 +46,30 @@ Reply WrongMethod() {
 Reply BadJson() {
     return onedrive::Error(400, "request_body_invalid",
                            "The request entity body isn't a valid JSON object.");
+}
+
+/** Errors come with 200 where a request can't bear another status. */
+class Hushed : public Handler {
+  public:
+    explicit Hushed(std::unique_ptr<Handler> handler) : handler_(std::move(handler)) {}
+    void Data(const char* data, size_t size) override { handler_->Data(data, size); }
+    Reply Finish() override {
+        Reply reply = handler_->Finish();
+        reply.status = reply.status >= 400 ? 200 : reply.status;
+        return reply;
+    }
+
+  private:
+    const std::unique_ptr<Handler> handler_;
+};
+
+/** Folders of the top folder that have a name of their own in URLs. */
+const std::map<std::string, std::string>& FriendlyNames() {
+    static const std::map<std::string, std::string> names = {{"my_documents", "Documents"},
+                                                             {"my_photos", "Pictures"},
+                                                             {"public_documents", "Public"},
+                                                             {"camera_roll", "Camera roll"}};
+    return names;
 }
 
 }  // namespace
@@ -153,7 +178,19 @@ int64_t OneDrive::TooSoon(const Account& account) {
     return ++window.requests > rate_requests_ ? window.began + rate_seconds_ - Now() : 0;
 }
 
+/** A GET may ask for another method, and for errors without their status. */
 std::unique_ptr<Handler> OneDrive::BeginCall(Request& request) {
+    const bool get = request.method == "GET";
+    const bool hushed = get && request.Query("suppress_response_codes") == "true";
+    request.method = get ? request.Query("method", "GET") : request.method;
+    std::unique_ptr<Handler> handler = Admit(request);
+    if (hushed) {
+        handler = std::make_unique<Hushed>(std::move(handler));
+    }
+    return handler;
+}
+
+std::unique_ptr<Handler> OneDrive::Admit(Request& request) {
     std::vector<std::string> path = request.Segments();
     if (path.size() < 2 || path[0] != kVersion) {
         return Ready(onedrive::Error(
@@ -166,9 +203,10 @@ std::unique_ptr<Handler> OneDrive::BeginCall(Request& request) {
     }
     const int64_t wait = TooSoon(*account);
     if (wait > 0) {
-        return Ready(
-            onedrive::Error(420, "request_throttled", "The client has sent too many requests.")
-                .With("Retry-After", std::to_string(wait)));
+        return Ready(onedrive::Error(420, "request_throttled",
+                                     "This type of request came too often. Wait " +
+                                         std::to_string(wait) + " seconds and try again.")
+                         .With("Retry-After", std::to_string(wait)));
     }
     path.erase(path.begin());
     return Answered(request, *account, std::move(path));
@@ -188,11 +226,19 @@ std::unique_ptr<Handler> OneDrive::Answered(Request& request, Account& account,
         return Ready(NoSuchPath(request));
     }
     path[0] = own ? account.Root() : path[0];
+    if (own && path.size() > 1 && FriendlyNames().count(path[1]) > 0) {
+        const std::string id = account.Find("/" + FriendlyNames().at(path[1]));
+        path.erase(path.begin());
+        path[0] = id.empty() ? path[0] : id;
+    }
     const std::string verb = path.size() > 1 ? path[1] : "";
     const bool into = path.size() == 3 && verb == "files";
     if (request.method == "PUT" && (into || (path.size() == 2 && verb == "content"))) {
         return std::make_unique<OneDriveUpload>(*this, request, account, path[0],
                                                 into ? path[2] : "");
+    }
+    if (request.method == "POST" && path.size() == 2 && verb == "files") {
+        return std::make_unique<OneDriveUpload>(*this, request, account, path[0], "");
     }
     return into ? Ready(WrongMethod()) : Routed(request, account, path);
 }

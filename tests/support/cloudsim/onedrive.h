@@ -86,6 +86,7 @@ class OneDrive : public Service {
     /** One upload by BITS. */
     struct Session {
         Account* account = nullptr;
+        std::string folder;  ///< "CID!NNN" of the one that `path` begins in; "": the top one
         std::vector<std::string> path;
         uint64_t total = 0, next = 0;
         uint64_t replaced = 0;  ///< size of the file that was there
@@ -101,6 +102,7 @@ class OneDrive : public Service {
     std::string AccountId(size_t index) const override;
     std::unique_ptr<Handler> BeginLogin(const Request& request);
     std::unique_ptr<Handler> BeginCall(Request& request);
+    std::unique_ptr<Handler> Admit(Request& request);
     std::unique_ptr<Handler> BeginStorage(Request& request);
     std::unique_ptr<Handler> Answered(Request& request, Account& account,
                                       std::vector<std::string> path);

@@ -18,10 +18,12 @@ constexpr const char* kNoSession = "0x8020001F";
 constexpr const char* kTooLarge = "0x80200020";
 constexpr const char* kDiskFull = "0x80070112";
 
+/** [MC-BUP] calls the header BITS-Error, the reference of the protocol BITS-Error-Code. */
 Reply BitsError(int status, const std::string& code) {
     return Reply(status)
         .With("BITS-Packet-Type", "Ack")
         .With("BITS-Error", code)
+        .With("BITS-Error-Code", code)
         .With("BITS-Error-Context", "0x5");
 }
 
@@ -50,10 +52,15 @@ bool SamePath(const std::vector<std::string>& a, const std::vector<std::string>&
 
 }  // namespace
 
-/** Storage knows files by their path below the user's folder: /users/0xCID/LiveFolders/PATH. */
+/**
+ * Storage knows files by their path below the user's folder, /users/0xCID/LiveFolders/PATH, or by
+ * the folder they lie in, /items/CID!NNN/NAME.
+ */
 std::unique_ptr<Handler> OneDrive::BeginStorage(Request& request) {
     std::vector<std::string> path = request.Segments();
-    if (path.size() < 4 || path[0] != "users" || !SameText(path[2], "LiveFolders")) {
+    const bool by_folder = path.size() == 3 && path[0] == "items";
+    const bool by_path = path.size() >= 4 && path[0] == "users" && SameText(path[2], "LiveFolders");
+    if (!by_folder && !by_path) {
         return Ready(BitsError(404, kNotFound));
     }
     const std::string method =
@@ -68,11 +75,12 @@ std::unique_ptr<Handler> OneDrive::BeginStorage(Request& request) {
     const std::string cid = account->Id();
     const std::string host = request.host.substr(0, request.host.find('.'));
     const bool other = SameText(host.substr(0, 4), "cid-") && !SameText(host, "cid-" + cid);
-    if (!SameText(path[1], "0x" + cid) || other) {
+    if ((by_path && !SameText(path[1], "0x" + cid)) || other) {
         return Ready(BitsError(403, kDenied));
     }
-    path.erase(path.begin(), path.begin() + 3);
-    return std::make_unique<OneDriveBits>(*this, request, *account, std::move(path));
+    const std::string folder = by_folder ? path[1] : "";
+    path.erase(path.begin(), path.begin() + (by_folder ? 2 : 3));
+    return std::make_unique<OneDriveBits>(*this, request, *account, folder, std::move(path));
 }
 
 size_t OneDrive::UploadSessions() const {
@@ -86,8 +94,12 @@ void OneDrive::DropUploadSessions() {
 }
 
 OneDriveBits::OneDriveBits(OneDrive& drive, const Request& request, Account& account,
-                           std::vector<std::string> path)
-    : drive_(drive), request_(request), account_(account), path_(std::move(path)) {}
+                           std::string folder, std::vector<std::string> path)
+    : drive_(drive),
+      request_(request),
+      account_(account),
+      folder_(std::move(folder)),
+      path_(std::move(path)) {}
 
 void OneDriveBits::Data(const char* data, size_t size) {
     const uint64_t limit = drive_.drive_options_.fragment_limit;
@@ -134,7 +146,10 @@ bool OneDriveBits::SpeaksOurProtocol() const {
 }
 
 Node& OneDriveBits::Parent() {
-    Node* node = &drive_.tree_.Root(account_);
+    const std::string top = onedrive::ResourceId(drive_.tree_.Root(account_));
+    Node* node = folder_.empty() || SameText(folder_, top)
+                     ? &drive_.tree_.Root(account_)
+                     : drive_.tree_.Find(account_, "folder." + account_.Id() + "." + folder_);
     for (size_t i = 0; node != nullptr && i + 1 < path_.size(); i++) {
         node = drive_.tree_.Child(*node, path_[i]);
     }
@@ -161,6 +176,7 @@ Reply OneDriveBits::Create() {
     const std::string id = MakeGuid();
     Session& session = drive_.sessions_[id];
     session.account = &account_;
+    session.folder = folder_;
     session.path = path_;
     session.replaced = old == nullptr ? 0 : old->Size();
     session.sink = drive_.NewSink();
@@ -236,10 +252,14 @@ Reply OneDriveBits::Take(Session& session, const Range& range) {
         .With("BITS-Received-Content-Range", std::to_string(session.next));
 }
 
-/** The file appears, whole, when its session is closed. */
+/** The file appears, whole, when its session is closed; what was closed too early is lost. */
 Reply OneDriveBits::Close() {
     Session& session = Known();
-    if (session.next != session.total || !SamePath(session.path, path_)) {
+    if (session.folder != folder_ || !SamePath(session.path, path_)) {
+        return BitsError(400, kInvalid);
+    }
+    if (session.next != session.total) {
+        drive_.sessions_.erase(SessionId());
         return BitsError(400, kInvalid);
     }
     Node& parent = Parent();
@@ -266,8 +286,9 @@ Reply OneDriveBits::Cancel() {
     return Acknowledge().With("BITS-Session-Id", SessionId());
 }
 
+/** Every answer with 200 names the session, if there is one. */
 Reply OneDriveBits::Ping() {
-    return Acknowledge();
+    return SessionId().empty() ? Acknowledge() : Acknowledge().With("BITS-Session-Id", SessionId());
 }
 
 }  // namespace cloudsim

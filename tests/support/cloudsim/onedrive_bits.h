@@ -9,8 +9,9 @@ namespace cloudsim {
 /** A fragment is kept whole until all of it came: one that was interrupted leaves nothing. */
 class OneDriveBits : public Handler {
   public:
-    /** `path` is that of the file, below the top folder. */
-    OneDriveBits(OneDrive& drive, const Request& request, Account& account,
+    /** `path` is that of the file, below the folder whose id is "CID!NNN" or, if "", the top one.
+     */
+    OneDriveBits(OneDrive& drive, const Request& request, Account& account, std::string folder,
                  std::vector<std::string> path);
     void Data(const char* data, size_t size) override;
     Reply Finish() override;
@@ -42,6 +43,7 @@ class OneDriveBits : public Handler {
     OneDrive& drive_;
     const Request& request_;
     Account& account_;
+    const std::string folder_;
     const std::vector<std::string> path_;
     std::string fragment_;
     uint64_t received_ = 0;

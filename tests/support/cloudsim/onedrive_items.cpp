@@ -43,12 +43,12 @@ void Sort(const Request& request, Nodes& nodes) {
     }
 }
 
-/** "folders,albums" wants the types "folder" and "album"; "audio" has no plural. */
+/** "folders,albums" wants the types "folder" and "album"; "audio" has no plural, "all" all. */
 std::set<std::string> TypesWanted(const std::string& filter) {
     std::set<std::string> types;
     std::istringstream words(filter);
     std::string word;
-    while (std::getline(words, word, ',')) {
+    while (filter != "all" && std::getline(words, word, ',')) {
         const bool plural = !word.empty() && word.back() == 's';
         types.insert(plural ? word.substr(0, word.size() - 1) : word);
     }

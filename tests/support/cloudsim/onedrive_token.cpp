@@ -20,6 +20,10 @@ Reply OneDrive::Token(const std::string& text) {
     Request form;
     form.query = ParseForm(text);
     const std::string client = form.Query("client_id");
+    if (!form.HasQuery("grant_type")) {
+        return TokenError("invalid_request",
+                          "The request must include the input parameter 'grant_type'.");
+    }
     if (form.Query("grant_type") != "refresh_token") {
         return TokenError("unsupported_grant_type",
                           "The provided value for the input parameter 'grant_type' is not valid.");

@@ -1,4 +1,6 @@
-/** Uploads by PUT, and downloads. */
+/** Uploads by PUT or by a form, and downloads. */
+#include <algorithm>
+
 #include "support/cloudsim/onedrive.h"
 #include "support/cloudsim/onedrive_json.h"
 #include "support/cloudsim/onedrive_upload.h"
@@ -9,6 +11,8 @@ namespace {
 
 constexpr const char* kBytes = "application/octet-stream";
 constexpr const char* kEnd = ":Binary";
+constexpr size_t kHead = 24;  ///< of a PNG file, up to its width and height
+constexpr uint32_t kLargestEdge = 2048;
 
 /** All that isn't plain goes as %XX, so that a name may hold anything. */
 std::string Escape(const std::string& text) {
@@ -23,6 +27,30 @@ std::string Escape(const std::string& text) {
         }
     }
     return escaped;
+}
+
+uint32_t EdgeAt(const std::string& png, size_t at) {
+    uint32_t edge = 0;
+    for (size_t i = at; i < at + 4; i++) {
+        edge = edge << 8 | static_cast<unsigned char>(png[i]);
+    }
+    return edge;
+}
+
+bool IsLargePng(const std::string& head) {
+    return head.size() == kHead && head.compare(0, 8, "\x89PNG\r\n\x1a\n") == 0 &&
+           std::max(EdgeAt(head, 16), EdgeAt(head, 20)) > kLargestEdge;
+}
+
+std::string Downsized(std::string png) {
+    const uint64_t longest = std::max(EdgeAt(png, 16), EdgeAt(png, 20));
+    for (const size_t at : {16, 20}) {
+        const auto edge = static_cast<uint32_t>(EdgeAt(png, at) * uint64_t{kLargestEdge} / longest);
+        for (size_t i = 0; i < 4; i++) {
+            png[at + i] = static_cast<char>(edge >> (24 - 8 * i));
+        }
+    }
+    return png;
 }
 
 }  // namespace
@@ -66,10 +94,28 @@ OneDriveUpload::OneDriveUpload(OneDrive& drive, const Request& request, Account&
       request_(request),
       account_(account),
       id_(std::move(id)),
+      form_(request.method == "POST"),
       name_(std::move(name)),
+      body_(
+          request.Header("Content-Type"), [this](const Multipart::Part& part) { Begin(part); },
+          [this](const Multipart::Part&, const char* data, size_t size) { Take(data, size); }),
       sink_(drive.NewSink()) {}
 
 void OneDriveUpload::Data(const char* data, size_t size) {
+    if (form_) {
+        body_.Feed(data, size);
+    } else {
+        Take(data, size);
+    }
+}
+
+void OneDriveUpload::Begin(const Multipart::Part& part) {
+    parts_++;
+    name_ = part.file_name;
+}
+
+void OneDriveUpload::Take(const char* data, size_t size) {
+    head_.append(data, std::min(size, kHead - head_.size()));
     size_ += size;
     if (size_ <= drive_.drive_options_.put_limit) {
         failed_ = failed_ || !sink_->Write(data, size);
@@ -86,6 +132,8 @@ Reply OneDriveUpload::Finish() {
         return onedrive::Error(500, "server_internal_error", "The server had an unexpected error.");
     }
     try {
+        CheckForm();
+        DownsizePhoto();
         int status = 201;
         const Node& file = Store(status);
         Json::Value answer;
@@ -97,6 +145,29 @@ Reply OneDriveUpload::Finish() {
     } catch (const onedrive::Failure& failure) {
         return failure.reply;
     }
+}
+
+void OneDriveUpload::CheckForm() const {
+    if (form_ && (!body_.Complete() || parts_ != 1 || name_.empty())) {
+        throw onedrive::Failure{onedrive::Error(400, "request_body_invalid",
+                                                "The form has to be one part with a file name.")};
+    }
+}
+
+/**
+ * Large photos are made smaller unless the request forbids it. Only PNG is known here, and of the
+ * smaller picture no more is kept than the size that its header tells.
+ */
+void OneDriveUpload::DownsizePhoto() {
+    const bool photo = onedrive::FileType(name_) == "photo";
+    if (!photo || SameText(request_.Query("downsize_photo_uploads"), "false") ||
+        !IsLargePng(head_)) {
+        return;
+    }
+    const std::string smaller = Downsized(head_);
+    sink_ = drive_.NewSink();
+    failed_ = !sink_->Write(smaller.data(), smaller.size());
+    size_ = smaller.size();
 }
 
 /** `overwrite` is true when nothing is said; the header of that name may say it, too. */
