@@ -1,5 +1,6 @@
 #include "support/cloudsim/gdrive_query.h"
 
+#include <algorithm>
 #include <cctype>
 #include <functional>
 #include <map>
@@ -112,15 +113,52 @@ std::vector<Token> Split(const std::string& query) {
     return tokens;
 }
 
-/** Words of a title are found by their beginnings, and by nothing else. */
-bool HasWordThatBegins(const std::string& title, const std::string& start) {
-    const std::string text = FoldCase(title), wanted = FoldCase(start);
-    for (size_t at = text.find(wanted); at != std::string::npos; at = text.find(wanted, at + 1)) {
-        if (at == 0 || text[at - 1] == ' ') {
-            return true;
+/** In lower case; all that is neither letter nor digit stands between words. */
+std::vector<std::string> Words(const std::string& text) {
+    std::vector<std::string> words(1);
+    for (const char c : FoldCase(text)) {
+        const auto byte = static_cast<unsigned char>(c);
+        if (byte >= 0x80 || isalnum(byte) != 0) {
+            words.back() += c;
+        } else if (!words.back().empty()) {
+            words.emplace_back();
         }
     }
-    return false;
+    if (words.back().empty()) {
+        words.pop_back();
+    }
+    return words;
+}
+
+using SameWord = bool (*)(const std::string& word, const std::string& wanted);
+
+bool BeginsLike(const std::string& word, const std::string& start) {
+    return word.compare(0, start.size(), start) == 0;
+}
+
+bool IsWord(const std::string& word, const std::string& wanted) {
+    return word == wanted;
+}
+
+/** Whatever their order. */
+bool HasWords(const std::string& text, const std::string& wanted, SameWord same) {
+    const std::vector<std::string> words = Words(text), all = Words(wanted);
+    return std::all_of(all.begin(), all.end(), [&](const std::string& one) {
+        return std::any_of(words.begin(), words.end(),
+                           [&](const std::string& word) { return same(word, one); });
+    });
+}
+
+bool HasPhrase(const std::string& text, const std::string& phrase) {
+    const std::vector<std::string> words = Words(text), wanted = Words(phrase);
+    return std::search(words.begin(), words.end(), wanted.begin(), wanted.end()) != words.end() ||
+           wanted.empty();
+}
+
+/** Text is found by whole words, or in double quotes by words that follow each other. */
+bool HasText(const std::string& text, const std::string& wanted) {
+    const bool quoted = wanted.size() > 1 && wanted.front() == '"' && wanted.back() == '"';
+    return quoted ? HasPhrase(text, wanted) : HasWords(text, wanted, IsWord);
 }
 
 using Texts = std::function<std::string(const Node&)>;
@@ -311,8 +349,13 @@ class Parser {
                 return value(node).find(wanted) != std::string::npos;
             });
         }
-        return std::make_shared<Condition>(
-            [value, wanted](const Node& node) { return HasWordThatBegins(value(node), wanted); });
+        if (field == "fullText") {
+            return std::make_shared<Condition>(
+                [value, wanted](const Node& node) { return HasText(value(node), wanted); });
+        }
+        return std::make_shared<Condition>([value, wanted](const Node& node) {
+            return HasWords(value(node), wanted, BeginsLike);
+        });
     }
 
     QueryPtr CompareDate(const Moments& value) {
