@@ -52,15 +52,18 @@ TEST_P(DriverCancel, BetweenTwoAttemptsOfAnUpload) {
     EXPECT_FALSE(amy.Exists("/up.txt"));
 }
 
-TEST_P(DriverCancel, BetweenTwoChunksOfAnUpload) {
+TEST_P(DriverCancel, BehindTheFirstChunkOfAnUpload) {
     if (can.largest_direct == 0) {
         GTEST_SKIP() << "no chunks";
     }
+    // Far from the end: where no chunks are sent, pieces end where libcurl's buffer does.
+    constexpr unsigned long long kSize = kChunk + 4 * kMiB;
     User::wants_to_stop = [] { return User::done >= static_cast<unsigned long long>(kChunk); };
-    Source source(kChunk + 1);
+    Source source(kSize);
     EXPECT_FALSE(Upload(source, "/up.bin"));
     EXPECT_EQ(Code(), VFS_ERR_CANCELLED) << seams::LogDump();
-    EXPECT_EQ(User::done, static_cast<unsigned long long>(kChunk));
+    EXPECT_GE(User::done, static_cast<unsigned long long>(kChunk));
+    EXPECT_LT(User::done, kSize);
     EXPECT_FALSE(amy.Exists("/up.bin"));
 }
 
