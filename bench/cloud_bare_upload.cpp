@@ -62,7 +62,7 @@ class Wire {
         return one * count;
     }
     static size_t Read(char* to, size_t one, size_t count, Wire* wire) {
-        const auto room = static_cast<long long>(one * count);
+        const auto room = static_cast<long long>(one) * static_cast<long long>(count);
         const ssize_t n = read(wire->fd_, to, static_cast<size_t>(std::min(room, wire->left_)));
         wire->left_ -= std::max<ssize_t>(n, 0);
         return n < 0 ? CURL_READFUNC_ABORT : static_cast<size_t>(n);

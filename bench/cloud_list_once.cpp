@@ -37,8 +37,9 @@ bool Measure(const bench::Service& service, unsigned items) {
 int main(int argc, char** argv) {
     bool good = argc > 2;
     for (int i = 2; i < argc; ++i) {
-        good =
-            Measure(bench::FindService(argv[i]), static_cast<unsigned>(std::atoi(argv[1]))) && good;
+        good = Measure(bench::FindService(argv[i]),
+                       static_cast<unsigned>(std::strtoul(argv[1], nullptr, 10))) &&
+               good;
     }
     return good ? 0 : 1;
 }

@@ -155,6 +155,7 @@ double Median(std::vector<double> values) {
 
 double Median(const std::vector<Sample>& samples, const std::function<double(const Sample&)>& of) {
     std::vector<double> values;
+    values.reserve(samples.size());
     for (const Sample& sample : samples) {
         values.push_back(of(sample));
     }
@@ -224,9 +225,9 @@ int main(int argc, char** argv) {
     for (int i = 1; i < argc; ++i) {
         const std::string word = argv[i];
         if (word == "--rounds" && i + 1 < argc) {
-            rounds = std::max(1, std::atoi(argv[++i]));
+            rounds = static_cast<int>(std::max(1L, std::strtol(argv[++i], nullptr, 10)));
         } else if (word == "--size" && i + 1 < argc) {
-            mib = std::max(1LL, std::atoll(argv[++i]));
+            mib = std::max(1LL, std::strtoll(argv[++i], nullptr, 10));
         } else {
             names.push_back(word);
         }
