@@ -117,6 +117,19 @@ bool FindOnServer(Cloud& cloud, Walk walk, std::string& out) {
     return true;
 }
 
+/** Describes the item whose id `find` learns from the server, which the log calls `service`. */
+template <typename Driver, typename Find>
+bool InfoOnServer(Driver& driver, const char* service, const std::string& path, Find find,
+                  const Json::Value& params, Json::Value& out,
+                  ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here()) {
+    std::string id;
+    if (!find(id)) {
+        LOG_ERROR_AT(at, "Failed to get file id from %s-server, %s", service, path.c_str());
+        return false;
+    }
+    return driver.GetFileInfo(id, params, out);
+}
+
 }  // namespace ZYROCloud
 
 #endif

@@ -116,12 +116,10 @@ bool Box::GetFileIDByPathFromServer(const std::string& /*root*/, const std::stri
 bool Box::GetFileInfoByPathFromServer(const std::string& root, const std::string& path,
                                       const Json::Value& params, const std::string& hint,
                                       Json::Value& out) {
-    std::string id;
-    if (!GetFileIDByPathFromServer(root, path, "", hint, id)) {
-        LOG_ERROR("Failed to get file id from box-server, %s", path.c_str());
-        return false;
-    }
-    return GetFileInfo(id, params, out);
+    const auto find = [&](std::string& id) {
+        return GetFileIDByPathFromServer(root, path, "", hint, id);
+    };
+    return InfoOnServer(*this, "box", path, find, params, out);
 }
 
 bool Box::GetMetaDataByURI(const std::string& uri, Json::Value& meta, const std::string& action) {

@@ -143,12 +143,10 @@ bool GDrive::GetFileIDByPathFromServer(const std::string& /*root*/, const std::s
 bool GDrive::GetFileInfoByPathFromServer(const std::string& path, const std::string& query,
                                          const Json::Value& params, const std::string& name,
                                          Json::Value& out) {
-    std::string id;
-    if (!GetFileIDByPathFromServer("", path, query, name, id)) {
-        LOG_ERROR("Failed to get file id from google-server, %s", path.c_str());
-        return false;
-    }
-    return GetFileInfo(id, params, out);
+    const auto find = [&](std::string& id) {
+        return GetFileIDByPathFromServer("", path, query, name, id);
+    };
+    return InfoOnServer(*this, "google", path, find, params, out);
 }
 
 }  // namespace ZYROCloud

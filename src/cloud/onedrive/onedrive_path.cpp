@@ -95,12 +95,10 @@ bool OneDrive::GetFileIDByPathFromServer(const std::string& /*root*/, const std:
 bool OneDrive::GetFileInfoByPathFromServer(const std::string& path, const std::string& kind,
                                            const Json::Value& params, const std::string& hint,
                                            Json::Value& out) {
-    std::string id;
-    if (!GetFileIDByPathFromServer("", path, kind, hint, id)) {
-        LOG_ERROR("Failed to get file id from onedrive-server, %s", path.c_str());
-        return false;
-    }
-    return GetFileInfo(id, params, out);
+    const auto find = [&](std::string& id) {
+        return GetFileIDByPathFromServer("", path, kind, hint, id);
+    };
+    return InfoOnServer(*this, "onedrive", path, find, params, out);
 }
 
 bool OneDrive::GetMetaDataByURI(const std::string& uri, Json::Value& meta,
