@@ -53,6 +53,18 @@ void SetGFileInfo(GFileInfo** info, const char* id, bool is_dir, const char* dis
     }
 }
 
+const char* InfoName(GFileInfo* info) {
+    return info == nullptr
+               ? nullptr
+               : g_file_info_get_attribute_byte_string(info, G_FILE_ATTRIBUTE_STANDARD_NAME);
+}
+
+const char* InfoDisplayName(GFileInfo* info) {
+    return info == nullptr
+               ? nullptr
+               : g_file_info_get_attribute_string(info, G_FILE_ATTRIBUTE_STANDARD_DISPLAY_NAME);
+}
+
 const char* AttrText(GFileInfo* info, const char* attribute) {
     const char* text =
         info == nullptr ? nullptr : g_file_info_get_attribute_string(info, attribute);

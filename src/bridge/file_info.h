@@ -26,6 +26,10 @@ void SetGFileInfo(GFileInfo** info, const char* id, bool is_dir, const char* dis
                   const char* name, long long size, const timeval& modified, const timeval& access,
                   const timeval& changed, const timeval& created, const char* description);
 
+/** Null when the record has none, or is null. GIO's own getters complain of that in the log. */
+const char* InfoName(GFileInfo* info);
+const char* InfoDisplayName(GFileInfo* info);
+
 /** A text attribute of a record, "" when the record or the attribute is missing. */
 const char* AttrText(GFileInfo* info, const char* attribute);
 

@@ -102,3 +102,19 @@ int ZYROCloud_Cloud_CreateFolder(const char* server_id, const void* p2, const ch
         return false;
     });
 }
+
+int ZYROCloud_IsHiddenFolder(const char* dir, const char* name) {
+    return dir != nullptr && name != nullptr &&
+                   ZYROVFS::NoThrow(ZYROVFS::VFS_ERR_FAILED,
+                                    [&] { return Cloud::IsHiddenFilePath(dir, name); })
+               ? 1
+               : 0;
+}
+
+void ZYROCloud_Cloud_InitCurlGlobal(void) {
+    Cloud::InitCurlGlobal();
+}
+
+void ZYROCloud_Cloud_CleanupCurlGlobal(void) {
+    Cloud::CleanupCurlGlobal();
+}

@@ -2,6 +2,8 @@
 #ifndef ZYROVFS_BRIDGE_HANDLE_H
 #define ZYROVFS_BRIDGE_HANDLE_H
 
+#include <atomic>
+#include <mutex>
 #include <string>
 
 #include "bridge/file_info.h"
@@ -13,11 +15,6 @@ struct ZYROCloud_Handle {
     /** 16 MiB: what the buffer holds, whatever `buffer_size` says. */
     static constexpr long long kBufferBytes = 0x1000000;
 
-    ZYROCloud_Handle() { g_mutex_init(&mutex); }
-    ZYROCloud_Handle(const ZYROCloud_Handle&) = delete;
-    ZYROCloud_Handle& operator=(const ZYROCloud_Handle&) = delete;
-    ~ZYROCloud_Handle() { g_mutex_clear(&mutex); }
-
     ZYROCloud::UniqueCloud cloud;  ///< null for a connection that cannot be used
     std::string path;              ///< or the item's id
     std::string url;               ///< of the contents; empty until the first download
@@ -27,8 +24,8 @@ struct ZYROCloud_Handle {
     ZYROVFS::UniqueCString buffer;  ///< one byte more than kBufferBytes: see DownloadFileToBuffer
     long long buffer_position = 0;
     long long buffer_filled = 0;
-    long long buffer_size = kBufferBytes;  ///< what a backend downloads at once
-    GMutex mutex;                          ///< guards `buffer` and `buffer_filled`
+    std::atomic<long long> buffer_size{kBufferBytes};  ///< what a backend downloads at once
+    std::mutex mutex;                                  ///< guards the buffer but for `buffer_size`
 
     int descriptor = -1;  ///< spare
 };
