@@ -1,6 +1,7 @@
 #include "bridge/gvfs_flow_list.h"
 
 #include "bridge/cache_hold.h"
+#include "bridge/gvfs_cache.h"
 #include "bridge/gvfs_utils.h"
 #include "core/log.h"
 
@@ -50,7 +51,7 @@ bool Ask(const ListCall& call, Cloud& cloud, const ListRules& rules, std::string
 
 void Add(const ListCall& call, const ItemRecord& record) {
     const UniqueFileInfo info = ToFileInfo(record);
-    ZYROCloud_Cache_Entry_Add(call.cache, call.path, info.get());
+    AddEntry(*call.cache, call.path, info.get());
     ZYROCloud_Cache_List_Add(call.cache, call.path, record.keeps_display_name, info.get());
     if (call.callback != nullptr) {
         call.callback(info.get(), call.user_data);

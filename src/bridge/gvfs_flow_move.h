@@ -8,6 +8,7 @@
 
 #include "bridge/gvfs_utils.h"
 #include "cloud/conflict.h"
+#include "core/json_member.h"
 #include "core/log.h"
 #include "core/source_line.h"
 
@@ -34,7 +35,8 @@ bool ReplaceAtTarget(Driver& driver, const MoveCall& call, Find find, ZYROVFS::S
     };
     const auto remove = [&](const Json::Value& item) {
         const std::string rival = driver.GetFileID(item);
-        if (rival == call.from || !driver.Delete(rival)) {
+        const bool named = !ZYROVFS::json::TextOf(item, "id").empty();
+        if (!named || rival == call.from || !driver.Delete(rival)) {
             LOG_ERROR_AT(at, "Failed to delete path %s", call.to_path);
             return false;
         }

@@ -5,6 +5,7 @@
 #include <string>
 
 #include "bridge/cache_hold.h"
+#include "bridge/gvfs_cache.h"
 #include "bridge/gvfs_flow_account.h"
 #include "bridge/gvfs_flow_list.h"
 #include "bridge/gvfs_flow_move.h"
@@ -66,7 +67,7 @@ int ZYROCloud_Cloud_OneDrive_GetRoot(const char* server_id, ZYROCloud_Cache* cac
             return false;
         }
         const CacheHold hold(cache);
-        ZYROCloud_Cache_Entry_Add(cache, "/", info.get());
+        AddEntry(*cache, "/", info.get());
         if (callback != nullptr) {
             callback(info.get(), user_data);
         }
