@@ -433,12 +433,11 @@ inline std::string NameOf(const testing::TestParamInfo<RigMaker>& info) {
 }  // namespace backend
 
 /** All tests of a suite that derives from EachBackend, for the four services. */
-#define RUN_FOR_EACH_BACKEND(suite)                                                       \
-    INSTANTIATE_TEST_SUITE_P(, suite,                                                     \
-                             testing::Values(backend::Make<backend::BoxRig>,              \
-                                             backend::Make<backend::DropboxRig>,          \
-                                             backend::Make<backend::GoogleRig>,           \
-                                             backend::Make<backend::OneDriveRig>),        \
-                             backend::NameOf)
+#define RUN_FOR_EACH_BACKEND(suite)                                                              \
+    INSTANTIATE_TEST_SUITE_P(                                                                    \
+        , suite,                                                                                 \
+        testing::Values(backend::Make<backend::BoxRig>, backend::Make<backend::DropboxRig>,      \
+                        backend::Make<backend::GoogleRig>, backend::Make<backend::OneDriveRig>), \
+        backend::NameOf)
 
 #endif

@@ -45,9 +45,9 @@ TEST_F(Box, NeverShowsAWebLink) {
 
 TEST_F(Box, WithoutAnAccountShowsNothing) {
     amy.AddPath("/a.txt", "a");
-    EXPECT_EQ(ZYROCloud_Cloud_Box_List(nullptr, server_id.c_str(), cache, "/", nullptr, See, this,
-                                       &err),
-              1);
+    EXPECT_EQ(
+        ZYROCloud_Cloud_Box_List(nullptr, server_id.c_str(), cache, "/", nullptr, See, this, &err),
+        1);
     EXPECT_THAT(SeenNames(), IsEmpty());
     EXPECT_EQ(Cached("/a.txt"), nullptr);
 }
@@ -64,8 +64,8 @@ TEST_F(Box, ListsAFolderWhoseIdHasBecomeStaleByItsPath) {
 }
 
 TEST_F(Box, NeedsTheServerIdForAListing) {
-    EXPECT_EQ(
-        ZYROCloud_Cloud_Box_List("17", nullptr, cache, "/", nullptr, nullptr, nullptr, &err), 0);
+    EXPECT_EQ(ZYROCloud_Cloud_Box_List("17", nullptr, cache, "/", nullptr, nullptr, nullptr, &err),
+              0);
     EXPECT_TRUE(seams::Logged("Wrong parameters")) << seams::LogDump();
 }
 
@@ -75,8 +75,7 @@ TEST_F(Box, ReadsFromTheAddressOfTheId) {
     EXPECT_EQ(ReadAll(handle, 4), "0123456789");
     EXPECT_EQ(handle->url, rig->Hosts()["BoxApiHost"].asString() + "/2.0/files/" + id + "/content");
     g_file_info_remove_attribute(Seen("a.txt"), "id::file");
-    const UniqueHandle bare(
-        ZYROCloud_Cloud_Handle_New(server_id.c_str(), "/a.txt", Seen("a.txt")));
+    const UniqueHandle bare(ZYROCloud_Cloud_Handle_New(server_id.c_str(), "/a.txt", Seen("a.txt")));
     EXPECT_EQ(Read(bare, 4), -1);
     EXPECT_TRUE(seams::Logged("File ID is empty")) << seams::LogDump();
     EXPECT_EQ(err, kUntouched);

@@ -10,9 +10,9 @@ class FlowAccount : public EachBackend {
   protected:
     Json::Value StoredAccount() const {
         Json::Value account;
-        json::fromString(account, profiles::Stored(profiles::VFS_CONFIG_CONNECT)[server_id]
-                                                  ["account_info"]
-                                                      .asString());
+        json::fromString(
+            account,
+            profiles::Stored(profiles::VFS_CONFIG_CONNECT)[server_id]["account_info"].asString());
         return account;
     }
 };

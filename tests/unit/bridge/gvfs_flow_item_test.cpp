@@ -63,8 +63,9 @@ TEST_F(FlowItem, WithoutAnIdCannotBeTold) {
 }
 
 TEST_F(FlowItem, WhoseTextsAreNoUtf8CannotBeTold) {
-    for (const std::string& text : {std::string("a\xff"), std::string("\xc3"), std::string("a\0b", 3),
-                                    std::string("\xed\xa0\x80"), std::string("\xc0\xaf")}) {
+    for (const std::string& text :
+         {std::string("a\xff"), std::string("\xc3"), std::string("a\0b", 3),
+          std::string("\xed\xa0\x80"), std::string("\xc0\xaf")}) {
         seams::Reset();
         record.name = text;
         EXPECT_FALSE(HasFitTexts(record)) << text;
@@ -86,7 +87,9 @@ TEST_F(FlowItem, DescriptionIsOfTheMembersThatAreThere) {
 
 TEST_F(FlowItem, DescriptionIsUtf8WhateverTheServiceSends) {
     Json::Value item;
-    item["link"] = "a\xff" "b";
+    item["link"] =
+        "a\xff"
+        "b";
     const std::string text = TextOfMembers(item, {"link"});
     EXPECT_TRUE(g_utf8_validate(text.c_str(), -1, nullptr)) << text;
     EXPECT_THAT(text, HasSubstr("link"));

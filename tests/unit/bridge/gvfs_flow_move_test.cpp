@@ -20,14 +20,14 @@ class FlowMove : public EachBackend {
     }
     int Call(const char* id, ZYROCloud_Cache* with, const char* from, const char* to,
              const char* to_path, int* error) const {
-        const auto move = rig->Protocol() == "box" ? ZYROCloud_Cloud_Box_Move
-                                                   : ZYROCloud_Cloud_OneDrive_Move;
+        const auto move =
+            rig->Protocol() == "box" ? ZYROCloud_Cloud_Box_Move : ZYROCloud_Cloud_OneDrive_Move;
         return move(id, with, from, to, to_path, error);
     }
     int Move(const std::string& path, const std::string& folder) {
         const std::string to_path = folder + path.substr(path.rfind('/'));
-        return Call(server_id.c_str(), cache, Id(path).c_str(), Id(folder).c_str(),
-                    to_path.c_str(), &err);
+        return Call(server_id.c_str(), cache, Id(path).c_str(), Id(folder).c_str(), to_path.c_str(),
+                    &err);
     }
     std::string BytesAt(const std::string& path) const { return amy.Bytes(amy.Find(path)); }
     size_t Deletes() const {
@@ -65,8 +65,8 @@ TEST_P(FlowMove, OntoAFolderFailsAndDeletesNothing) {
 }
 
 TEST_P(FlowMove, OfAnItemToWhereItIsDoesNotDeleteIt) {
-    const std::string id = rig->Protocol() == "box" ? "/2.0/" + Id("/docs/a.txt")
-                                                    : "/v5.0/" + Id("/docs/a.txt");
+    const std::string id =
+        rig->Protocol() == "box" ? "/2.0/" + Id("/docs/a.txt") : "/v5.0/" + Id("/docs/a.txt");
     sim.AddFault(Fault::On(rig->Protocol() == "box" ? "PUT" : "MOVE", id)
                      .Answer(rig->Protocol() == "box" ? 409 : 400,
                              R"({"error":{"code":"resource_already_exists"}})"));
@@ -79,9 +79,9 @@ TEST_P(FlowMove, OfAnItemToWhereItIsDoesNotDeleteIt) {
 TEST_P(FlowMove, ThatCannotFindWhatIsInTheWayFails) {
     amy.AddPath("/target/a.txt", "old");
     const std::string from = Id("/docs/a.txt");
-    EXPECT_EQ(Call(server_id.c_str(), cache, from.c_str(), Id("/target").c_str(), "/target/none",
-                   &err),
-              0);
+    EXPECT_EQ(
+        Call(server_id.c_str(), cache, from.c_str(), Id("/target").c_str(), "/target/none", &err),
+        0);
     EXPECT_EQ(err, G_IO_ERROR_NOT_FOUND);
     EXPECT_TRUE(seams::Logged("Failed to find the path, /target/none")) << seams::LogDump();
     EXPECT_EQ(Deletes(), 0U);
@@ -99,8 +99,10 @@ TEST_P(FlowMove, ThatCannotDeleteWhatIsInTheWayFails) {
 TEST_P(FlowMove, ThatMeetsASecondConflictFailsAfterOneRepeat) {
     amy.AddPath("/target/a.txt", "old");
     const std::string method = rig->Protocol() == "box" ? "PUT" : "MOVE";
-    sim.AddFault(Fault::On(method, "/").Times(2).Answer(
-        rig->Protocol() == "box" ? 409 : 400, R"({"error":{"code":"resource_already_exists"}})"));
+    sim.AddFault(Fault::On(method, "/")
+                     .Times(2)
+                     .Answer(rig->Protocol() == "box" ? 409 : 400,
+                             R"({"error":{"code":"resource_already_exists"}})"));
     EXPECT_EQ(Move("/docs/a.txt", "/target"), 0);
     EXPECT_EQ(err, G_IO_ERROR_EXISTS);
     EXPECT_EQ(Deletes(), 1U);

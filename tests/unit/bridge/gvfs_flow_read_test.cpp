@@ -22,7 +22,8 @@ class FlowRead : public EachBackend {
         EXPECT_EQ(List(rig->Top()), 1) << seams::LogDump();
         GFileInfo* const info = Seen("a.txt");
         g_file_info_set_size(info, size);
-        return UniqueHandle(ZYROCloud_Cloud_Handle_New(server_id.c_str(), IdOf(info).c_str(), info));
+        return UniqueHandle(
+            ZYROCloud_Cloud_Handle_New(server_id.c_str(), IdOf(info).c_str(), info));
     }
     /** Ranges that the contents were asked for. */
     std::vector<std::string> Ranges() const {
@@ -105,8 +106,8 @@ TEST_P(FlowRead, OfAFileThatVanishedFails) {
     EXPECT_EQ(Read(handle, 4), -1);
     EXPECT_NE(err, kUntouched);
     EXPECT_EQ(handle->position, 5);
-    EXPECT_TRUE(seams::LoggedPart("Failed to download [" + handle->url +
-                                  "] to buffer from:5, len:4"))
+    EXPECT_TRUE(
+        seams::LoggedPart("Failed to download [" + handle->url + "] to buffer from:5, len:4"))
         << seams::LogDump();
 }
 
@@ -182,8 +183,8 @@ TEST_P(FlowRead, OfAHandleOfAnotherServiceSendsNobodyAToken) {
         ZYROCloud_Cloud_Handle_New(server_id.c_str(), "/a.txt", Seen("a.txt")));
     sim.Journal().Clear();
     char* dest = bytes.data();
-    const auto other = rig->Protocol() == "box" ? ZYROCloud_Cloud_OneDrive_Download
-                                                : ZYROCloud_Cloud_Box_Download;
+    const auto other =
+        rig->Protocol() == "box" ? ZYROCloud_Cloud_OneDrive_Download : ZYROCloud_Cloud_Box_Download;
     EXPECT_EQ(other(handle.get(), kUnused, kUnused, &dest, 1, &err), -1);
     EXPECT_THAT(Requests(), IsEmpty());
 }

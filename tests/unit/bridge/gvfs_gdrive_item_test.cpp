@@ -139,7 +139,8 @@ TEST(GoogleItem, WhoseNameIsTakenGetsItsDateOfCreationIntoIt) {
     for (const auto& row : rows) {
         const ItemRecord record = Converted(Item(row.title, row.type), Taken);
         EXPECT_EQ(record.name, row.name);
-        EXPECT_EQ(record.display_name, std::string(row.title) + (row.type == kDocument ? ".gdoc" : ""));
+        EXPECT_EQ(record.display_name,
+                  std::string(row.title) + (row.type == kDocument ? ".gdoc" : ""));
         EXPECT_TRUE(record.keeps_display_name);
     }
 }
@@ -219,8 +220,9 @@ TEST(GoogleItem, TellsDriversWhereItsBytesAre) {
     item["downloadUrl"] = "https://example.com/d";
     item["labels"]["starred"] = true;
     const Json::Value description = Parsed(Converted(item).description);
-    EXPECT_EQ(description.getMemberNames(),
-              (std::vector<std::string>{"alternateLink", "downloadUrl", "exportLinks", "mimeType"}));
+    EXPECT_EQ(
+        description.getMemberNames(),
+        (std::vector<std::string>{"alternateLink", "downloadUrl", "exportLinks", "mimeType"}));
     for (const char* member : {"alternateLink", "downloadUrl", "exportLinks", "mimeType"}) {
         EXPECT_EQ(description[member], item[member]) << member;
     }
@@ -232,7 +234,8 @@ TEST(GoogleItem, ThatIsNullIsNone) {
 }
 
 TEST(GoogleItem, WithMembersOfAnyTypeIsReadAsFarAsItCanBe) {
-    for (const char* value : {"null", "7", "-7", "1e300", "true", "[]", "[1]", "{}", R"({"a":1})"}) {
+    for (const char* value :
+         {"null", "7", "-7", "1e300", "true", "[]", "[1]", "{}", R"({"a":1})"}) {
         for (const char* member :
              {"id", "title", "originalFilename", "mimeType", "fileSize", "alternateLink",
               "downloadUrl", "exportLinks", "createdDate", "modifiedDate", "lastViewedByMeDate"}) {

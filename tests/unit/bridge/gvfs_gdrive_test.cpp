@@ -116,12 +116,10 @@ TEST_F(Google, ReadsADocumentAsTheLinkToItsPageInPiecesOfAnySize) {
     service.AddDocument(amy, amy.Root(), "report", "document", "text");
     for (const long long piece : {1LL, 7LL, 100LL, kMiB}) {
         const UniqueHandle handle = Open("report.gdoc");
-        const Json::Value description =
-            Object(Text(Seen("report.gdoc"), "standard::description"));
+        const Json::Value description = Object(Text(Seen("report.gdoc"), "standard::description"));
         sim.Journal().Clear();
         const std::string text = ReadAll(handle, piece);
-        EXPECT_EQ(static_cast<long long>(text.size()),
-                  g_file_info_get_size(Seen("report.gdoc")));
+        EXPECT_EQ(static_cast<long long>(text.size()), g_file_info_get_size(Seen("report.gdoc")));
         EXPECT_EQ(Object(text)["url"], description["alternateLink"]) << text;
         EXPECT_THAT(Requests(), IsEmpty());
     }
@@ -165,8 +163,7 @@ TEST_F(Google, ReadsFromTheAddressThatTheListingGave) {
     const Json::Value description = Object(Text(Seen("a.txt"), "standard::description"));
     EXPECT_EQ(handle->url, description["downloadUrl"].asString());
     service.ExpireDownloadUrls();
-    const UniqueHandle late(
-        ZYROCloud_Cloud_Handle_New(server_id.c_str(), "/a.txt", Seen("a.txt")));
+    const UniqueHandle late(ZYROCloud_Cloud_Handle_New(server_id.c_str(), "/a.txt", Seen("a.txt")));
     EXPECT_EQ(Read(late, 4), -1);
     EXPECT_EQ(err, G_IO_ERROR_PERMISSION_DENIED);
 }
@@ -186,8 +183,7 @@ TEST_F(Google, MovesAnItemFromOneFolderIntoAnother) {
                                           target.c_str(), &err),
               0);
     EXPECT_EQ(err, G_IO_ERROR_NOT_FOUND);
-    EXPECT_TRUE(
-        seams::LoggedPart("Failed to move a file form " + docs + " to none, err: {"))
+    EXPECT_TRUE(seams::LoggedPart("Failed to move a file form " + docs + " to none, err: {"))
         << seams::LogDump();
 }
 
@@ -206,9 +202,9 @@ TEST_F(Google, TakesAStarAwayAndLeavesTheItem) {
 
 TEST_F(Google, SetsTheTimeOfAnItem) {
     const std::string id = amy.AddPath("/a.txt", "a");
-    EXPECT_EQ(ZYROCloud_Cloud_Google_Chmod_MTime(server_id.c_str(), cache, id.c_str(), 1425291072,
-                                                 &err),
-              1)
+    EXPECT_EQ(
+        ZYROCloud_Cloud_Google_Chmod_MTime(server_id.c_str(), cache, id.c_str(), 1425291072, &err),
+        1)
         << seams::LogDump();
     EXPECT_EQ(service.Facts(amy, id).modified.seconds, 1425291072);
     EXPECT_EQ(ZYROCloud_Cloud_Google_Chmod_MTime(server_id.c_str(), cache, "none", 1, &err), 0);

@@ -46,8 +46,8 @@ TEST_F(OneDrive, WithoutARootToldOfNothing) {
     EXPECT_EQ(GetRoot(), 0);
     EXPECT_EQ(err, G_IO_ERROR_PERMISSION_DENIED);
     EXPECT_TRUE(seams::LoggedPart("Failed to get root info err: {")) << seams::LogDump();
-    for (const char* root : {"null", "{}", R"({"type":"notebook","id":"x"})", R"({"id":7})", "[]",
-                             "7", "\"text\""}) {
+    for (const char* root :
+         {"null", "{}", R"({"type":"notebook","id":"x"})", R"({"id":7})", "[]", "7", "\"text\""}) {
         seams::Reset();
         sim.AddFault(OnRoot().Answer(200, root));
         EXPECT_EQ(GetRoot(), 0) << root;
@@ -62,8 +62,8 @@ TEST_F(OneDrive, NeedsAConnectionAndACacheForItsRoot) {
     EXPECT_EQ(ZYROCloud_Cloud_OneDrive_GetRoot(server_id.c_str(), nullptr, See, this, &err), 0);
     EXPECT_TRUE(seams::Logged("Wrong parameters")) << seams::LogDump();
     EXPECT_THAT(Requests(), IsEmpty());
-    EXPECT_EQ(
-        ZYROCloud_Cloud_OneDrive_GetRoot(server_id.c_str(), cache, nullptr, nullptr, nullptr), 1);
+    EXPECT_EQ(ZYROCloud_Cloud_OneDrive_GetRoot(server_id.c_str(), cache, nullptr, nullptr, nullptr),
+              1);
     Disconnect();
     EXPECT_EQ(GetRoot(), 0);
     EXPECT_TRUE(seams::Logged("Failed to create cloud")) << seams::LogDump();
@@ -100,8 +100,7 @@ TEST_F(OneDrive, ReadsFromTheAddressOfTheId) {
     EXPECT_EQ(ReadAll(handle, 4), "0123456789");
     EXPECT_EQ(handle->url, rig->Hosts()["LiveApiHost"].asString() + "/v5.0/" + id + "/content");
     g_file_info_remove_attribute(Seen("a.txt"), "id::file");
-    const UniqueHandle bare(
-        ZYROCloud_Cloud_Handle_New(server_id.c_str(), "/a.txt", Seen("a.txt")));
+    const UniqueHandle bare(ZYROCloud_Cloud_Handle_New(server_id.c_str(), "/a.txt", Seen("a.txt")));
     EXPECT_EQ(Read(bare, 4), -1);
     EXPECT_TRUE(seams::Logged("File ID is empty")) << seams::LogDump();
 }
