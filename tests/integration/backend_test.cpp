@@ -27,7 +27,7 @@ void SignIn(const Place& place) {
 }
 
 /** What the program says; the content that it read is in /tmp/content. */
-Outcome Run(const Place& place, const std::string& name) {
+Outcome Play(const Place& place, const std::string& name) {
     return machine::Run("ZYROVFS_UID=4001 " BACKEND_EXAMPLE " " + place.protocol + " " +
                         place.Id() + " '" + name + "' </tmp/credentials >/tmp/content");
 }
@@ -49,7 +49,7 @@ TEST(BackendExample, ListsReadsRenamesAndDeletesAtEachCloud) {
         place.account->AddPath("/a letter.bin", bytes);
         place.account->AddPath("/docs/b.txt", "b");
         SignIn(place);
-        const Outcome said = Run(place, "a letter.bin");
+        const Outcome said = Play(place, "a letter.bin");
         EXPECT_EQ(said.status, 0) << said.output;
         EXPECT_THAT(said.output, HasSubstr("  a letter.bin\n"));
         EXPECT_THAT(said.output, HasSubstr("  docs/\n"));
@@ -67,7 +67,7 @@ TEST(BackendExample, ReadsAnEmptyFileToItsEnd) {
         SCOPED_TRACE(place.protocol);
         place.account->AddPath("/empty", "");
         SignIn(place);
-        const Outcome said = Run(place, "empty");
+        const Outcome said = Play(place, "empty");
         EXPECT_EQ(said.status, 0) << said.output;
         EXPECT_THAT(said.output, HasSubstr("read 0 bytes\n"));
     }
@@ -77,12 +77,12 @@ TEST(BackendExample, SaysWhichStepFailed) {
     for (Place& place : TheClouds().places) {
         SCOPED_TRACE(place.protocol);
         SignIn(place);
-        const Outcome missing = Run(place, "none");
+        const Outcome missing = Play(place, "none");
         EXPECT_EQ(missing.status, 1);
         EXPECT_THAT(missing.output, HasSubstr("none: not there\n"));
         place.account->ExpireAccessTokens();
         place.account->RevokeRefreshTokens();
-        const Outcome refused = Run(place, "none");
+        const Outcome refused = Play(place, "none");
         EXPECT_EQ(refused.status, 1);
         EXPECT_THAT(refused.output,
                     HasSubstr("check the account: failed, GIO error " +
