@@ -1,9 +1,12 @@
 #include "gvfs_services.h"
 
+#include <json/writer.h>
+
 #include <cstdio>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <map>
 
 #include "zyrovfs/server.h"
 
