@@ -12,6 +12,7 @@ using machine_clouds::Place;
 using machine_clouds::TheClouds;
 using testing::HasSubstr;
 
+const std::string kExample = BuildDir() + "/tests/integration/backend_example";
 const auto* const kClouds = testing::AddGlobalTestEnvironment(&TheClouds());
 
 /** The credentials as a mount hands them to the backend, in /tmp/credentials. */
@@ -28,8 +29,7 @@ void SignIn(const Place& place) {
 
 /** What the program says; the content that it read is in /tmp/content. */
 Outcome Play(const Place& place, const std::string& name) {
-    return machine::Run("ZYROVFS_UID=4001 " BACKEND_EXAMPLE " " + place.protocol + " " +
-                        place.Id() + " '" + name + "' </tmp/credentials >/tmp/content");
+    return machine::Run("ZYROVFS_UID=4001 " + kExample + " " + place.protocol + " " + place.Id() + " '" + name + "' </tmp/credentials >/tmp/content");
 }
 
 std::string Content(size_t size) {
@@ -91,8 +91,8 @@ TEST(BackendExample, SaysWhichStepFailed) {
 }
 
 TEST(BackendExample, TellsHowItIsCalled) {
-    EXPECT_EQ(machine::Run(BACKEND_EXAMPLE " </dev/null").status, 2);
-    EXPECT_EQ(machine::Run(BACKEND_EXAMPLE " ftp id name </dev/null").status, 2);
+    EXPECT_EQ(machine::Run(kExample + " </dev/null").status, 2);
+    EXPECT_EQ(machine::Run(kExample + " ftp id name </dev/null").status, 2);
 }
 
 }  // namespace

@@ -13,13 +13,14 @@
 
 #include "support/cloudsim/cloudsim.h"
 #include "support/cloudsim/mounted_account.h"
+#include "support/locations.h"
 #include "support/machine.h"
 
 namespace machine_clouds {
 
 using machine::Must;
 
-inline const std::string kTool = BUILD_DIR "/tools/zyrovfs/zyrovfs";
+inline const std::string kTool = BuildDir() + "/tools/zyrovfs/zyrovfs";
 inline constexpr size_t kMiB = 1 << 20;
 
 /** A service with Amy's account, and what the box would have mounted of it. */
