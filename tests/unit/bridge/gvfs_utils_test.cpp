@@ -1,6 +1,7 @@
 #include "bridge/gvfs_utils.h"
 
 #include "cloud/dropbox/dropbox.h"
+#include "support/catalogue.h"
 #include "support/cloudsim/dropbox.h"
 #include "support/driver_fixture.h"
 #include "zyrovfs/zyrocloud.h"
@@ -24,6 +25,8 @@ class CommonOperations : public DriverFixture<Dropbox, cloudsim::Dropbox> {
     }
     void SetUp() override {
         DriverFixture::SetUp();
+        catalogue::Clear();
+        catalogue::Add("dropbox", "Dropbox", "connect");
         drive.reset();
         amy.AddPath("/docs/a.txt", "text");
     }
