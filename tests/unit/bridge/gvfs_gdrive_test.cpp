@@ -106,7 +106,7 @@ TEST_F(Google, ChoosesOfTwoFoldersTheOneThatHoldsTheNameThatItIsGiven) {
     EXPECT_EQ(ZYROCloud_Cloud_Google_List(server_id.c_str(), cache, "/My Drive/docs", "two.txt",
                                           See, this, &err),
               1)
-        << seams::LogDump();
+        << seams::LogDump() << sim.Journal().Text();
     EXPECT_THAT(SeenNames(), ElementsAre("two.txt"));
 }
 
