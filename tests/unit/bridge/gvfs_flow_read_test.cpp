@@ -224,7 +224,6 @@ TEST_P(FlowRead, WithoutAnArgumentThatItNeedsIsRefused) {
     EXPECT_EQ(err, kUntouched);
     EXPECT_TRUE(seams::Logged("Wrong parameters")) << seams::LogDump();
     EXPECT_THAT(Requests(), IsEmpty());
-    sim.AddFault(rig->OnContent().Answer(403, ""));
     amy.Remove(id);
     bytes.resize(8);
     dest = bytes.data();
