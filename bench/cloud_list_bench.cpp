@@ -1,7 +1,6 @@
 // Listing a big folder of each service against what cannot be avoided: transfer and parse of the
 // same pages, which are held until the last one has come, as the items of a listing are.
 #include <benchmark/benchmark.h>
-#include <json/reader.h>
 
 #include "cloud_replay.h"
 
@@ -36,30 +35,10 @@ void List(benchmark::State& state, const bench::Service& service) {
     Count(state);
 }
 
-/** Whether all pages could be had. */
-bool TransferAndParse(const bench::Replay& replay) {
-    const std::unique_ptr<CURL, void (*)(CURL*)> curl(curl_easy_init(), curl_easy_cleanup);
-    Json::CharReaderBuilder rules;
-    rules["collectComments"] = false;
-    std::string body;
-    std::vector<Json::Value> pages;
-    for (const bench::Exchange& exchange : replay.Exchanges()) {
-        Json::Value page;
-        const std::unique_ptr<Json::CharReader> reader(rules.newCharReader());
-        if (!bench::Ask(curl.get(), replay.Url(), exchange, body) ||
-            !reader->parse(body.data(), body.data() + body.size(), &page, nullptr) ||
-            body.size() != exchange.answer.size()) {
-            return false;
-        }
-        pages.push_back(std::move(page));
-    }
-    return !pages.empty();
-}
-
 void List_bare(benchmark::State& state, const bench::Service& service) {
     const bench::Replay& replay = Listing(service, static_cast<unsigned>(state.range(0))).Pages();
     for (auto _ : state) {
-        if (!TransferAndParse(replay)) {
+        if (!bench::TransferAndParse(replay)) {
             state.SkipWithError("not transferred");
             break;
         }

@@ -1,6 +1,7 @@
 #include "cloud_replay.h"
 
 #include <arpa/inet.h>
+#include <json/reader.h>
 #include <netinet/in.h>
 #include <netinet/tcp.h>
 #include <strings.h>
@@ -9,6 +10,9 @@
 
 #include <cstdio>
 #include <cstdlib>
+#include <memory>
+#include <utility>
+#include <vector>
 
 namespace bench {
 namespace {
@@ -123,6 +127,25 @@ const std::string& Replay::Answer(const std::string& request_line, const std::st
         known = &exchanges_.back();
     }
     return known->answer;
+}
+
+bool TransferAndParse(const Replay& replay) {
+    const std::unique_ptr<CURL, void (*)(CURL*)> curl(curl_easy_init(), curl_easy_cleanup);
+    Json::CharReaderBuilder rules;
+    rules["collectComments"] = false;
+    std::string body;
+    std::vector<Json::Value> pages;
+    for (const Exchange& exchange : replay.Exchanges()) {
+        Json::Value page;
+        const std::unique_ptr<Json::CharReader> reader(rules.newCharReader());
+        if (!Ask(curl.get(), replay.Url(), exchange, body) ||
+            !reader->parse(body.data(), body.data() + body.size(), &page, nullptr) ||
+            body.size() != exchange.answer.size()) {
+            return false;
+        }
+        pages.push_back(std::move(page));
+    }
+    return !pages.empty();
 }
 
 RecordedListing::RecordedListing(const Service& service, unsigned items)

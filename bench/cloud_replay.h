@@ -50,6 +50,10 @@ class Replay {
 /** One request on this handle; the body of the answer goes into `out`. */
 bool Ask(CURL* curl, const std::string& host, const Exchange& what, std::string& out);
 
+/** Asks for all that was recorded, parses each answer and holds it until the last one has come, as
+ * the items of a listing are held. Whether all could be had. */
+bool TransferAndParse(const Replay& replay);
+
 /** A folder of so many items, listed once already. */
 class RecordedListing {
   public:

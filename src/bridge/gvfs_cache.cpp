@@ -51,6 +51,13 @@ bool StoreEntry(ZYROCloud_Cache& cache, const ZYROCloud_CacheKey& path, GFileInf
 
 }  // namespace
 
+bool AddEntry(ZYROCloud_Cache& cache, const char* dir, GFileInfo* info) {
+    const ZYROCloud_CacheKey path{FullPath(dir, InfoName(info))};
+    const bool is_new = StoreEntry(cache, path, info);
+    cache.absent.erase(path);
+    return is_new;
+}
+
 uint64_t CacheClock() {
     timeval now{};
     gettimeofday(&now, nullptr);
@@ -131,12 +138,8 @@ int ZYROCloud_Cache_Entry_SetMTime(ZYROCloud_Cache* cache, const char* path, lon
 }
 
 int ZYROCloud_Cache_Entry_Add(ZYROCloud_Cache* cache, const char* dir, GFileInfo* info) {
-    const char* const name = InfoName(info);
-    return WithCache(cache, dir != nullptr && name != nullptr, [&] {
-        const ZYROCloud_CacheKey path{FullPath(dir, name)};
-        const bool is_new = StoreEntry(*cache, path, info);
-        cache->absent.erase(path);
-        if (is_new) {
+    return WithCache(cache, dir != nullptr && InfoName(info) != nullptr, [&] {
+        if (AddEntry(*cache, dir, info)) {
             // A new entry ends a hold of the caller, too. Last: others may come in from here on.
             cache->lock.unlock();
         }

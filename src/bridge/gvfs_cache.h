@@ -50,6 +50,13 @@ inline uint32_t CacheAge(uint64_t now, uint64_t stamp) {
     return static_cast<uint32_t>(now) - static_cast<uint32_t>(stamp);
 }
 
+/**
+ * Stores a copy of a record that has a name, and takes a mark of absence away; true for a new
+ * entry. Under the lock. Entry_Add without its unlock: who fills a listing keeps others out until
+ * it is whole.
+ */
+bool AddEntry(ZYROCloud_Cache& cache, const char* dir, GFileInfo* info);
+
 /** Removes the listing of a directory and all below it that listings name. Under the lock. */
 void RemoveListing(ZYROCloud_Cache& cache, ZYROCloud_CacheKey dir);
 

@@ -40,10 +40,11 @@ inline const char* TextOrEmpty(const char* text) {
 
 /**
  * Runs `body`, which answers bool, on a driver of the connection that lives as long as the call. A
- * connection of another service than `Driver` is none. 1 or 0.
+ * connection of another service than `Driver` is none; `no_driver` is logged, a format that may
+ * quote the server id. 1 or 0.
  */
 template <typename Driver = Cloud, typename Body>
-int WithDriver(const char* server_id, Body body,
+int WithDriver(const char* server_id, Body body, const char* no_driver = "Failed to create cloud",
                ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here()) {
     return ZYROVFS::NoThrow(
                ZYROVFS::VFS_ERR_FAILED,
@@ -51,7 +52,7 @@ int WithDriver(const char* server_id, Body body,
                    const UniqueCloud owner = CreateCloud(server_id);
                    auto* driver = dynamic_cast<Driver*>(owner.get());
                    if (driver == nullptr) {
-                       LOG_ERROR_AT(at, "Failed to create cloud");
+                       LOG_ERROR_AT(at, no_driver, TextOrEmpty(server_id));
                        return false;
                    }
                    return body(*driver);

@@ -9,6 +9,7 @@
 #include <unordered_set>
 #include <utility>
 
+#include "core/json_member.h"
 #include "core/log.h"
 #include "core/source_line.h"
 #include "zyrovfs/cloud.h"
@@ -64,10 +65,10 @@ bool ForEachPage(const char* member, Json::Value& out, Fetch fetch, Keep keep, M
     return true;
 }
 
-/** Whether the file tree shows an item with its name in `member`; one without a name it does. */
-inline bool IsShown(const Json::Value& item, const std::string& member) {
-    const Json::Value* name = item.find(member.data(), member.data() + member.size());
-    return name == nullptr || !Cloud::IsHiddenFilePath("", name->asString());
+/** Whether the file tree shows an item with its name in `member`. One without a name, or that is no
+ * item at all, does not end the listing of all others: whoever reads it has to look. */
+inline bool IsShown(const Json::Value& item, const char* member) {
+    return !Cloud::IsHiddenFilePath("", ZYROVFS::json::TextOf(item, member));
 }
 
 /** The places where pages of one listing began. */

@@ -10,6 +10,7 @@
 #include "cloud/guard.h"
 #include "cloud/handler.h"
 #include "cloud/public_cloud.h"
+#include "cloud/without_tokens.h"
 #include "core/handle.h"
 #include "core/json.h"
 #include "zyrovfs/utils.h"
@@ -66,11 +67,6 @@ class Renewal {
     std::lock_guard<std::recursive_mutex> turn_;
     bool locked_;
 };
-
-/** Text of a service's answer for the log: what an answer breaks off in may be a token. */
-std::string WithoutTokens(const std::string& text) {
-    return text.substr(0, text.find("_token"));
-}
 
 std::string Loggable(Json::Value error) {
     if (error.isObject() && error["msg"].isString()) {

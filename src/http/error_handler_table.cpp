@@ -60,13 +60,4 @@ bool Succeed(__tag_vfs_err_* code, SourceLine at) {
     return true;
 }
 
-const Json::Value& MemberOf(const Json::Value& value, const char* key) {
-    return value.isObject() ? value[key] : Json::Value::nullSingleton();
-}
-
-std::string TextOf(const Json::Value& value, const char* key) {
-    const Json::Value& member = MemberOf(value, key);
-    return member.isString() ? member.asString() : "";
-}
-
 }  // namespace ZYROCloud

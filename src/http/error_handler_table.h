@@ -9,6 +9,7 @@
 #include <string>
 
 #include "core/error_cell.h"
+#include "core/json_member.h"
 #include "http/error_handler.h"
 
 namespace ZYROCloud {
@@ -83,9 +84,8 @@ inline bool IsBusy(int code) {
     return code == ZYROVFS::VFS_ERR_RATE_LIMITED || code == ZYROVFS::VFS_ERR_SERVER_ERROR;
 }
 
-/** A member that may be missing, of a value that may be no object: null or "" then. */
-const Json::Value& MemberOf(const Json::Value& value, const char* key);
-std::string TextOf(const Json::Value& value, const char* key);
+using ZYROVFS::json::MemberOf;
+using ZYROVFS::json::TextOf;
 
 }  // namespace ZYROCloud
 
