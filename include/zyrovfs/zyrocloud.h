@@ -4,7 +4,8 @@
  * Conventions of this face:
  *
  * 1. Results. Unless told otherwise a function answers 1 for success or "yes" and 0 for failure or
- *    "no"; bytes are counted in `long long`. Each failure is told by a line in the system log.
+ *    "no"; bytes are counted in `long long`. A line in the system log tells of each operation on a
+ *    service that failed.
  * 2. `err`. An operation that failed at the service stores a value of GIOErrorEnum in `*err`. It is
  *    left alone by success, and by failures that no service was asked about: a wrong argument, no
  *    profile, no driver, an answer that makes no sense. So a caller stores what it wants to see
@@ -50,8 +51,8 @@ typedef struct ZYROCloud_RootAtime {
 
 /**
  * Told of each item of a listing, in the service's order, on the thread that lists. `info` is valid
- * during the call; who keeps it takes a reference. The cache may be locked meanwhile: the callback
- * may use it, and must not wait for another thread that does.
+ * during the call; who keeps it takes a reference. The cache is locked meanwhile: the callback may
+ * use it, and must not wait for another thread that does.
  */
 typedef void (*ZYROCloud_ListCallback)(GFileInfo* info, void* user_data);
 
@@ -266,8 +267,7 @@ ZYROVFS_API int ZYROCloud_Cloud_Google_List(const char* server_id, ZYROCloud_Cac
 ZYROVFS_API int ZYROCloud_Cloud_Google_CheckAccount(const char* server_id, const char* json,
                                                     int* err);
 
-/** Moves the item of id `to` from the folder of id `from` to that of id `to_parent`, as the driver
- * takes the three ids. */
+/** Moves the item of id `to` out of the folder of id `from` into that of id `to_parent`. */
 ZYROVFS_API int ZYROCloud_Cloud_Google_Move(const char* server_id, ZYROCloud_Cache* cache,
                                             const char* from, const char* to, const char* to_parent,
                                             int* err);
@@ -301,8 +301,8 @@ ZYROVFS_API int ZYROCloud_Cloud_Box_List(const char* account_id, const char* ser
 ZYROVFS_API int ZYROCloud_Cloud_Box_CheckAccount(const char* server_id, const char* json,
                                                  char** account_id, int* err);
 
-/** Moves the item `from` as the driver's Move takes its arguments. A file in the way, at the server
- * path `to_path`, is overwritten; a folder gives G_IO_ERROR_IS_DIRECTORY. */
+/** Moves the item of id `from` into the folder of id `to`. A file in the way, at the server path
+ * `to_path`, is overwritten; a folder there gives G_IO_ERROR_IS_DIRECTORY. */
 ZYROVFS_API int ZYROCloud_Cloud_Box_Move(const char* server_id, ZYROCloud_Cache* cache,
                                          const char* from, const char* to, const char* to_path,
                                          int* err);
