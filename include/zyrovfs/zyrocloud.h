@@ -16,10 +16,10 @@
  *    Paths in the cache begin with a slash and have none at the end.
  * 5. Ownership. Records that are handed in stay the caller's: the library keeps copies. What it
  *    hands out stays its own unless told otherwise, above all the record of Entry_Get.
- * 6. Threads. A cache may be used by several threads, and from within a callback. A handle belongs
- *    to one reader; a second thread may fill its buffer meanwhile, as told there. All other
- *    operations make a driver of their own for each call and may run side by side, but that the
- *    downloads of a process take place one after another.
+ * 6. Threads. A cache may be used by several threads, and from within a callback. A handle has
+ *    one reader; another thread may refill its buffer. All other operations make a driver of their
+ *    own for each call and may run side by side, but that the downloads of a process take place one
+ *    after another.
  * 7. Identity. Connections are those of the effective user, or of `ZYROVFS_UID` for root.
  * 8. ZYROCloud_Cloud_InitCurlGlobal comes before the first thread of the process that uses this,
  *    ZYROCloud_Cloud_CleanupCurlGlobal after the last.
@@ -28,8 +28,9 @@
 #define ZYROVFS_ZYROCLOUD_H
 
 #include <gio/gio.h>
-#include <stdbool.h>
-#include <time.h>
+// C has no other names for these.
+#include <stdbool.h>  // NOLINT(modernize-deprecated-headers)
+#include <time.h>     // NOLINT(modernize-deprecated-headers)
 
 #include "zyrovfs/export.h"
 
@@ -103,8 +104,7 @@ ZYROVFS_API int ZYROCloud_Cache_Entry_SetMTime(ZYROCloud_Cache* cache, const cha
  * Stores a copy of `info` under `dir` and the record's name; a record that is already there is
  * overwritten in place. A mark of absence goes. All arguments are required, and so is a name.
  */
-ZYROVFS_API int ZYROCloud_Cache_Entry_Add(ZYROCloud_Cache* cache, const char* dir,
-                                          GFileInfo* info);
+ZYROVFS_API int ZYROCloud_Cache_Entry_Add(ZYROCloud_Cache* cache, const char* dir, GFileInfo* info);
 
 /**
  * Removes a path, its listing and all that its listing names, and marks it absent or takes such a
@@ -214,7 +214,7 @@ ZYROVFS_API void ZYROCloud_Cloud_InitCurlGlobal(void);
 /** Undoes it; no driver and no handle may be left. */
 ZYROVFS_API void ZYROCloud_Cloud_CleanupCurlGlobal(void);
 
-/* --- access time of a mount's root. Any thread, between Init and Destroy. ----------------------- */
+/* --- access time of a mount's root. Any thread, between Init and Destroy ---------------------- */
 
 /** Makes the record ready and stamps it with now. */
 ZYROVFS_API void InitRootAtime(ZYROCloud_RootAtime* rec);
@@ -242,7 +242,7 @@ ZYROVFS_API void DestroyRootAtime(ZYROCloud_RootAtime* rec);
  * is done with the latter two.
  */
 
-/* --- Google Drive, shown as two folders "My Drive" and "Starred" -------------------------------- */
+/* --- Google Drive, shown as two folders "My Drive" and "Starred" ------------------------------ */
 
 /**
  * What a path stands for, slashes at its beginning left out: 1 the root, 2 "My Drive", 3 "Starred",
@@ -285,7 +285,7 @@ ZYROVFS_API long long ZYROCloud_Cloud_Google_Download(ZYROCloud_Handle* handle, 
                                                       const void* p3, char** dest, long long size,
                                                       int* err);
 
-/* --- Box ---------------------------------------------------------------------------------------- */
+/* --- Box -------------------------------------------------------------------------------------- */
 
 /**
  * Lists a folder. `server_id`, `cache` and `path` are required; without `account_id` nothing
@@ -312,7 +312,7 @@ ZYROVFS_API long long ZYROCloud_Cloud_Box_Download(ZYROCloud_Handle* handle, con
                                                    const void* p3, char** dest, long long size,
                                                    int* err);
 
-/* --- Dropbox, where an item's path is its id ---------------------------------------------------- */
+/* --- Dropbox, where an item's path is its id -------------------------------------------------- */
 
 /** Lists a folder. `cache` and `path` are required. Hidden names are left out. */
 ZYROVFS_API int ZYROCloud_Cloud_Dropbox_List(const char* server_id, ZYROCloud_Cache* cache,
@@ -333,7 +333,7 @@ ZYROVFS_API long long ZYROCloud_Cloud_Dropbox_Download(ZYROCloud_Handle* handle,
                                                        const void* p3, char** dest, long long size,
                                                        int* err);
 
-/* --- OneDrive ----------------------------------------------------------------------------------- */
+/* --- OneDrive --------------------------------------------------------------------------------- */
 
 /** Stores the record of the account's root under "/" and tells `callback` of it. */
 ZYROVFS_API int ZYROCloud_Cloud_OneDrive_GetRoot(const char* server_id, ZYROCloud_Cache* cache,
