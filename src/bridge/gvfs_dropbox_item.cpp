@@ -1,6 +1,6 @@
 #include "bridge/gvfs_dropbox_item.h"
 
-#include <cstring>
+#include <string>
 
 #include "core/json_member.h"
 #include "zyrovfs/cloud.h"
@@ -16,7 +16,8 @@ bool DropboxRecord(const Json::Value& item, ItemRecord& record) {
     }
     record.id = TextOf(item, "path_display");
     record.is_dir = TextOf(item, ".tag") == "folder";
-    record.name = record.display_name = basename(TextOf(item, "name").c_str());
+    const std::string name = TextOf(item, "name");
+    record.name = record.display_name = name.substr(name.rfind('/') + 1);
     if (Cloud::IsHiddenFilePath("", record.name)) {
         return false;
     }

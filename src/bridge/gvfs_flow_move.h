@@ -22,6 +22,10 @@ struct MoveCall {
     int* err;
 };
 
+/** Whether an item that a path led to has the name at its end: a path may mean items of another
+ * name, too. Without regard to case, as services compare names. */
+bool HasNameOf(const Json::Value& item, const std::string& path);
+
 /** Makes way for `call.from`, and moves it again. A file that has its place gives way, a folder
  * does not, and no item for itself. */
 template <typename Driver, typename Find>
@@ -35,8 +39,9 @@ bool ReplaceAtTarget(Driver& driver, const MoveCall& call, Find find, ZYROVFS::S
     };
     const auto remove = [&](const Json::Value& item) {
         const std::string rival = driver.GetFileID(item);
-        const bool named = !ZYROVFS::json::TextOf(item, "id").empty();
-        if (!named || rival == call.from || !driver.Delete(rival)) {
+        const bool is_rival = !ZYROVFS::json::TextOf(item, "id").empty() && rival != call.from &&
+                              HasNameOf(item, call.to_path);
+        if (!is_rival || !driver.Delete(rival)) {
             LOG_ERROR_AT(at, "Failed to delete path %s", call.to_path);
             return false;
         }

@@ -33,10 +33,25 @@ constexpr const char* kFolders = "mimeType = 'application/vnd.google-apps.folder
 constexpr const char* kOwnFolders =
     "'me' in owners and mimeType = 'application/vnd.google-apps.folder'";
 
+/**
+ * The path begins with a folder that the account does not have, or does not find by its name: below
+ * "My Drive" it is then walked from the root. What is starred has no place to begin at.
+ */
+bool FindFolder(const char* path, const char* folder_name, Drive& drive, std::string& id) {
+    const bool own = GooglePathOf(path) == kGoogleInMyDrive;
+    const std::string name = TextOrEmpty(folder_name);
+    if (drive.GetFileIDByPathFromServer("", path, own ? kOwnFolders : kFolders, name, id)) {
+        return true;
+    }
+    const std::string below = own ? PathInMyDrive(path) : "";
+    return !below.empty() && drive.GetErrorCode() == ZYROVFS::VFS_ERR_NOT_FOUND &&
+           drive.GetFileIDByPathFromServerRecursive(gdrive::kRoot, below, kFolders, name, id) &&
+           !id.empty();
+}
+
 /** Puts in what depends on the kind of path; false for one outside both roots. */
 bool AddFolder(const char* path, const char* folder_name, Drive& drive, ListRules& rules) {
-    const GooglePath kind = GooglePathOf(path);
-    switch (kind) {
+    switch (GooglePathOf(path)) {
         case kGoogleMyDrive:
             rules.id = gdrive::kRoot;
             return true;
@@ -48,9 +63,7 @@ bool AddFolder(const char* path, const char* folder_name, Drive& drive, ListRule
         case kGoogleInStarred:
         case kGoogleDeepInStarred:
             rules.find = [=, &drive](std::string& id) {
-                return drive.GetFileIDByPathFromServer(
-                    "", path, kind == kGoogleInMyDrive ? kOwnFolders : kFolders,
-                    TextOrEmpty(folder_name), id);
+                return FindFolder(path, folder_name, drive, id);
             };
             return true;
         default:

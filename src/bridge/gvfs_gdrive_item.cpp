@@ -79,6 +79,13 @@ GooglePath GooglePathOf(const char* path) {
     return kGoogleOther;
 }
 
+std::string PathInMyDrive(const char* path) {
+    std::string_view rest;
+    return IsBelow(path + strspn(path, "/"), kMyDrive, rest) && !rest.empty()
+               ? "/" + std::string(rest)
+               : "";
+}
+
 bool GoogleRecord(const Json::Value& item, const IsTaken& is_taken, ItemRecord& record) {
     if (item.isNull()) {
         return false;

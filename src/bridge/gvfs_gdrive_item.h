@@ -25,6 +25,9 @@ enum GooglePath {
 /** `path` may be null. */
 GooglePath GooglePathOf(const char* path);
 
+/** A path below "My Drive" as one of the account, "/a/b"; "" for any other. */
+std::string PathInMyDrive(const char* path);
+
 /** Whether an earlier item of the listing has this display name. */
 using IsTaken = std::function<bool(const std::string& display_name)>;
 

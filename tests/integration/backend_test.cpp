@@ -29,7 +29,8 @@ void SignIn(const Place& place) {
 
 /** What the program says; the content that it read is in /tmp/content. */
 Outcome Play(const Place& place, const std::string& name) {
-    return machine::Run("ZYROVFS_UID=4001 " + kExample + " " + place.protocol + " " + place.Id() + " '" + name + "' </tmp/credentials >/tmp/content");
+    return machine::Run("ZYROVFS_UID=4001 " + kExample + " " + place.protocol + " " + place.Id() +
+                        " '" + name + "' </tmp/credentials >/tmp/content");
 }
 
 std::string Content(size_t size) {

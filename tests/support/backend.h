@@ -17,6 +17,7 @@
 #include "bridge/file_info.h"
 #include "core/json.h"
 #include "core/paths.h"
+#include "support/catalogue.h"
 #include "support/cloudsim/cloudsim.h"
 #include "support/profiles.h"
 #include "support/seams.h"
@@ -254,6 +255,8 @@ class BackendTest : public profiles::ProfileTest {
         std::filesystem::create_directories(paths::kConfigRoot);
         ASSERT_TRUE(json::toFile(document, paths::kServiceConfig, 0640));
         ASSERT_TRUE(ZYROCloud::Utils::AddClient(rig->Protocol(), "mine", kSecret));
+        catalogue::Clear();
+        catalogue::Add(rig->Protocol(), rig->Protocol(), "connect");
         Connect();
         ASSERT_EQ(ZYROCloud_Cache_Init(&cache), 1);
         seams::Reset();

@@ -222,7 +222,7 @@ TEST_P(FlowList, NeedsNeitherACallbackNorAPlaceForTheError) {
     const char* const top = rig->Top() == "/" ? "/" : "/My Drive";
     EXPECT_EQ(rig->List(server_id.c_str(), cache, top, nullptr, nullptr, nullptr), 1);
     EXPECT_NE(Cached(Shown("/a.txt")), nullptr);
-    sim.AddFault(rig->OnListing().Answer(403, "{}"));
+    sim.AddFault(rig->OnListing().Forever().Answer(403, "{}"));
     EXPECT_EQ(rig->List(server_id.c_str(), cache, top, nullptr, nullptr, nullptr), 0);
 }
 

@@ -29,6 +29,12 @@ class FlowMove : public EachBackend {
         return Call(server_id.c_str(), cache, Id(path).c_str(), Id(folder).c_str(), to_path.c_str(),
                     &err);
     }
+    /** Makes the service find the name taken when an item is moved. */
+    Fault Conflict() const {
+        const bool box = rig->Protocol() == "box";
+        return Fault::On(box ? "PUT" : "MOVE", "/")
+            .Answer(box ? 409 : 400, R"({"error":{"code":"resource_already_exists"}})");
+    }
     std::string BytesAt(const std::string& path) const { return amy.Bytes(amy.Find(path)); }
     size_t Deletes() const {
         size_t deletes = 0;
@@ -65,15 +71,22 @@ TEST_P(FlowMove, OntoAFolderFailsAndDeletesNothing) {
 }
 
 TEST_P(FlowMove, OfAnItemToWhereItIsDoesNotDeleteIt) {
-    const std::string id =
-        rig->Protocol() == "box" ? "/2.0/" + Id("/docs/a.txt") : "/v5.0/" + Id("/docs/a.txt");
-    sim.AddFault(Fault::On(rig->Protocol() == "box" ? "PUT" : "MOVE", id)
-                     .Answer(rig->Protocol() == "box" ? 409 : 400,
-                             R"({"error":{"code":"resource_already_exists"}})"));
+    sim.AddFault(Conflict());
     EXPECT_EQ(Move("/docs/a.txt", "/docs"), 0);
     EXPECT_EQ(err, G_IO_ERROR_EXISTS);
     EXPECT_EQ(Deletes(), 0U);
     EXPECT_EQ(BytesAt("/docs/a.txt"), "new");
+}
+
+TEST_P(FlowMove, DeletesNothingThatHasAnotherNameThanTheItem) {
+    amy.AddPath("/docs/a.txt - Amy Doe", "new");
+    amy.AddPath("/target/a.txt", "kept");
+    sim.AddFault(Conflict());
+    // Box's paths may have an owner in them, and then lead to an item without it.
+    EXPECT_EQ(Move("/docs/a.txt - Amy Doe", "/target"), 0);
+    EXPECT_EQ(err, rig->Protocol() == "box" ? G_IO_ERROR_EXISTS : G_IO_ERROR_NOT_FOUND);
+    EXPECT_EQ(Deletes(), 0U);
+    EXPECT_EQ(BytesAt("/target/a.txt"), "kept");
 }
 
 TEST_P(FlowMove, ThatCannotFindWhatIsInTheWayFails) {

@@ -87,6 +87,14 @@ TEST(GooglePath, IsAFirstFolderOnlyByItsExactName) {
     EXPECT_EQ(ZYROCloud_Cloud_Google_Is_First_Folder(nullptr), 0);
 }
 
+TEST(GooglePath, BelowMyDriveIsOneOfTheAccount) {
+    EXPECT_EQ(PathInMyDrive("/My Drive/a/b"), "/a/b");
+    EXPECT_EQ(PathInMyDrive("My Drive/a"), "/a");
+    for (const char* path : {"", "/", "/My Drive", "/My Drive/", "/Starred/a", "/My Drives/a"}) {
+        EXPECT_EQ(PathInMyDrive(path), "") << path;
+    }
+}
+
 TEST(GoogleItem, ThatIsADocumentGetsTheExtensionOfItsKind) {
     const struct {
         const char* title;

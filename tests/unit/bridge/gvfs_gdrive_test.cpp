@@ -90,11 +90,17 @@ TEST_F(Google, ListsAFolderBelowWhatIsStarredByTheIdInTheCache) {
 TEST_F(Google, LooksForTheUsersOwnFoldersBelowItsTopAndForAnyBelowWhatIsStarred) {
     EXPECT_EQ(List("/My Drive/none"), 0);
     EXPECT_EQ(err, G_IO_ERROR_NOT_FOUND);
-    EXPECT_THAT(Query(), HasSubstr("'me' in owners and mimeType = "
-                                   "'application/vnd.google-apps.folder'"));
+    const std::string first = sim.Journal().All().front().Query("q");
+    EXPECT_THAT(first, HasSubstr("title='My Drive'"));
+    EXPECT_THAT(first, HasSubstr("'me' in owners and mimeType = "
+                                 "'application/vnd.google-apps.folder'"));
+    // The service does not find the root by its name: it is walked from there.
+    EXPECT_THAT(Query(), HasSubstr("'root' in parents and (title='none'"));
+    EXPECT_EQ(Requests().size(), 2U);
     EXPECT_EQ(List("/Starred/none"), 0);
     EXPECT_THAT(Query(), HasSubstr("mimeType = 'application/vnd.google-apps.folder'"));
     EXPECT_EQ(Query().find("in owners"), std::string::npos);
+    EXPECT_EQ(Requests().size(), 3U);
     EXPECT_TRUE(seams::LoggedPart("Failed to find the path, /Starred/none, ")) << seams::LogDump();
 }
 
@@ -106,7 +112,7 @@ TEST_F(Google, ChoosesOfTwoFoldersTheOneThatHoldsTheNameThatItIsGiven) {
     EXPECT_EQ(ZYROCloud_Cloud_Google_List(server_id.c_str(), cache, "/My Drive/docs", "two.txt",
                                           See, this, &err),
               1)
-        << seams::LogDump();
+        << seams::LogDump() << sim.Journal().Text();
     EXPECT_THAT(SeenNames(), ElementsAre("two.txt"));
 }
 
