@@ -236,10 +236,11 @@ ZYROVFS_API void DestroyRootAtime(ZYROCloud_RootAtime* rec);
  * CheckAccount: whether the service accepts the credentials in the JSON text `json`, laid over the
  * stored connection. For the service's account of a mount that is about to be made.
  *
- * Download: reads up to `size` bytes from where the last read of the handle ended into `*dest`,
- * which has room for `size` + 1, and gives their number; 0 at the end of the file, -1 for a
- * failure. `handle`, its record, `dest` with what it points to, `p2` and `p3` are required; nothing
- * is done with the latter two.
+ * Download: reads up to `size` bytes from where the last read of the handle ended into `*dest`, and
+ * gives their number; 0 at the end of the file, -1 for a failure. Services are asked for one byte
+ * more, and it may come: `*dest` has room for `size` + 1, and the result counts it. Into the
+ * handle's own buffer never more is read than fits. `handle`, its record, `dest` with what it
+ * points to, `p2` and `p3` are required; nothing is done with the latter two.
  */
 
 /* --- Google Drive, shown as two folders "My Drive" and "Starred" ------------------------------ */

@@ -193,16 +193,23 @@ TEST_F(HandleBuffer, MoreThanItHoldsIsNeverRead) {
     std::string all(static_cast<size_t>(kBufferBytes) + 64, '#');
     char* dest = all.data();
     EXPECT_EQ(ZYROCloud_FileHandle_Buf_Fill(handle, &dest, static_cast<long long>(all.size())),
-              kBufferBytes);
+              kBufferBytes + 1);
     EXPECT_EQ(all.compare(0, 3, "abc"), 0);
     ZYROCloud_FileHandle_Buf_Reset(handle, -5);
     EXPECT_EQ(Read(10), "");
 }
 
-TEST_F(HandleBuffer, IsZeroedAndHasRoomForTheByteThatServicesAreAskedForBeyondIt) {
-    const char* const buffer = ZYROCloud_FileHandle_Buf_Get(handle);
+TEST_F(HandleBuffer, TheByteThatServicesAreAskedForBeyondItsSizeIsReadToo) {
+    char* const buffer = ZYROCloud_FileHandle_Buf_Get(handle);
     EXPECT_EQ(buffer[0], 0);
     EXPECT_EQ(buffer[kBufferBytes], 0);
+    buffer[kBufferBytes] = 'z';
+    ZYROCloud_FileHandle_Buf_Reset(handle, kBufferBytes + 1);
+    std::string all(static_cast<size_t>(kBufferBytes), '#');
+    char* dest = all.data();
+    EXPECT_EQ(ZYROCloud_FileHandle_Buf_Fill(handle, &dest, kBufferBytes), kBufferBytes);
+    EXPECT_EQ(Read(10), "z");
+    EXPECT_EQ(Read(10), "");
 }
 
 TEST_F(HandleBuffer, InitKeepsABufferAndEmptiesIt) {
