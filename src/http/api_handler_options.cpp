@@ -1,3 +1,4 @@
+#include <sys/socket.h>
 #include <zosplatform/device.h>
 
 #include <variant>
@@ -18,6 +19,7 @@ constexpr long kConnectTime = 90;
 constexpr long kKeepAliveTime = 30;
 constexpr long kDnsCacheTime = 269;
 constexpr long kMostRedirects = 30;
+constexpr long kRootsTime = 300;
 
 // Measured over loopback into a file: a quarter less of the processor than libcurl's own 16 KiB,
 // and a twelfth less than 128 KiB; more gives nothing.
@@ -44,6 +46,11 @@ const void* Pointer(Function* function) {
 CURLcode Set(CURL* curl, const Option& row) {
     return std::visit([&](auto value) { return curl_easy_setopt(curl, row.option, value); },
                       row.value);
+}
+
+/** Programs that this process starts, daemons among them, must not hold its connections open. */
+curl_socket_t OpenSocket(void*, curlsocktype, curl_sockaddr* address) noexcept {
+    return socket(address->family, address->socktype | SOCK_CLOEXEC, address->protocol);
 }
 
 /** A line that the parser refuses by exception is left out, and the transfer goes on. */
@@ -110,6 +117,7 @@ bool APIHandler::SetBasicOpt() {
         {CURLOPT_UPLOAD_BUFFERSIZE, kUploadBuffer, "upload buffer"},
         // Handles work in several threads at once, and signals belong to the whole process.
         {CURLOPT_NOSIGNAL, 1L, "signals"},
+        {CURLOPT_OPENSOCKETFUNCTION, Pointer(OpenSocket), "socket function"},
     };
     for (const Option& row : options) {
         const bool absent = row.option == CURLOPT_SHARE && share_ == nullptr;
@@ -120,6 +128,42 @@ bool APIHandler::SetBasicOpt() {
     return true;
 }
 
+/**
+ * What libcurl may use again. It compares what it knows of; users, pins and what stands in the
+ * files behind them it does not. A handle that is used for two keys makes a connection for each
+ * request.
+ */
+bool APIHandler::ChooseConnections() {
+    // The common store keeps its sessions however long the roots behind them have changed.
+    static const std::string first_roots = handle_key::ForServices().trust;
+    if (HandlePool::Instance().IsInherited(loan_)) {
+        LOG_ERROR("The connections are those of another process");
+        return false;
+    }
+    const bool same_trust = !loan_.used || loan_.key.trust == wanted_.trust;
+    loan_.mixed = loan_.mixed || (loan_.used && loan_.key != wanted_);
+    if (!loan_.used) {
+        loan_.key = wanted_;
+        loan_.used = true;
+    }
+    const Option options[] = {
+        // libcurl keeps parsed roots, but not if there is a directory, too; in this one it finds
+        // nothing.
+        {CURLOPT_CAPATH, nullptr, "ca path"},
+        {CURLOPT_CA_CACHE_TIMEOUT, loan_.mixed ? 0L : kRootsTime, "roots"},
+        {CURLOPT_SSL_SESSIONID_CACHE, same_trust && !wanted_.IsPinned() ? 1L : 0L, "sessions"},
+        {CURLOPT_FRESH_CONNECT, loan_.mixed ? 1L : 0L, "fresh connect"},
+        {CURLOPT_FORBID_REUSE, loan_.mixed ? 1L : 0L, "forbid reuse"},
+    };
+    for (const Option& row : options) {
+        if (!Taken(Set(curl_, row), row.what)) {
+            return false;
+        }
+    }
+    return !wanted_.HasRoots() || wanted_.trust == first_roots ||
+           Taken(curl_easy_setopt(curl_, CURLOPT_SHARE, nullptr), "share");
+}
+
 bool APIHandler::SetWriteFunAndData(CurlCallback function, void* data) {
     return (function == nullptr ||
             Accept(curl_easy_setopt(curl_, CURLOPT_WRITEFUNCTION, function), "write function")) &&
@@ -128,6 +172,7 @@ bool APIHandler::SetWriteFunAndData(CurlCallback function, void* data) {
 }
 
 bool APIHandler::SetReadFunAndData(CurlCallback function, void* data) {
+    body_is_read_ = body_is_read_ || function != nullptr;
     return (function == nullptr ||
             Accept(curl_easy_setopt(curl_, CURLOPT_READFUNCTION, function), "read function")) &&
            (data == nullptr ||
@@ -166,6 +211,7 @@ void APIHandler::ForgetSeek() {
 }
 
 bool APIHandler::SetUploadOpt(bool mute) {
+    body_is_read_ = true;
     const void* sink = mute ? Pointer(MutedWriteCallback) : Pointer(WriteToStrBuf);
     return Accept(curl_easy_setopt(curl_, CURLOPT_UPLOAD, 1L), "upload") &&
            Accept(Set(curl_, {CURLOPT_WRITEFUNCTION, sink, ""}), "write function");
@@ -177,6 +223,7 @@ bool APIHandler::SetUploadSize(long long size) {
 }
 
 bool APIHandler::SetUserPwOpt(const std::string& user, const std::string& password) {
+    wanted_.credentials = handle_key::Credentials(user, password);
     return Accept(curl_easy_setopt(curl_, CURLOPT_HTTPAUTH, kAuthMethods), "http auth") &&
            Accept(curl_easy_setopt(curl_, CURLOPT_USERNAME, user.c_str()), "user name") &&
            Accept(curl_easy_setopt(curl_, CURLOPT_PASSWORD, password.c_str()), "password");
