@@ -113,7 +113,6 @@ bool APIHandler::SetBasicOpt() {
         {CURLOPT_REDIR_PROTOCOLS_STR, "http,https", "redirect protocols"},
         // The names of headers are compared as they come, and HTTP/2 has them in lower case.
         {CURLOPT_HTTP_VERSION, static_cast<long>(CURL_HTTP_VERSION_1_1), "http version"},
-        {CURLOPT_BUFFERSIZE, kReceiveBuffer, "receive buffer"},
         {CURLOPT_UPLOAD_BUFFERSIZE, kUploadBuffer, "upload buffer"},
         // Handles work in several threads at once, and signals belong to the whole process.
         {CURLOPT_NOSIGNAL, 1L, "signals"},
@@ -125,6 +124,8 @@ bool APIHandler::SetBasicOpt() {
             return false;
         }
     }
+    // Refused, and as large as before, behind a transfer that ended before it had a connection.
+    curl_easy_setopt(curl_, CURLOPT_BUFFERSIZE, kReceiveBuffer);
     return true;
 }
 

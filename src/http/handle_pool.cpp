@@ -9,23 +9,21 @@ namespace ZYROCloud {
 
 namespace {
 
-using Lock = std::lock_guard<std::mutex>;
-
 /** Leaves nothing but connections, sessions, names and roots. False when that cannot be said. */
 bool Clean(CURL* curl) {
-    curl_easy_reset(curl);
-    // All of this outlives a reset. The cookie engine must go before its cookies can come back.
+    // All of this outlives a reset, and the list of cookie files would be lost in one.
     const bool cleared = curl_easy_setopt(curl, CURLOPT_SHARE, nullptr) == CURLE_OK &&
                          curl_easy_setopt(curl, CURLOPT_COOKIEFILE, nullptr) == CURLE_OK &&
                          curl_easy_setopt(curl, CURLOPT_HSTS_CTRL, 0L) == CURLE_OK &&
                          curl_easy_setopt(curl, CURLOPT_RESOLVE, nullptr) == CURLE_OK;
-    // So do the headers of the last answer, until a transfer begins. This one goes nowhere.
-    const bool begun = curl_easy_setopt(curl, CURLOPT_NOSIGNAL, 1L) == CURLE_OK &&
-                       curl_easy_setopt(curl, CURLOPT_URL, ":") == CURLE_OK &&
-                       curl_easy_perform(curl) == CURLE_URL_MALFORMAT;
+    curl_easy_reset(curl);
+    // So do the headers of the last answer, until there is another one: here it is an empty one.
+    const bool answered = curl_easy_setopt(curl, CURLOPT_NOSIGNAL, 1L) == CURLE_OK &&
+                          curl_easy_setopt(curl, CURLOPT_URL, "file:///dev/null") == CURLE_OK &&
+                          curl_easy_perform(curl) == CURLE_OK;
     curl_easy_reset(curl);
     // Closing a connection must not touch the signals of a process with several threads.
-    return curl_easy_setopt(curl, CURLOPT_NOSIGNAL, 1L) == CURLE_OK && cleared && begun;
+    return curl_easy_setopt(curl, CURLOPT_NOSIGNAL, 1L) == CURLE_OK && cleared && answered;
 }
 
 /** Connections say goodbye here, so the mutex is free. */
@@ -47,7 +45,7 @@ HandlePool* HandlePool::MakeInstance() {
     // A fork waits for the mutex, so that the child finds the list whole and the mutex its own.
     pthread_atfork([] { pool->mutex_.lock(); }, [] { pool->mutex_.unlock(); },
                    [] {
-                       pool->EnterChild();
+                       ++pool->process_;
                        pool->mutex_.unlock();
                    });
     return pool;
@@ -55,6 +53,18 @@ HandlePool* HandlePool::MakeInstance() {
 
 HandlePool::HandlePool(Time (*now)()) : now_(now) {
     idle_.reserve(kMostIdle);
+}
+
+/** The list, of which a child first sets aside what it has inherited. Not in the fork itself: no
+ * memory can be had there when another thread was just asking for some. */
+HandlePool::Access::Access(HandlePool& pool) : lock_(pool.mutex_) {
+    if (pool.idle_process_ != pool.process_) {
+        for (Waiting& each : pool.idle_) {
+            pool.inherited_.push_back(std::move(each.loan));
+        }
+        pool.idle_.clear();
+        pool.idle_process_ = pool.process_;
+    }
 }
 
 HandleLoan HandlePool::Borrow(HandleKey key) {
@@ -68,7 +78,7 @@ HandleLoan HandlePool::Borrow(HandleKey key) {
 }
 
 bool HandlePool::TakeKept(const HandleKey& key, HandleLoan& loan) {
-    const Lock lock(mutex_);
+    const Access access(*this);
     const auto last = std::find_if(idle_.rbegin(), idle_.rend(),
                                    [&key](const Waiting& each) { return each.loan.key == key; });
     const bool found = last != idle_.rend();
@@ -101,7 +111,7 @@ void HandlePool::GiveBack(HandleLoan loan) noexcept {
 
 /** `surplus` is what has no place: the handle itself, or the one that has waited longest. */
 void HandlePool::Keep(HandleLoan& loan, HandleLoan& surplus) {
-    const Lock lock(mutex_);
+    const Access access(*this);
     if (loan.epoch != epoch_) {
         surplus = std::move(loan);
         return;
@@ -114,12 +124,12 @@ void HandlePool::Keep(HandleLoan& loan, HandleLoan& surplus) {
 }
 
 bool HandlePool::IsInherited(const HandleLoan& loan) const {
-    const Lock lock(mutex_);
+    const std::lock_guard<std::mutex> lock(mutex_);
     return loan.process != process_;
 }
 
 void HandlePool::Abandon(HandleLoan loan) noexcept try {
-    const Lock lock(mutex_);
+    const Access access(*this);
     inherited_.push_back(std::move(loan));
 } catch (const std::exception&) {
     loan.curl = nullptr;  // lost, not closed
@@ -128,7 +138,7 @@ void HandlePool::Abandon(HandleLoan loan) noexcept try {
 void HandlePool::Empty() noexcept {
     HandleLoan loan;
     {
-        const Lock lock(mutex_);
+        const std::lock_guard<std::mutex> lock(mutex_);
         ++epoch_;
     }
     while (TakeAny(loan)) {
@@ -137,7 +147,7 @@ void HandlePool::Empty() noexcept {
 }
 
 bool HandlePool::TakeAny(HandleLoan& loan) {
-    const Lock lock(mutex_);
+    const Access access(*this);
     if (idle_.empty()) {
         return false;
     }
@@ -154,7 +164,7 @@ void HandlePool::CloseOld() noexcept {
 }
 
 bool HandlePool::TakeOld(HandleLoan& loan) {
-    const Lock lock(mutex_);
+    const Access access(*this);
     if (idle_.empty() || now_() - idle_.front().since < kLongestIdle) {
         return false;
     }
@@ -163,22 +173,9 @@ bool HandlePool::TakeOld(HandleLoan& loan) {
     return true;
 }
 
-size_t HandlePool::Idle() const {
-    const Lock lock(mutex_);
+size_t HandlePool::Idle() {
+    const Access access(*this);
     return idle_.size();
-}
-
-/** With the mutex held. */
-void HandlePool::EnterChild() noexcept {
-    ++process_;
-    try {
-        for (Waiting& each : idle_) {
-            inherited_.push_back(std::move(each.loan));
-        }
-    } catch (const std::exception&) {
-        // Lost, not closed.
-    }
-    idle_.clear();
 }
 
 }  // namespace ZYROCloud

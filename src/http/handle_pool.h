@@ -62,12 +62,21 @@ class HandlePool {
     bool IsInherited(const HandleLoan& loan) const;
     /** Closes all that wait, and those that are lent now as soon as they come back. */
     void Empty() noexcept;
-    size_t Idle() const;
+    size_t Idle();
 
   private:
     struct Waiting {
         HandleLoan loan;
         Time since;
+    };
+
+    /** Holds the mutex. */
+    class Access {
+      public:
+        explicit Access(HandlePool& pool);
+
+      private:
+        const std::lock_guard<std::mutex> lock_;
     };
 
     static HandlePool* MakeInstance();
@@ -77,14 +86,14 @@ class HandlePool {
     void CloseOld() noexcept;
     void Keep(HandleLoan& loan, HandleLoan& surplus);
     void Abandon(HandleLoan loan) noexcept;
-    void EnterChild() noexcept;
 
     Time (*now_)();
     mutable std::mutex mutex_;
     std::vector<Waiting> idle_;  ///< the longest waiting first
     std::vector<HandleLoan> inherited_;
     unsigned long process_ = 0;  ///< how many forks lie between the first process and this one
-    unsigned long epoch_ = 0;    ///< how often it was emptied
+    unsigned long idle_process_ = 0;  ///< to which the idle ones belong
+    unsigned long epoch_ = 0;         ///< how often it was emptied
 };
 
 }  // namespace ZYROCloud

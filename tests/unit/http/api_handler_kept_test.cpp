@@ -138,7 +138,7 @@ TEST_F(Kept, ConnectionsAreNotInheritedByProgramsThatThisProcessStarts) {
 // Forked children.
 
 TEST_F(Kept, AForkedChildMakesItsOwnConnectionAndLeavesThatOfTheParentAlone) {
-    const wire::WireServer server({Serve(3), Serve(2)});
+    const wire::WireServer server({Serve(3), Serve(1), Serve(1)});
     EXPECT_TRUE(Fetch(server.Url()));
     {
         Conversation<> lent;
@@ -183,15 +183,16 @@ TEST_F(Kept, AConnectionThatTheServerHasClosedIsReplacedWithoutARetry) {
     }
 }
 
-/** Far more than the sockets between the two hold. */
+/** More than the sockets between the two hold. */
 const std::string& LargeText() {
-    static const std::string text(size_t{16} << 20, 'x');
+    static const std::string text(7000000, 'x');
     return text;
 }
 
 /** Answers one request, and resets the connection in the middle of the next one. */
 Script DiesInTheBody() {
-    return {ReadRequest(), Send(Answer(200, "hello")), wire::ReadHead(), wire::Reset()};
+    return {ReadRequest(), Send(Answer(200, "hello")), wire::ReadHead(), wire::ReadBytes(1000),
+            wire::Reset()};
 }
 
 TEST_F(Kept, ABodyThatTheHandlerHoldsIsSentAgainWhenAnOldConnectionDiesUnderIt) {
@@ -203,7 +204,7 @@ TEST_F(Kept, ABodyThatTheHandlerHoldsIsSentAgainWhenAnOldConnectionDiesUnderIt) 
     EXPECT_TRUE(talk.Get(server.Url())) << seams::LogDump();
     EXPECT_EQ(talk.api.GetResponse(), "hello");
     EXPECT_EQ(server.Connections(), 2U);
-    EXPECT_THAT(server.Received().back(), HasSubstr("text=" + LargeText()));
+    EXPECT_TRUE(server.Received().back().find("text=" + LargeText()) != std::string::npos);
     EXPECT_THAT(seams::Sleeps(), IsEmpty());
 }
 
@@ -219,6 +220,7 @@ TEST_F(Kept, ABodyThatCannotBeReadAgainFailsWithItsOldConnection) {
     talk.api.AddHeader(Parsed(R"({"Expect":""})"));
     EXPECT_TRUE(talk.api.SetReadFunAndData(Endless, nullptr));
     EXPECT_TRUE(talk.api.SetUploadOpt(true));
+    EXPECT_TRUE(talk.api.SetUploadSize(static_cast<long long>(LargeText().size())));
     EXPECT_FALSE(talk.Get(server.Url()));
     EXPECT_THAT(talk.Curl(), testing::AnyOf(CURLE_SEND_ERROR, CURLE_SEND_FAIL_REWIND));
     EXPECT_NE(talk.Code(), VFS_ERR_NONE);
