@@ -67,9 +67,8 @@ bool ByFreshDrivers(const Target& target) {
     return WithDriver([&](Cloud& driver) {
                return driver.CreateFolder("folders/0", target.folder, Json::objectValue);
            }) &&
-           WithDriver([&](Cloud& driver) {
-               return driver.Rename("files/" + target.file, target.name);
-           }) &&
+           WithDriver(
+               [&](Cloud& driver) { return driver.Rename("files/" + target.file, target.name); }) &&
            WithDriver([&](Cloud& driver) { return driver.Delete("files/" + target.file); });
 }
 

@@ -1,4 +1,5 @@
-/** A simulated Box over TLS, with a certificate that the machine trusts, for benchmarks of calls. */
+/** A simulated Box over TLS, with a certificate that the machine trusts, for benchmarks of calls.
+ */
 #ifndef ZYROVFS_BENCH_TLS_BOX_H
 #define ZYROVFS_BENCH_TLS_BOX_H
 

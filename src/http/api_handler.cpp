@@ -40,12 +40,17 @@ APIHandler::APIHandler(CURLSH* share)
       request_(Json::objectValue),
       response_header_(Json::objectValue),
       share_(share) {
-    Lend(handle_key::ForServices());
+    Lend(ServiceKey());
 }
 
 APIHandler::~APIHandler() {
     HandlePool::Instance().GiveBack(std::move(loan_));
     delete error_handler_;
+}
+
+/** Sessions of its own stay so: a share would push them out. */
+HandleKey APIHandler::ServiceKey() const {
+    return handle_key::ForServices(loan_.own_sessions ? nullptr : share_);
 }
 
 void APIHandler::Lend(HandleKey key) {
@@ -60,16 +65,16 @@ void APIHandler::Lend(HandleKey key) {
 
 CURL* APIHandler::GetCurlHandler() {
     if (curl_ != nullptr && HandlePool::Instance().IsInherited(loan_)) {
-        Lend(handle_key::ForServices());
+        Lend(handle_key::ForServices(share_));
     }
     return curl_;
 }
 
 bool APIHandler::Init() {
-    wanted_ = handle_key::ForServices();
     if (GetCurlHandler() == nullptr) {
-        Lend(wanted_);
+        Lend(ServiceKey());
     }
+    wanted_ = ServiceKey();
     Reset();
     return SetBasicOpt();
 }

@@ -176,6 +176,7 @@ class APIHandler {
     bool BuildHeaderParam(curl_slist** list);
 
   private:
+    HandleKey ServiceKey() const;
     void Lend(HandleKey key);
     bool ChooseConnections();
     bool SetBasicOpt();

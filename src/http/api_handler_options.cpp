@@ -104,7 +104,7 @@ bool APIHandler::SetBasicOpt() {
         {CURLOPT_HEADERDATA, &response_header_, "header data"},
         {CURLOPT_WRITEFUNCTION, Pointer(WriteToStrBuf), "write function"},
         {CURLOPT_WRITEDATA, &response_, "write data"},
-        {CURLOPT_SHARE, share_, "share"},
+        {CURLOPT_SHARE, wanted_.share, "share"},
         {CURLOPT_FAILONERROR, return_on_error_ ? 1L : 0L, "fail on error"},
         {CURLOPT_FOLLOWLOCATION, 1L, "follow location"},
         {CURLOPT_DNS_CACHE_TIMEOUT, kDnsCacheTime, "dns cache timeout"},
@@ -135,8 +135,6 @@ bool APIHandler::SetBasicOpt() {
  * request.
  */
 bool APIHandler::ChooseConnections() {
-    // The common store keeps its sessions however long the roots behind them have changed.
-    static const std::string first_roots = handle_key::ForServices().trust;
     if (HandlePool::Instance().IsInherited(loan_)) {
         LOG_ERROR("The connections are those of another process");
         return false;
@@ -145,8 +143,9 @@ bool APIHandler::ChooseConnections() {
     loan_.mixed = loan_.mixed || (loan_.used && loan_.key != wanted_);
     if (!loan_.used) {
         loan_.key = wanted_;
-        loan_.used = true;
     }
+    loan_.used = true;
+    loan_.own_sessions = loan_.own_sessions || wanted_.share == nullptr;
     const Option options[] = {
         // libcurl keeps parsed roots, but not if there is a directory, too; in this one it finds
         // nothing.
@@ -161,8 +160,7 @@ bool APIHandler::ChooseConnections() {
             return false;
         }
     }
-    return !wanted_.HasRoots() || wanted_.trust == first_roots ||
-           Taken(curl_easy_setopt(curl_, CURLOPT_SHARE, nullptr), "share");
+    return true;
 }
 
 bool APIHandler::SetWriteFunAndData(CurlCallback function, void* data) {
@@ -258,6 +256,9 @@ bool APIHandler::SetShareCurlHandler(void* share) {
         return false;
     }
     share_ = share;
+    if (loan_.own_sessions) {
+        Lend(handle_key::ForServices(share_));
+    }
     return true;
 }
 

@@ -169,7 +169,7 @@ bool APIHandler::SetVFSURL(const std::string& url) {
 
 void APIHandler::ExpectVFSURL(const std::string& url, const std::string& user,
                               const std::string& password) {
-    HandleKey key = handle_key::ForServices();
+    HandleKey key = handle_key::ForServices(share_);
     if (IsDavs(url)) {
         const std::string path = CertificatePath(url);
         if (!Utils::isTrustRootCA(path.c_str())) {

@@ -17,7 +17,6 @@ using namespace ZYROVFS;
 namespace {
 
 constexpr char kPin[] = "pin ";
-constexpr char kRoots[] = "roots ";
 
 /** Where libcurl finds its proxies. It compares the hosts of two proxies, but not who logs in. */
 constexpr const char* kProxyVariables[] = {"http_proxy", "https_proxy", "HTTPS_PROXY",
@@ -41,6 +40,10 @@ std::string Identity(const std::string& path) {
     return text;
 }
 
+std::string Roots() {
+    return "roots " + Identity(paths::kCaBundle);
+}
+
 std::string EnvironmentProxies() {
     std::string text;
     for (const char* name : kProxyVariables) {
@@ -55,22 +58,21 @@ std::string EnvironmentProxies() {
 }  // namespace
 
 bool HandleKey::operator==(const HandleKey& other) const {
-    return std::tie(user, trust, credentials, route) ==
-           std::tie(other.user, other.trust, other.credentials, other.route);
+    return std::tie(user, trust, credentials, route, share) ==
+           std::tie(other.user, other.trust, other.credentials, other.route, other.share);
 }
 
 bool HandleKey::IsPinned() const {
     return trust.compare(0, sizeof kPin - 1, kPin) == 0;
 }
 
-bool HandleKey::HasRoots() const {
-    return trust.compare(0, sizeof kRoots - 1, kRoots) == 0;
-}
-
 namespace handle_key {
 
-HandleKey ForServices() {
-    return {GetActorUID(), kRoots + Identity(paths::kCaBundle), "", EnvironmentProxies()};
+HandleKey ForServices(const void* share) {
+    // The common store keeps its sessions, however long the roots behind them have changed.
+    static const std::string first_roots = Roots();
+    const std::string roots = Roots();
+    return {GetActorUID(), roots, "", EnvironmentProxies(), roots == first_roots ? share : nullptr};
 }
 
 std::string Pin(const std::string& path, const char* text) {

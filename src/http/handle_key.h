@@ -15,19 +15,18 @@ struct HandleKey {
     std::string trust;        ///< how servers are checked, and what that depends on, as it is now
     std::string credentials;  ///< of the account, as a digest: some are proved once a connection
     std::string route;        ///< proxies, their credentials included
+    const void* share = nullptr;  ///< the store that its TLS sessions are in; null for its own
 
     bool operator==(const HandleKey& other) const;
     bool operator!=(const HandleKey& other) const { return !(*this == other); }
     /** The certificate must be the one that the user has saved. */
     bool IsPinned() const;
-    /** It must lead to a root of the CA bundle. */
-    bool HasRoots() const;
 };
 
 namespace handle_key {
 
 /** For the services: the acting user, the CA bundle, no account, the environment's proxies. */
-HandleKey ForServices();
+HandleKey ForServices(const void* share = nullptr);
 
 /** `trust` for exactly the certificate `text`, saved as `path`; null for none, which no server
  * fits. */

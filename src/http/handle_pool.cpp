@@ -12,8 +12,7 @@ namespace {
 /** Leaves nothing but connections, sessions, names and roots. False when that cannot be said. */
 bool Clean(CURL* curl) {
     // All of this outlives a reset, and the list of cookie files would be lost in one.
-    const bool cleared = curl_easy_setopt(curl, CURLOPT_SHARE, nullptr) == CURLE_OK &&
-                         curl_easy_setopt(curl, CURLOPT_COOKIEFILE, nullptr) == CURLE_OK &&
+    const bool cleared = curl_easy_setopt(curl, CURLOPT_COOKIEFILE, nullptr) == CURLE_OK &&
                          curl_easy_setopt(curl, CURLOPT_HSTS_CTRL, 0L) == CURLE_OK &&
                          curl_easy_setopt(curl, CURLOPT_RESOLVE, nullptr) == CURLE_OK;
     curl_easy_reset(curl);
@@ -21,9 +20,12 @@ bool Clean(CURL* curl) {
     const bool answered = curl_easy_setopt(curl, CURLOPT_NOSIGNAL, 1L) == CURLE_OK &&
                           curl_easy_setopt(curl, CURLOPT_URL, "file:///dev/null") == CURLE_OK &&
                           curl_easy_perform(curl) == CURLE_OK;
+    // Behind that transfer, which would make a store of sessions that the next share pushes out.
+    const bool unshared = curl_easy_setopt(curl, CURLOPT_SHARE, nullptr) == CURLE_OK;
     curl_easy_reset(curl);
     // Closing a connection must not touch the signals of a process with several threads.
-    return curl_easy_setopt(curl, CURLOPT_NOSIGNAL, 1L) == CURLE_OK && cleared && answered;
+    return curl_easy_setopt(curl, CURLOPT_NOSIGNAL, 1L) == CURLE_OK && cleared && answered &&
+           unshared;
 }
 
 /** Connections say goodbye here, so the mutex is free. */

@@ -29,8 +29,9 @@ struct HandleLoan {
     CURL* curl = nullptr;  ///< null when libcurl has none to give
     HandleKey key;         ///< what it is for; behind a transfer, what its connections stand for
     bool used = false;     ///< a transfer was made with it
-    bool mixed = false;    ///< transfers were made for another key, too
-    bool keep = true;      ///< unless mixed; logins at file servers end with their user
+    bool own_sessions = false;  ///< it has a store of its own, which libcurl would lose for a share
+    bool mixed = false;         ///< transfers were made for another key, too
+    bool keep = true;           ///< unless mixed; logins at file servers end with their user
     /** Certificates that its connections check against, as long as they are open. */
     std::vector<ZYROVFS::UniqueCString> texts;
 
@@ -91,7 +92,7 @@ class HandlePool {
     mutable std::mutex mutex_;
     std::vector<Waiting> idle_;  ///< the longest waiting first
     std::vector<HandleLoan> inherited_;
-    unsigned long process_ = 0;  ///< how many forks lie between the first process and this one
+    unsigned long process_ = 0;       ///< how many forks lie between the first process and this one
     unsigned long idle_process_ = 0;  ///< to which the idle ones belong
     unsigned long epoch_ = 0;         ///< how often it was emptied
 };

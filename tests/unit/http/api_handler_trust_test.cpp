@@ -8,6 +8,14 @@ namespace {
 
 constexpr uid_t kBob = 4568;
 
+/** A server whose connections stay. */
+tls::ServerOptions Open(const tls::Identity& identity) {
+    tls::ServerOptions options;
+    options.identity = identity;
+    options.manner = tls::Manner::kKeepOpen;
+    return options;
+}
+
 class Trust : public SslPeer {
   protected:
     void SetUp() override {
@@ -52,7 +60,7 @@ class Trust : public SslPeer {
 };
 
 TEST_F(Trust, AKeptConnectionOfAPinnedServerIsUsedAgainWhileThePinStands) {
-    const tls::TlsServer server(own_);
+    const tls::TlsServer server(Open(own_));
     Save(server, own_.certificate);
     EXPECT_TRUE(Fetch(server)) << seams::LogDump();
     APIHandler api(share_);
@@ -63,7 +71,7 @@ TEST_F(Trust, AKeptConnectionOfAPinnedServerIsUsedAgainWhileThePinStands) {
 
 TEST_F(Trust, APinThatWasRemovedEndsTheTrust) {
     for (const bool expect : {true, false}) {
-        const tls::TlsServer server(own_);
+        const tls::TlsServer server(Open(own_));
         Save(server, own_.certificate);
         APIHandler api(share_);
         EXPECT_TRUE(Fetch(api, server)) << seams::LogDump();
@@ -77,7 +85,7 @@ TEST_F(Trust, APinThatWasRemovedEndsTheTrust) {
 
 TEST_F(Trust, APinThatWasChangedEndsTheTrust) {
     for (const bool expect : {true, false}) {
-        const tls::TlsServer server(own_);
+        const tls::TlsServer server(Open(own_));
         Save(server, own_.certificate);
         APIHandler api(share_);
         EXPECT_TRUE(Fetch(api, server)) << seams::LogDump();
@@ -94,7 +102,7 @@ TEST_F(Trust, APinThatWasChangedEndsTheTrust) {
 
 TEST_F(Trust, APinOfOneUserIsNoPinOfAnother) {
     for (const bool expect : {true, false}) {
-        const tls::TlsServer server(own_);
+        const tls::TlsServer server(Open(own_));
         Save(server, own_.certificate);
         APIHandler api(share_);
         EXPECT_TRUE(Fetch(api, server));
@@ -108,7 +116,7 @@ TEST_F(Trust, APinOfOneUserIsNoPinOfAnother) {
 }
 
 TEST_F(Trust, APinnedServerIsNotTrustedByTheServices) {
-    const tls::TlsServer server(own_);
+    const tls::TlsServer server(Open(own_));
     Save(server, own_.certificate);
     APIHandler api(share_);
     EXPECT_TRUE(Fetch(api, server));
@@ -130,7 +138,7 @@ bool Ask(const tls::TlsServer& server, CURLSH* share) {
 }
 
 TEST_F(Trust, ARootThatWasRemovedFromTheBundleEndsTheTrust) {
-    const tls::TlsServer server(signed_);
+    const tls::TlsServer server(Open(signed_));
     APIHandler held(share_);
     held.SetErrorHandler(new BoxErrorHandler);
     EXPECT_TRUE(held.Init() && held.SetURL(server.Url(), false) && held.Process(0));
@@ -145,14 +153,14 @@ TEST_F(Trust, ARootThatWasRemovedFromTheBundleEndsTheTrust) {
 }
 
 TEST_F(Trust, ServicesResumeTheSessionsOfOneAnother) {
-    const tls::TlsServer server(signed_);
+    const tls::TlsServer server(Open(signed_));
     EXPECT_TRUE(Ask(server, share_));
     const std::vector<long> cached = curl_seam::Values(CURLOPT_SSL_SESSIONID_CACHE);
     EXPECT_THAT(cached, ElementsAre(1));
 }
 
 TEST_F(Trust, TheParsedBundleIsKeptSinceNoDirectoryStandsBesideIt) {
-    const tls::TlsServer server(signed_);
+    const tls::TlsServer server(Open(signed_));
     EXPECT_TRUE(Ask(server, share_));
     const std::vector<long> paths = curl_seam::Values(CURLOPT_CAPATH);
     ASSERT_EQ(paths.size(), 2U);
@@ -161,7 +169,7 @@ TEST_F(Trust, TheParsedBundleIsKeptSinceNoDirectoryStandsBesideIt) {
 }
 
 TEST_F(Trust, AServerThatHasGoneDoesNotKillTheProcessWhenItsConnectionIsClosed) {
-    tls::TlsServer server(signed_);
+    tls::TlsServer server(Open(signed_));
     EXPECT_TRUE(Ask(server, share_));
     EXPECT_EQ(HandlePool::Instance().Idle(), 1U);
     server.Restart(signed_);

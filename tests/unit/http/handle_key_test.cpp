@@ -21,7 +21,6 @@ class Key : public scratch::ScratchTest {
 
 TEST_F(Key, TwoServicesOfOneUserHaveTheSame) {
     EXPECT_TRUE(handle_key::ForServices() == handle_key::ForServices());
-    EXPECT_TRUE(handle_key::ForServices().HasRoots());
     EXPECT_FALSE(handle_key::ForServices().IsPinned());
     EXPECT_EQ(handle_key::ForServices().user, 4567U);
 }
@@ -33,10 +32,12 @@ TEST_F(Key, AnotherUserHasAnother) {
 }
 
 TEST_F(Key, AnotherBundleInThePlaceOfTheFirstIsAnother) {
-    const HandleKey before = handle_key::ForServices();
+    const HandleKey before = handle_key::ForServices(this);
     const std::string text = scratch::Text(paths::kCaBundle);
     scratch::PutText(paths::kCaBundle, text + "\n");
     EXPECT_TRUE(handle_key::ForServices() != before);
+    EXPECT_EQ(before.share, this);
+    EXPECT_EQ(handle_key::ForServices(this).share, nullptr) << "its sessions are of the first";
     scratch::PutText(paths::kCaBundle, text);
 }
 
@@ -52,7 +53,6 @@ TEST_F(Key, APinIsItsPlaceAndItsText) {
     HandleKey key = handle_key::ForServices();
     key.trust = handle_key::Pin("/ssl/nas", "text");
     EXPECT_TRUE(key.IsPinned());
-    EXPECT_FALSE(key.HasRoots());
     EXPECT_EQ(key.trust, handle_key::Pin("/ssl/nas", "text"));
     EXPECT_NE(key.trust, handle_key::Pin("/ssl/nas", "renewed"));
     EXPECT_NE(key.trust, handle_key::Pin("/ssl/other", "text"));

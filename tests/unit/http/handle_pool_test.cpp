@@ -16,7 +16,7 @@ HandlePool::Time Now() {
 }
 
 HandleKey Key(unsigned int user = 1) {
-    return {user, "roots", "", ""};
+    return {user, "roots", "", "", nullptr};
 }
 
 class Pool : public testing::Test {
@@ -40,10 +40,11 @@ class Pool : public testing::Test {
 
 TEST_F(Pool, AHandleIsLentAgainForTheSameKeyAndForNoOther) {
     CURL* const first = Pass(Key());
-    const HandleKey others[] = {{2, "roots", "", ""},
-                                {1, "pin /ssl/nas\ntext", "", ""},
-                                {1, "roots", "amy", ""},
-                                {1, "roots", "", "http_proxy=http://proxy\n"}};
+    const HandleKey others[] = {{2, "roots", "", "", nullptr},
+                                {1, "pin /ssl/nas\ntext", "", "", nullptr},
+                                {1, "roots", "amy", "", nullptr},
+                                {1, "roots", "", "http_proxy=http://proxy\n", nullptr},
+                                {1, "roots", "", "", &pool_}};
     for (const HandleKey& key : others) {
         HandleLoan loan = pool_.Borrow(key);
         EXPECT_NE(loan.curl, first);

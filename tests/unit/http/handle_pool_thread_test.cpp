@@ -12,7 +12,7 @@ namespace ZYROCloud {
 namespace {
 
 HandleKey Key(unsigned int user = 1) {
-    return {user, "roots", "", ""};
+    return {user, "roots", "", "", nullptr};
 }
 
 TEST(PoolThreads, SeveralThreadsBorrowAtOnceAndNoneGetsAHandleOfAnother) {
