@@ -21,10 +21,10 @@ constexpr time_t kLongestWait = 90;
 constexpr int kMostYields = 64;
 constexpr int kLeastYields = 4;
 
-// libcurl hands over 16 KiB at a time, and a reader that is late gets several of these at once. A
-// source that comes in smaller pieces than a page is slow, and has each of them waited for.
+// A late reader gets several chunks at once, as long as they come as large as libcurl makes them: a
+// source with smaller ones is slower than the target, and each of its chunks has the slot alone.
 constexpr size_t kMostInSlot = 131072;
-constexpr size_t kLeastAppended = 4096;
+constexpr size_t kLeastAppended = CURL_MAX_WRITE_SIZE;
 
 Patience writer;
 Patience reader;

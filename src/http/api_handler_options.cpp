@@ -20,6 +20,7 @@ constexpr long kKeepAliveTime = 30;
 constexpr long kDnsCacheTime = 269;
 constexpr long kMostRedirects = 30;
 constexpr long kRootsTime = 300;
+constexpr char kNoDirectory[] = "/dev/null/";
 
 // Measured over loopback into a file: a quarter less of the processor than libcurl's own 16 KiB,
 // and a twelfth less than 128 KiB; more gives nothing.
@@ -131,29 +132,27 @@ bool APIHandler::SetBasicOpt() {
 
 /**
  * What libcurl may use again. It compares what it knows of; users, pins and what stands in the
- * files behind them it does not. A handle that is used for two keys makes a connection for each
- * request.
+ * files behind them it does not.
  */
 bool APIHandler::ChooseConnections() {
     if (HandlePool::Instance().IsInherited(loan_)) {
         LOG_ERROR("The connections are those of another process");
         return false;
     }
-    const bool same_trust = !loan_.used || loan_.key.trust == wanted_.trust;
     loan_.mixed = loan_.mixed || (loan_.used && loan_.key != wanted_);
-    if (!loan_.used) {
-        loan_.key = wanted_;
-    }
+    loan_.key = wanted_;
     loan_.used = true;
     loan_.own_sessions = loan_.own_sessions || wanted_.share == nullptr;
+    const bool sessions = !wanted_.IsPinned() && !(loan_.mixed && loan_.own_sessions);
+    // libcurl keeps parsed roots, but not if there is a directory, too, and in the one that is set
+    // it finds nothing. Directories are among what it compares, so one that cannot be keeps a
+    // redirect of this request off the connections of others.
+    const std::string label = loan_.mixed ? kNoDirectory + handle_key::Label(wanted_) : "";
     const Option options[] = {
-        // libcurl keeps parsed roots, but not if there is a directory, too; in this one it finds
-        // nothing.
-        {CURLOPT_CAPATH, nullptr, "ca path"},
-        {CURLOPT_CA_CACHE_TIMEOUT, loan_.mixed ? 0L : kRootsTime, "roots"},
-        {CURLOPT_SSL_SESSIONID_CACHE, same_trust && !wanted_.IsPinned() ? 1L : 0L, "sessions"},
+        {CURLOPT_CAPATH, loan_.mixed ? label.c_str() : nullptr, "ca path"},
         {CURLOPT_FRESH_CONNECT, loan_.mixed ? 1L : 0L, "fresh connect"},
-        {CURLOPT_FORBID_REUSE, loan_.mixed ? 1L : 0L, "forbid reuse"},
+        {CURLOPT_CA_CACHE_TIMEOUT, kRootsTime, "roots"},
+        {CURLOPT_SSL_SESSIONID_CACHE, sessions ? 1L : 0L, "sessions"},
     };
     for (const Option& row : options) {
         if (!Taken(Set(curl_, row), row.what)) {

@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 
 #include <cstdlib>
+#include <initializer_list>
 #include <stdexcept>
 #include <tuple>
 
@@ -55,6 +56,27 @@ std::string EnvironmentProxies() {
     return text;
 }
 
+/** Of texts without NUL, in digits. */
+std::string Digest(std::initializer_list<std::string> texts) {
+    std::string all;
+    for (const std::string& text : texts) {
+        all += text;
+        all += '\0';
+    }
+    unsigned char digest[EVP_MAX_MD_SIZE];
+    unsigned int length = 0;
+    if (EVP_Digest(all.data(), all.size(), digest, &length, EVP_sha256(), nullptr) != 1) {
+        throw std::runtime_error("no digest");
+    }
+    constexpr char kDigits[] = "0123456789abcdef";
+    std::string hex;
+    for (unsigned int i = 0; i < length; ++i) {
+        hex += kDigits[digest[i] >> 4];
+        hex += kDigits[digest[i] & 15];
+    }
+    return hex;
+}
+
 }  // namespace
 
 bool HandleKey::operator==(const HandleKey& other) const {
@@ -88,15 +110,11 @@ std::string Direct() {
 }
 
 std::string Credentials(const std::string& user, const std::string& password) {
-    std::string both = user;
-    both += '\0';
-    both += password;
-    unsigned char digest[EVP_MAX_MD_SIZE];
-    unsigned int length = 0;
-    if (EVP_Digest(both.data(), both.size(), digest, &length, EVP_sha256(), nullptr) != 1) {
-        throw std::runtime_error("no digest");
-    }
-    return std::string(reinterpret_cast<const char*>(digest), length);
+    return Digest({user, password});
+}
+
+std::string Label(const HandleKey& key) {
+    return Digest({std::to_string(key.user), key.trust, key.credentials, key.route});
 }
 
 }  // namespace handle_key

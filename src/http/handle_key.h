@@ -36,6 +36,8 @@ std::string KnownHosts(const std::string& path);
 /** `route` past all proxies. */
 std::string Direct();
 std::string Credentials(const std::string& user, const std::string& password);
+/** One word for a key, by which keys can be told apart. */
+std::string Label(const HandleKey& key);
 
 }  // namespace handle_key
 

@@ -26,12 +26,12 @@ namespace ZYROCloud {
 
 /** A handle while it is lent. */
 struct HandleLoan {
-    CURL* curl = nullptr;  ///< null when libcurl has none to give
-    HandleKey key;         ///< what it is for; behind a transfer, what its connections stand for
-    bool used = false;     ///< a transfer was made with it
+    CURL* curl = nullptr;       ///< null when libcurl has none to give
+    HandleKey key;              ///< what it is for, or was used for last
+    bool used = false;          ///< a transfer was made with it
+    bool mixed = false;         ///< transfers were made for other keys, too; it is not kept
+    bool keep = true;           ///< logins at file servers end with their user
     bool own_sessions = false;  ///< it has a store of its own, which libcurl would lose for a share
-    bool mixed = false;         ///< transfers were made for another key, too
-    bool keep = true;           ///< unless mixed; logins at file servers end with their user
     /** Certificates that its connections check against, as long as they are open. */
     std::vector<ZYROVFS::UniqueCString> texts;
 

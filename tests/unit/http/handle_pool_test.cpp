@@ -67,8 +67,12 @@ TEST_F(Pool, AHandleIsLentToOneAtATimeAndTheLastOneBackIsTheFirstOut) {
     EXPECT_EQ(Pass(Key()), last);
 }
 
-TEST_F(Pool, AHandleThatWasUsedForTwoKeysIsClosed) {
+TEST_F(Pool, AHandleThatIsNotToBeKeptOrWasUsedForTwoKeysIsClosed) {
     HandleLoan loan = pool_.Borrow(Key());
+    loan.keep = false;
+    pool_.GiveBack(std::move(loan));
+    EXPECT_EQ(pool_.Idle(), 0U);
+    loan = pool_.Borrow(Key());
     loan.mixed = true;
     pool_.GiveBack(std::move(loan));
     EXPECT_EQ(pool_.Idle(), 0U);
