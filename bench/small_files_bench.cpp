@@ -5,15 +5,11 @@
 #include <curl/curl.h>
 #include <json/value.h>
 
-#include <cstdio>
-#include <filesystem>
-#include <fstream>
 #include <memory>
 #include <string>
 #include <vector>
 
-#include "support/cloudsim/cloudsim.h"
-#include "support/test_certs.h"
+#include "tls_box.h"
 #include "zyrovfs/cloud_utils.h"
 
 namespace {
@@ -22,46 +18,24 @@ using ZYROCloud::Cloud;
 
 constexpr size_t kFiles = 2000;
 constexpr long long kSize = 4096;
-constexpr const char* kBundle = "/etc/ssl/certs/ca-certificates.crt";
-constexpr const char* kServiceConfig = "/usr/zyro/etc/zyrovfs/cloud.conf";
 
-/** The simulated service with its files, and a certificate that the machine trusts. */
+/** The simulated service with its files. */
 class Account {
   public:
-    Account() : service_(Options()) {
-        cloudsim::Account& amy = service_.AddAccount("amy@example.com");
+    Account() {
+        cloudsim::Account& amy = box_.Amy();
         amy.AddMany(amy.Root(), kFiles, kSize);
-        token_ = amy.IssueTokens(86400).access_token;
         for (const cloudsim::Item& item : amy.List(amy.Root())) {
-            urls_.push_back(service_.ApiHost() + "/2.0/files/" + item.id + "/content");
+            urls_.push_back(box_.Host() + "/2.0/files/" + item.id + "/content");
         }
-        std::filesystem::create_directories("/usr/zyro/etc/zyrovfs");
-        std::ofstream(kServiceConfig)
-            << "{\"hosts\":{\"BoxApiHost\":\"" << service_.ApiHost() << "\"}}";
-        std::filesystem::permissions(kServiceConfig, std::filesystem::perms(0640));
     }
 
     const std::vector<std::string>& Urls() const { return urls_; }
-    const std::string& Token() const { return token_; }
-    /** So far, of all that came. */
-    size_t Connections() const { return service_.Journal().Connections(); }
+    const std::string& Token() const { return box_.Token(); }
+    size_t Connections() const { return box_.Connections(); }
 
   private:
-    static cloudsim::BoxOptions Options() {
-        tls::CertSpec spec;
-        spec.dns_names = {"localhost", "upload.localhost", "dl.localhost"};
-        const tls::Identity authority = tls::MakeAuthority("benchmark authority");
-        const tls::Identity server = tls::Make(spec, &authority);
-        std::ofstream(kBundle, std::ios::app) << authority.certificate;
-        cloudsim::BoxOptions options;
-        options.certificate = server.certificate;
-        options.key = server.key;
-        options.journal_hashes = false;
-        return options;
-    }
-
-    cloudsim::BoxService service_;
-    std::string token_;
+    bench::TlsBox box_;
     std::vector<std::string> urls_;
 };
 
@@ -84,7 +58,7 @@ void SmallFiles(benchmark::State& state) {
     const size_t before = account.Connections();
     Json::Value profile;
     profile["access_token"] = account.Token();
-    profile["server_id"] = "box://amy@example.com";
+    profile["server_id"] = bench::TlsBox::kServerId;
     char buffer[kSize + 1];
     for (auto _ : state) {
         const std::unique_ptr<Cloud> box(

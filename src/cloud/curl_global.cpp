@@ -135,6 +135,7 @@ void Cloud::CleanupCurlGlobal() {
     if (!_gblInitCurlGlobal) {
         return;
     }
+    HandlePool::Instance().Empty();
     curl_global_cleanup();
     // A share that drivers still hold is not taken from them.
     if (share_lives && curl_share_cleanup(_gShare_handle) == CURLSHE_OK) {

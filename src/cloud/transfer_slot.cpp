@@ -21,6 +21,11 @@ constexpr time_t kLongestWait = 90;
 constexpr int kMostYields = 64;
 constexpr int kLeastYields = 4;
 
+// A late reader gets several chunks at once, as long as they come as large as libcurl makes them: a
+// source with smaller ones is slower than the target, and each of its chunks has the slot alone.
+constexpr size_t kMostInSlot = 131072;
+constexpr size_t kLeastAppended = CURL_MAX_WRITE_SIZE;
+
 Patience writer;
 Patience reader;
 
@@ -64,7 +69,22 @@ void TakeLength(void* curl) {
 
 enum Room { kRoom, kNoRoom, kNotWanted };
 
-Room WaitForRoom(time_t deadline, unsigned long long& done) {
+/** Whether a chunk fits behind what waits in the slot, of which nothing has been taken yet. */
+bool MayAppend(size_t size) {
+    return transfer.slot_state == kSlotFull && transfer.slot_offset == 0 &&
+           size >= kLeastAppended && transfer.slot_length + size <= kMostInSlot;
+}
+
+bool IsThereRoomBehind(size_t size, unsigned long long& done) {
+    const SlotLock lock;
+    done = transfer.bytes_total - transfer.bytes_left;
+    return MayAppend(size);
+}
+
+Room WaitForRoom(size_t size, time_t deadline, unsigned long long& done) {
+    if (IsThereRoomBehind(size, done)) {
+        return kRoom;
+    }
     writer.Await(kSlotFull);
     SlotLock lock;
     if (transfer.slot_state == kSlotAborted) {
@@ -81,17 +101,23 @@ Room WaitForRoom(time_t deadline, unsigned long long& done) {
     return transfer.slot_state == kUploadDone ? kNoRoom : kRoom;
 }
 
-bool Put(const char* data, size_t size) {
+bool Put(const char* data, size_t size, time_t deadline) {
     SlotLock lock;
+    const bool append = MayAppend(size);
+    // The reader may just have begun with what the chunk was to stand behind.
+    if (!append && !lock.WaitWhile(kSlotFull, transfer.slot_free_cond, deadline)) {
+        return false;
+    }
     if (transfer.slot_state == kSlotAborted || transfer.slot_state == kUploadDone) {
         return false;
     }
-    if (!GrowSlot(size + 1)) {
+    const size_t before = append ? transfer.slot_length : 0;
+    if (!GrowSlot((append ? kMostInSlot : size) + 1)) {
         LOG_ERROR("Alloc Memory Fail");
         return false;
     }
-    memcpy(transfer.slot_buffer, data, size);
-    transfer.slot_length = size;
+    memcpy(transfer.slot_buffer + before, data, size);
+    transfer.slot_length = before + size;
     transfer.slot_offset = 0;
     // The failure result is a number like any other: a chunk of this size is taken for a failed
     // one and ends the copy.
@@ -264,7 +290,7 @@ size_t CopyWriteCallback(char* data, size_t size, size_t count, void* opaque) {
         return FailWrite();
     }
     unsigned long long done = 0;
-    const Room room = WaitForRoom(deadline, done);
+    const Room room = WaitForRoom(n, deadline, done);
     if (room == kNotWanted || n == 0) {
         return 0;
     }
@@ -272,7 +298,7 @@ size_t CopyWriteCallback(char* data, size_t size, size_t count, void* opaque) {
         return FailWrite();
     }
     LimitReceiving(n, done, context->curl);
-    if (!Put(data, n)) {
+    if (!Put(data, n, deadline)) {
         return FailWrite();
     }
     transfer.answer.received += n;

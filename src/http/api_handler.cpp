@@ -5,8 +5,8 @@
 
 #include <algorithm>
 #include <climits>
-#include <cstdlib>
 #include <cstring>
+#include <utility>
 
 #include "core/json.h"
 #include "core/log.h"
@@ -36,21 +36,45 @@ bool IsInterim(CURL* curl, long status) {
 }  // namespace
 
 APIHandler::APIHandler(CURLSH* share)
-    : curl_(curl_easy_init()),
+    : curl_(nullptr),
       request_(Json::objectValue),
       response_header_(Json::objectValue),
-      share_(share) {}
+      share_(share) {
+    Lend(ServiceKey());
+}
 
 APIHandler::~APIHandler() {
-    curl_easy_cleanup(curl_);
+    HandlePool::Instance().GiveBack(std::move(loan_));
     delete error_handler_;
-    free(cert_data_);
+}
+
+/** Sessions of its own stay so: a share would push them out. */
+HandleKey APIHandler::ServiceKey() const {
+    return handle_key::ForServices(loan_.own_sessions ? nullptr : share_);
+}
+
+void APIHandler::Lend(HandleKey key) {
+    HandlePool& pool = HandlePool::Instance();
+    wanted_ = key;
+    curl_ = nullptr;
+    cert_data_ = nullptr;
+    pool.GiveBack(std::exchange(loan_, HandleLoan()));
+    loan_ = pool.Borrow(std::move(key));
+    curl_ = loan_.curl;
+}
+
+CURL* APIHandler::GetCurlHandler() {
+    if (curl_ != nullptr && HandlePool::Instance().IsInherited(loan_)) {
+        Lend(handle_key::ForServices(share_));
+    }
+    return curl_;
 }
 
 bool APIHandler::Init() {
-    if (curl_ == nullptr) {
-        curl_ = curl_easy_init();
+    if (GetCurlHandler() == nullptr) {
+        Lend(ServiceKey());
     }
+    wanted_ = ServiceKey();
     Reset();
     return SetBasicOpt();
 }
@@ -63,6 +87,7 @@ void APIHandler::Reset() {
     form_file_ = FormFile();
     seek_function_ = nullptr;
     seek_data_ = nullptr;
+    body_is_read_ = false;
     request_ = Json::Value(Json::objectValue);
     ResetRespString();
     ResetRespHeader();
@@ -271,7 +296,8 @@ bool APIHandler::SetMethod() {
 }
 
 bool APIHandler::SetUp(curl_slist** headers, curl_mime** form) {
-    return SetHeaders(headers) && SetTarget() && SetBody() && SetMethod() && SetForm(form);
+    return SetHeaders(headers) && SetTarget() && SetBody() && SetMethod() && SetForm(form) &&
+           ChooseConnections();
 }
 
 bool APIHandler::Process(int retries) {
@@ -313,11 +339,15 @@ bool APIHandler::CanSendAgain() {
     long fresh_connections = 1;
     curl_easy_getinfo(curl_, CURLINFO_RESPONSE_CODE, &status);
     curl_easy_getinfo(curl_, CURLINFO_NUM_CONNECTS, &fresh_connections);
-    if (status != 0 || fresh_connections != 0 || seek_function_ == nullptr) {
+    if (status != 0 || fresh_connections != 0) {
         return false;
     }
-    return form_data_ != nullptr ||  // libcurl takes a form from its start by itself
-           seek_function_(seek_data_, 0, SEEK_SET) == CURL_SEEKFUNC_OK;
+    if (!body_is_read_ && form_data_ == nullptr) {
+        return true;  // libcurl has the body itself
+    }
+    return seek_function_ != nullptr &&
+           (form_data_ != nullptr ||  // libcurl takes a form from its start by itself
+            seek_function_(seek_data_, 0, SEEK_SET) == CURL_SEEKFUNC_OK);
 }
 
 bool APIHandler::Perform(int attempts) {

@@ -1,10 +1,12 @@
 /**
  * One conversation with a service over one libcurl handle: HTTP, WebDAV, FTP or SFTP.
  *
- * A driver owns one APIHandler and uses it for request after request, so that connections stay
- * open. For each request: Init(), then the description (URL, headers, parameters, method) and the
- * direct options, then Process(), then GetResponse() or GetError(). What a failure means and
- * whether it is worth a retry is the ErrorHandler's to say.
+ * A driver owns one APIHandler and uses it for request after request. The handle is borrowed from
+ * the pool of the process, so that connections stay open behind the driver, too, for one of the
+ * same user that trusts the same servers (http/handle_pool.h). For each request: Init(), then the
+ * description (URL, headers, parameters, method) and the direct options, then Process(), then
+ * GetResponse() or GetError(). What a failure means and whether it is worth a retry is the
+ * ErrorHandler's to say.
  *
  * Operations answer bool, true for success, unless stated otherwise. Values of the wrong type in a
  * description make Process fail; it never throws. One thread at a time.
@@ -21,6 +23,7 @@
 #include "core/handle.h"
 #include "core/source_line.h"
 #include "http/error_handler.h"
+#include "http/handle_pool.h"
 #include "zyrovfs/cloud.h"
 
 namespace ZYROCloud {
@@ -43,8 +46,15 @@ class APIHandler {
     bool Init();
     /** Forgets the last request, its answer and all options. Open connections stay. */
     void Reset();
-    /** The handle, null when there is none; owned by this object. */
-    CURL* GetCurlHandler() const { return curl_; }
+    /** The handle, null when there is none; this object's until it is destroyed, except in a forked
+     * child, where it becomes another one. */
+    CURL* GetCurlHandler();
+    /**
+     * Between two requests: the next ones go to this server of the user's own (as for SetVFSURL),
+     * with this account. If a handle is kept that has connections for just that, it takes the place
+     * of the present one. Nothing needs this, but without it connections end with the handler.
+     */
+    void ExpectVFSURL(const std::string& url, const std::string& user, const std::string& password);
 
     // --- description of the request ------------------------------------------------------------
 
@@ -166,6 +176,9 @@ class APIHandler {
     bool BuildHeaderParam(curl_slist** list);
 
   private:
+    HandleKey ServiceKey() const;
+    void Lend(HandleKey key);
+    bool ChooseConnections();
     bool SetBasicOpt();
     /** Whether libcurl took an option; a refusal is logged in the name of `at`. */
     static bool Taken(CURLcode code, const char* what,
@@ -175,6 +188,7 @@ class APIHandler {
                 ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
     bool SetMember(const char* key, const Json::Value& object);
     bool AddMember(const char* key, const std::string& name, const Json::Value& value);
+    char* KeepText(ZYROVFS::UniqueCString text);
     void UsePinnedCertificate(const std::string& path);
     std::string LoggableUrl() const;
     bool SetHeaders(curl_slist** list);
@@ -199,7 +213,7 @@ class APIHandler {
     ErrorHandler* error_handler_ = nullptr;
     bool return_on_error_ = true;
     FormUploadData* form_data_ = nullptr;
-    char* cert_data_ = nullptr;
+    char* cert_data_ = nullptr;  ///< one of the loan's texts
     /** Where libcurl reads the file of a form. */
     struct FormFile {
         const XferData* source = nullptr;
@@ -213,8 +227,9 @@ class APIHandler {
     FormFile form_file_;
     SeekCallback seek_function_ = nullptr;
     void* seek_data_ = nullptr;
-    /** Connections that are still open may check against these once more. */
-    std::vector<ZYROVFS::UniqueCString> old_cert_data_;
+    bool body_is_read_ = false;  ///< from a function, which may not be able to give it again
+    HandleLoan loan_;            ///< of curl_
+    HandleKey wanted_;           ///< of the request that is being described
 };
 
 }  // namespace ZYROCloud

@@ -1,3 +1,4 @@
+#include <sys/socket.h>
 #include <zosplatform/device.h>
 
 #include <variant>
@@ -18,6 +19,8 @@ constexpr long kConnectTime = 90;
 constexpr long kKeepAliveTime = 30;
 constexpr long kDnsCacheTime = 269;
 constexpr long kMostRedirects = 30;
+constexpr long kRootsTime = 300;
+constexpr char kNoDirectory[] = "/dev/null/";
 
 // Measured over loopback into a file: a quarter less of the processor than libcurl's own 16 KiB,
 // and a twelfth less than 128 KiB; more gives nothing.
@@ -44,6 +47,11 @@ const void* Pointer(Function* function) {
 CURLcode Set(CURL* curl, const Option& row) {
     return std::visit([&](auto value) { return curl_easy_setopt(curl, row.option, value); },
                       row.value);
+}
+
+/** Programs that this process starts, daemons among them, must not hold its connections open. */
+curl_socket_t OpenSocket(void*, curlsocktype, curl_sockaddr* address) noexcept {
+    return socket(address->family, address->socktype | SOCK_CLOEXEC, address->protocol);
 }
 
 /** A line that the parser refuses by exception is left out, and the transfer goes on. */
@@ -97,7 +105,7 @@ bool APIHandler::SetBasicOpt() {
         {CURLOPT_HEADERDATA, &response_header_, "header data"},
         {CURLOPT_WRITEFUNCTION, Pointer(WriteToStrBuf), "write function"},
         {CURLOPT_WRITEDATA, &response_, "write data"},
-        {CURLOPT_SHARE, share_, "share"},
+        {CURLOPT_SHARE, wanted_.share, "share"},
         {CURLOPT_FAILONERROR, return_on_error_ ? 1L : 0L, "fail on error"},
         {CURLOPT_FOLLOWLOCATION, 1L, "follow location"},
         {CURLOPT_DNS_CACHE_TIMEOUT, kDnsCacheTime, "dns cache timeout"},
@@ -106,14 +114,48 @@ bool APIHandler::SetBasicOpt() {
         {CURLOPT_REDIR_PROTOCOLS_STR, "http,https", "redirect protocols"},
         // The names of headers are compared as they come, and HTTP/2 has them in lower case.
         {CURLOPT_HTTP_VERSION, static_cast<long>(CURL_HTTP_VERSION_1_1), "http version"},
-        {CURLOPT_BUFFERSIZE, kReceiveBuffer, "receive buffer"},
         {CURLOPT_UPLOAD_BUFFERSIZE, kUploadBuffer, "upload buffer"},
         // Handles work in several threads at once, and signals belong to the whole process.
         {CURLOPT_NOSIGNAL, 1L, "signals"},
+        {CURLOPT_OPENSOCKETFUNCTION, Pointer(OpenSocket), "socket function"},
     };
     for (const Option& row : options) {
         const bool absent = row.option == CURLOPT_SHARE && share_ == nullptr;
         if (!absent && !Accept(Set(curl_, row), row.what)) {
+            return false;
+        }
+    }
+    // Refused, and as large as before, behind a transfer that ended before it had a connection.
+    curl_easy_setopt(curl_, CURLOPT_BUFFERSIZE, kReceiveBuffer);
+    return true;
+}
+
+/**
+ * What libcurl may use again. It compares what it knows of; users, pins and what stands in the
+ * files behind them it does not.
+ */
+bool APIHandler::ChooseConnections() {
+    if (HandlePool::Instance().IsInherited(loan_)) {
+        LOG_ERROR("The connections are those of another process");
+        return false;
+    }
+    loan_.mixed = loan_.mixed || (loan_.used && loan_.key != wanted_);
+    loan_.key = wanted_;
+    loan_.used = true;
+    loan_.own_sessions = loan_.own_sessions || wanted_.share == nullptr;
+    const bool sessions = !wanted_.IsPinned() && !(loan_.mixed && loan_.own_sessions);
+    // libcurl keeps parsed roots, but not if there is a directory, too, and in the one that is set
+    // it finds nothing. Directories are among what it compares, so one that cannot be keeps a
+    // redirect of this request off the connections of others.
+    const std::string label = loan_.mixed ? kNoDirectory + handle_key::Label(wanted_) : "";
+    const Option options[] = {
+        {CURLOPT_CAPATH, loan_.mixed ? label.c_str() : nullptr, "ca path"},
+        {CURLOPT_FRESH_CONNECT, loan_.mixed ? 1L : 0L, "fresh connect"},
+        {CURLOPT_CA_CACHE_TIMEOUT, kRootsTime, "roots"},
+        {CURLOPT_SSL_SESSIONID_CACHE, sessions ? 1L : 0L, "sessions"},
+    };
+    for (const Option& row : options) {
+        if (!Taken(Set(curl_, row), row.what)) {
             return false;
         }
     }
@@ -128,6 +170,7 @@ bool APIHandler::SetWriteFunAndData(CurlCallback function, void* data) {
 }
 
 bool APIHandler::SetReadFunAndData(CurlCallback function, void* data) {
+    body_is_read_ = body_is_read_ || function != nullptr;
     return (function == nullptr ||
             Accept(curl_easy_setopt(curl_, CURLOPT_READFUNCTION, function), "read function")) &&
            (data == nullptr ||
@@ -166,6 +209,7 @@ void APIHandler::ForgetSeek() {
 }
 
 bool APIHandler::SetUploadOpt(bool mute) {
+    body_is_read_ = true;
     const void* sink = mute ? Pointer(MutedWriteCallback) : Pointer(WriteToStrBuf);
     return Accept(curl_easy_setopt(curl_, CURLOPT_UPLOAD, 1L), "upload") &&
            Accept(Set(curl_, {CURLOPT_WRITEFUNCTION, sink, ""}), "write function");
@@ -177,6 +221,7 @@ bool APIHandler::SetUploadSize(long long size) {
 }
 
 bool APIHandler::SetUserPwOpt(const std::string& user, const std::string& password) {
+    wanted_.credentials = handle_key::Credentials(user, password);
     return Accept(curl_easy_setopt(curl_, CURLOPT_HTTPAUTH, kAuthMethods), "http auth") &&
            Accept(curl_easy_setopt(curl_, CURLOPT_USERNAME, user.c_str()), "user name") &&
            Accept(curl_easy_setopt(curl_, CURLOPT_PASSWORD, password.c_str()), "password");
@@ -210,6 +255,9 @@ bool APIHandler::SetShareCurlHandler(void* share) {
         return false;
     }
     share_ = share;
+    if (loan_.own_sessions) {
+        Lend(handle_key::ForServices(share_));
+    }
     return true;
 }
 

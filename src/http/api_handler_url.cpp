@@ -1,4 +1,5 @@
 #include <fcntl.h>
+#include <strings.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -16,6 +17,8 @@ namespace ZYROCloud {
 using namespace ZYROVFS;
 
 namespace {
+
+constexpr char kSchemeEnd[] = "://";
 
 bool StartsWith(const std::string& text, const char* start) {
     return text.compare(0, strlen(start), start) == 0;
@@ -37,6 +40,39 @@ std::string Loggable(const std::string& url) {
         text.erase(host, at + 1 - host);
     }
     return text;
+}
+
+bool IsSsh(const std::string& url) {
+    return StartsWith(url, "sftp://");
+}
+
+/** These go past every proxy. */
+bool IsFileProtocol(const std::string& url) {
+    return IsSsh(url) || StartsWith(url, "ftp://") || StartsWith(url, "ftps://");
+}
+
+bool IsWeb(const std::string& url) {
+    return strncasecmp(url.c_str(), "http", strlen("http")) == 0;
+}
+
+bool IsDavs(const std::string& url) {
+    return url.find("davs://") != std::string::npos;
+}
+
+/** Where the certificate of a URL's host would be saved. The URL has a scheme. */
+std::string CertificatePath(const std::string& url) {
+    const size_t begin = url.find(kSchemeEnd) + strlen(kSchemeEnd);
+    return paths::SslDir(GetActorUID()) + "/" + url.substr(begin, url.find('/', begin) - begin);
+}
+
+/** What a file protocol's URL decides of a key. */
+void SetRoute(const std::string& url, HandleKey& key) {
+    if (IsSsh(url)) {
+        key.trust = handle_key::KnownHosts(paths::KnownHosts(GetActorUID()));
+    }
+    if (IsFileProtocol(url)) {
+        key.route = handle_key::Direct();
+    }
 }
 
 /** libcurl's answer is logged and no more: what stands behind it in the list is set all the same.
@@ -62,14 +98,23 @@ bool APIHandler::SetURL(const std::string& url, bool need_escape) {
     return true;
 }
 
-void APIHandler::UsePinnedCertificate(const std::string& path) {
-    UniqueCString data(Utils::GetCertData(path.c_str()));
-    if (data == nullptr || cert_data_ == nullptr || strcmp(data.get(), cert_data_) != 0) {
-        if (cert_data_ != nullptr) {
-            old_cert_data_.emplace_back(cert_data_);
-        }
-        cert_data_ = data.release();
+/** The one that connections of this handle may check against already, if the text is the same. */
+char* APIHandler::KeepText(UniqueCString text) {
+    if (text == nullptr) {
+        return nullptr;
     }
+    for (const UniqueCString& kept : loan_.texts) {
+        if (strcmp(kept.get(), text.get()) == 0) {
+            return kept.get();
+        }
+    }
+    loan_.texts.push_back(std::move(text));
+    return loan_.texts.back().get();
+}
+
+void APIHandler::UsePinnedCertificate(const std::string& path) {
+    cert_data_ = KeepText(UniqueCString(Utils::GetCertData(path.c_str())));
+    wanted_.trust = handle_key::Pin(path, cert_data_);
     Logged(curl_easy_setopt(curl_, CURLOPT_SSL_VERIFYPEER, 0L));
     Logged(curl_easy_setopt(curl_, CURLOPT_SSL_VERIFYHOST, 0L));
     Logged(curl_easy_setopt(curl_, CURLOPT_SSL_CTX_FUNCTION, &Utils::VerifyCertCtxFn));
@@ -78,14 +123,11 @@ void APIHandler::UsePinnedCertificate(const std::string& path) {
 }
 
 bool APIHandler::SetSSLOpt(const std::string& url) {
-    const size_t scheme = url.find("://");
-    if (scheme == std::string::npos) {
+    if (url.find(kSchemeEnd) == std::string::npos) {
         ParseCurlError(CURLE_OK);
         return false;
     }
-    const size_t begin = scheme + strlen("://");
-    const std::string host = url.substr(begin, url.find('/', begin) - begin);
-    const std::string path = paths::SslDir(GetActorUID()) + "/" + host;
+    const std::string path = CertificatePath(url);
     if (Utils::isTrustRootCA(path.c_str())) {
         Logged(curl_easy_setopt(curl_, CURLOPT_SSL_VERIFYPEER, 1L));
         Logged(curl_easy_setopt(curl_, CURLOPT_SSL_VERIFYHOST, 2L));
@@ -104,15 +146,15 @@ bool APIHandler::SetVFSURL(const std::string& url) {
         LOG_ERROR("Failed to convert protocol %s", Loggable(url).c_str());
         return false;
     }
-    if (url.find("davs://") != std::string::npos) {
+    if (IsDavs(url)) {
         SetSSLOpt(url);
     }
-    const bool ssh = StartsWith(url, "sftp://");
+    SetRoute(url, wanted_);
     const std::string known_hosts = paths::KnownHosts(GetActorUID());
-    if (ssh && IsThere(known_hosts)) {
+    if (IsSsh(url) && IsThere(known_hosts)) {
         Logged(curl_easy_setopt(curl_, CURLOPT_SSH_KNOWNHOSTS, known_hosts.c_str()));
     }
-    if (ssh || StartsWith(url, "ftp://") || StartsWith(url, "ftps://")) {
+    if (IsFileProtocol(url)) {
         const CURLcode code = curl_easy_setopt(curl_, CURLOPT_PROXY, "");
         if (code != CURLE_OK) {
             LOG_ERROR("Failed to set url to %s, code=%d, err=%s", Loggable(url).c_str(),
@@ -123,6 +165,23 @@ bool APIHandler::SetVFSURL(const std::string& url) {
     }
     request_["url"] = converted;
     return false;
+}
+
+void APIHandler::ExpectVFSURL(const std::string& url, const std::string& user,
+                              const std::string& password) {
+    HandleKey key = handle_key::ForServices(share_);
+    if (IsDavs(url)) {
+        const std::string path = CertificatePath(url);
+        if (!Utils::isTrustRootCA(path.c_str())) {
+            const UniqueCString text(Utils::GetCertData(path.c_str()));
+            key.trust = handle_key::Pin(path, text.get());
+        }
+    }
+    SetRoute(url, key);
+    key.credentials = handle_key::Credentials(user, password);
+    if (loan_.mixed || loan_.key != key) {
+        Lend(std::move(key));
+    }
 }
 
 bool APIHandler::SetTarget() {
@@ -139,6 +198,8 @@ bool APIHandler::SetTarget() {
         url += url.find('?') == std::string::npos ? '?' : '&';
         url += BuildParamString(request_["get_param"]);
     }
+    // File servers count logins, and refuse the mount of the same user beyond some number.
+    loan_.keep = loan_.keep && IsWeb(url);
     return Taken(curl_easy_setopt(curl_, CURLOPT_URL, url.c_str()), "url");
 }
 

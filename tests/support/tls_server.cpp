@@ -159,11 +159,10 @@ bool ReadRequest(Stream& stream, Request& request) {
     return true;
 }
 
-std::string Format(const Response& response) {
-    std::string text =
-        "HTTP/1.1 " + std::to_string(response.status) +
-        " Told\r\nConnection: close\r\nContent-Length: " + std::to_string(response.body.size()) +
-        "\r\n";
+std::string Format(const Response& response, bool keep_open) {
+    std::string text = "HTTP/1.1 " + std::to_string(response.status) + " Told\r\n" +
+                       (keep_open ? "" : "Connection: close\r\n") +
+                       "Content-Length: " + std::to_string(response.body.size()) + "\r\n";
     for (const auto& [name, value] : response.headers) {
         text += name + ": " + value + "\r\n";
     }
@@ -199,13 +198,17 @@ void Converse(const ServerOptions& options, int fd, SSL_CTX* context, int journa
         return;
     }
     Stream stream(fd, context);
-    Request request;
-    if (!stream.Handshake() || !ReadRequest(stream, request)) {
-        return;
-    }
-    Record(journal, request);
-    if (options.manner == Manner::kServe) {
-        stream.Write(Format(options.answer(request)));
+    bool more = stream.Handshake();
+    while (more) {
+        Request request;
+        if (!ReadRequest(stream, request)) {
+            return;
+        }
+        Record(journal, request);
+        more = options.manner == Manner::kKeepOpen;
+        if (more || options.manner == Manner::kServe) {
+            stream.Write(Format(options.answer(request), more));
+        }
     }
 }
 

@@ -30,7 +30,8 @@ struct Response {
 };
 
 enum class Manner {
-    kServe,
+    kServe,                ///< one request a connection
+    kKeepOpen,             ///< request after request, until the other side goes
     kCloseAtOnce,          ///< accepts, and closes before the handshake
     kCloseAfterHandshake,  ///< reads a request and closes without an answer
     kSilent,               ///< accepts, and says nothing until the other side goes

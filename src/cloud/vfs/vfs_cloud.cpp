@@ -78,6 +78,9 @@ bool VFSCloud::GetMetaDataByURI(const std::string& uri, Json::Value& out, const 
             return false;
         }
         out["url"] = url;
+        if (api != nullptr) {
+            api->ExpectVFSURL(url, account_, password_);
+        }
         return true;
     });
 }

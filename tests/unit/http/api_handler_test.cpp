@@ -375,6 +375,7 @@ TEST_F(Handler, AnotherErrorHandlerTakesThePlaceOfTheFirst) {
 }
 
 TEST_F(Handler, AHandlerWithoutACurlHandleFailsAndMakesOneAtTheNextInit) {
+    HandlePool::Instance().Empty();
     curl_seam::Now().no_handle = true;
     APIHandler api;
     api.SetErrorHandler(new BoxErrorHandler);

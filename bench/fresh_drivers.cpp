@@ -1,0 +1,222 @@
+// 1,000 changes over TLS by a driver that is made for each, as backends do, against one libcurl
+// handle that is reused for the same requests; and a few with the pool emptied behind each call:
+//   bench_fresh_drivers [ROUNDS [CALLS]]
+// CPU is that of the calling thread; the simulated service has threads of its own.
+#include <curl/curl.h>
+#include <json/value.h>
+#include <sys/resource.h>
+
+#include <algorithm>
+#include <chrono>
+#include <cstdio>
+#include <cstdlib>
+#include <functional>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "tls_box.h"
+#include "zyrovfs/cloud_utils.h"
+#include "zyrovfs/server.h"
+
+namespace {
+
+using bench::TlsBox;
+using ZYROCloud::Cloud;
+namespace Server = ZYROVFS::Server;
+
+constexpr unsigned kUid = 4001;
+
+/** What three calls change: each takes a file of its own. */
+struct Target {
+    std::string folder;  ///< to be made
+    std::string file;    ///< id, to be renamed and deleted
+    std::string name;
+};
+
+/** One way to make the three changes; false ends the program. */
+using Change = std::function<bool(const Target&)>;
+
+/** The connection as it stands in the user's file. */
+void StoreProfile(const std::string& token) {
+    const auto enciphered = [](const std::string& text) {
+        char buffer[4096] = "";
+        return Server::SzEncrypt(text.c_str(), buffer, sizeof buffer) != 0 ? buffer : "";
+    };
+    Json::Value profile;
+    profile["protocol"] = "box";
+    profile["email"] = "amy@example.com";
+    profile["alias"] = "box";
+    profile["client_id"] = "client";
+    profile["account_info"] = "{\"id\":\"1\"}";
+    profile["expire_time"] = "";
+    profile["access_token"] = std::string(enciphered(token));
+    profile["refresh_token"] = std::string(enciphered("refresh"));
+    Json::Value document;
+    document["servers"][TlsBox::kServerId] = profile;
+    Server::CfgAccess(kUid, Server::VFS_CONFIG_CONNECT, Server::VFS_CONFIG_WRITE, document);
+}
+
+bool WithDriver(const std::function<bool(Cloud&)>& call) {
+    const std::unique_ptr<Cloud> driver(ZYROCloud::Utils::CreateCloudByServerID(
+        kUid, TlsBox::kServerId, Server::VFS_CONFIG_CONNECT));
+    return driver != nullptr && call(*driver);
+}
+
+bool ByFreshDrivers(const Target& target) {
+    return WithDriver([&](Cloud& driver) {
+               return driver.CreateFolder("folders/0", target.folder, Json::objectValue);
+           }) &&
+           WithDriver(
+               [&](Cloud& driver) { return driver.Rename("files/" + target.file, target.name); }) &&
+           WithDriver([&](Cloud& driver) { return driver.Delete("files/" + target.file); });
+}
+
+bool ByFreshDriversWithoutThePool(const Target& target) {
+    const bool done = ByFreshDrivers(target);
+    Cloud::CleanupCurlGlobal();
+    Cloud::InitCurlGlobal();
+    return done;
+}
+
+class Bare {
+  public:
+    explicit Bare(TlsBox& box)
+        : host_(box.Host()),
+          headers_(curl_slist_append(nullptr, ("Authorization: Bearer " + box.Token()).c_str())) {
+        headers_ = curl_slist_append(headers_, "Content-Type: application/json");
+    }
+    Bare(const Bare&) = delete;
+    Bare& operator=(const Bare&) = delete;
+    ~Bare() {
+        curl_easy_cleanup(curl_);
+        curl_slist_free_all(headers_);
+    }
+
+    bool Make(const Target& target) {
+        const std::string file = "/2.0/files/" + target.file;
+        return Send("POST", "/2.0/folders",
+                    R"({"name":")" + target.folder + R"(","parent":{"id":"0"}})") &&
+               Send("PUT", file, R"({"name":")" + target.name + R"("})") &&
+               Send("DELETE", file + "?recursive=true", "");
+    }
+
+  private:
+    static size_t Append(char* data, size_t size, size_t count, void* out) {
+        static_cast<std::string*>(out)->append(data, size * count);
+        return size * count;
+    }
+
+    bool Send(const char* method, const std::string& path, const std::string& body) {
+        answer_.clear();
+        curl_easy_reset(curl_);
+        curl_easy_setopt(curl_, CURLOPT_URL, (host_ + path).c_str());
+        curl_easy_setopt(curl_, CURLOPT_HTTPHEADER, headers_);
+        curl_easy_setopt(curl_, CURLOPT_WRITEFUNCTION, Append);
+        curl_easy_setopt(curl_, CURLOPT_WRITEDATA, &answer_);
+        curl_easy_setopt(curl_, CURLOPT_FAILONERROR, 1L);
+        if (!body.empty()) {
+            curl_easy_setopt(curl_, CURLOPT_COPYPOSTFIELDS, body.c_str());
+        }
+        curl_easy_setopt(curl_, CURLOPT_CUSTOMREQUEST, method);
+        return curl_easy_perform(curl_) == CURLE_OK;
+    }
+
+    const std::string host_;
+    CURL* curl_ = curl_easy_init();
+    curl_slist* headers_;
+    std::string answer_;
+};
+
+struct Cost {
+    double cpu;  ///< seconds
+    double wall;
+    size_t connections;
+};
+
+double ThreadCpu() {
+    rusage usage{};
+    getrusage(RUSAGE_THREAD, &usage);
+    const auto seconds = [](const timeval& t) {
+        return static_cast<double>(t.tv_sec) + static_cast<double>(t.tv_usec) * 1e-6;
+    };
+    return seconds(usage.ru_utime) + seconds(usage.ru_stime);
+}
+
+std::vector<Target> Prepare(TlsBox& box, size_t count) {
+    static size_t number = 0;
+    cloudsim::Account& amy = box.Amy();
+    for (const cloudsim::Item& item : amy.List(amy.Root())) {
+        amy.Remove(item.id);
+    }
+    amy.AddMany(amy.Root(), count, 1);
+    std::vector<Target> targets;
+    for (const cloudsim::Item& item : amy.List(amy.Root())) {
+        const std::string text = std::to_string(number++);
+        targets.push_back({"folder " + text, item.id, "file " + text});
+    }
+    return targets;
+}
+
+Cost Measure(TlsBox& box, size_t calls, const Change& change) {
+    const std::vector<Target> targets = Prepare(box, calls / 3);
+    const size_t connections = box.Connections();
+    const auto begin = std::chrono::steady_clock::now();
+    const double cpu = ThreadCpu();
+    for (const Target& target : targets) {
+        if (!change(target)) {
+            std::fprintf(stderr, "a change failed\n");
+            std::exit(1);
+        }
+    }
+    const std::chrono::duration<double> wall = std::chrono::steady_clock::now() - begin;
+    return {ThreadCpu() - cpu, wall.count(), box.Connections() - connections};
+}
+
+double Median(std::vector<double> values) {
+    std::sort(values.begin(), values.end());
+    return values[values.size() / 2];
+}
+
+void Print(const char* name, const std::vector<Cost>& costs, size_t calls) {
+    std::vector<double> cpu;
+    std::vector<double> wall;
+    size_t connections = 0;
+    for (const Cost& cost : costs) {
+        cpu.push_back(cost.cpu * 1e6 / static_cast<double>(calls));
+        wall.push_back(cost.wall * 1e6 / static_cast<double>(calls));
+        connections = std::max(connections, cost.connections);
+    }
+    std::printf("  %-28s cpu %8.1f us  wall %8.1f us a call   connections at most %zu\n", name,
+                Median(cpu), Median(wall), connections);
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+    const int rounds = argc > 1 ? std::atoi(argv[1]) : 9;
+    const size_t calls = argc > 2 ? std::strtoul(argv[2], nullptr, 10) : 999;
+    TlsBox box;
+    StoreProfile(box.Token());
+    Cloud::InitCurlGlobal();
+    std::vector<Cost> fresh;
+    std::vector<Cost> bare;
+    std::vector<Cost> unpooled;
+    std::vector<double> cpu;
+    std::vector<double> wall;
+    for (int i = 0; i < rounds; ++i) {
+        fresh.push_back(Measure(box, calls, ByFreshDrivers));
+        Bare handle(box);
+        bare.push_back(Measure(box, calls, [&](const Target& t) { return handle.Make(t); }));
+        unpooled.push_back(Measure(box, 30, ByFreshDriversWithoutThePool));
+        cpu.push_back(fresh.back().cpu / bare.back().cpu);
+        wall.push_back(fresh.back().wall / bare.back().wall);
+    }
+    Print("a fresh driver each", fresh, calls);
+    Print("one reused handle", bare, calls);
+    Print("no pool, three calls a driver", unpooled, 30);
+    std::printf("  a fresh driver each against one reused handle: cpu %.2f  wall %.2f\n",
+                Median(cpu), Median(wall));
+    Cloud::CleanupCurlGlobal();
+    return 0;
+}
