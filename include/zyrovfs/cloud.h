@@ -184,7 +184,8 @@ class ZYROVFS_API Cloud {
     static int GetUploadErrorCode(Cloud* cloud);
 
     // --- relay between a browser and a driver, for a CGI program: no temporary file. One relay per
-    // process at a time; it is a transfer, too. The pointers must outlive the relay. ----------------
+    // process at a time; it is a transfer, too. The pointers must outlive the relay.
+    // ----------------
 
     /**
      * Prepares the upload of a file that the program's standard input brings: the multipart body
@@ -196,11 +197,10 @@ class ZYROVFS_API Cloud {
      * False, with `progress->error` set to -9, for a null argument, an empty boundary, and without
      * a standard input.
      */
-    static bool RelayUploadInit(Cloud* cloud, const char* uri,
-                                _tag_cgi_upload_progress_* progress, const char* boundary,
-                                RelayProgressCallback relay_progress, CancelCallback cancel,
-                                RelaySpeedCallback speed, unsigned long long* transferred,
-                                long long size);
+    static bool RelayUploadInit(Cloud* cloud, const char* uri, _tag_cgi_upload_progress_* progress,
+                                const char* boundary, RelayProgressCallback relay_progress,
+                                CancelCallback cancel, RelaySpeedCallback speed,
+                                unsigned long long* transferred, long long size);
     /**
      * Sends what RelayUploadInit has prepared, up to the first place in the last 131072 bytes of
      * the request where the boundary begins a line: what follows the file in the request must be

@@ -24,7 +24,7 @@ struct RelayUpload {
     /** Place in the request from which on it is held back. */
     unsigned long long tail_start = 0;
     RelayTail tail;
-    long long file_size = -1;         ///< as the caller knows it, -1 for not at all
+    long long file_size = -1;          ///< as the caller knows it, -1 for not at all
     unsigned long long delivered = 0;  ///< bytes of the file that the driver has got
     int last_read = 0;
     bool failed = false;  ///< nothing more is read

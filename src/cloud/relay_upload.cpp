@@ -42,8 +42,8 @@ unsigned long long BytesAhead() {
 size_t Wanted(size_t room, const XferContext& context) {
     size_t want = std::min(room, kMostAtOnce);
     if (relay_upload.speed_cb != nullptr) {
-        const auto value = static_cast<unsigned long long>(relay_upload.speed_cb(
-            relay_upload.last_read, Progress().current, Progress().total));
+        const auto value = static_cast<unsigned long long>(
+            relay_upload.speed_cb(relay_upload.last_read, Progress().current, Progress().total));
         want = value == 0 || value > room ? room : static_cast<size_t>(value);
     }
     return context.limited ? std::min<size_t>(want, context.chunk_left) : want;
@@ -81,8 +81,8 @@ bool LoadTail(XferContext& context) {
     if (relay_upload.file_size == -1) {
         if (context.limited) {
             // The driver counts to the end of the request.
-            context.chunk_left -= static_cast<unsigned int>(
-                std::min<size_t>(tail.Behind(), context.chunk_left));
+            context.chunk_left -=
+                static_cast<unsigned int>(std::min<size_t>(tail.Behind(), context.chunk_left));
         }
         return true;
     }

@@ -150,8 +150,9 @@ class Fragments {
             return true;
         }
         drive_.SetError(VFS_ERR_NOT_SUPPORTED, "");
-        LOG_ERROR("The service takes no file of unknown size, and this one has more than %lld bytes",
-                  total_);
+        LOG_ERROR(
+            "The service takes no file of unknown size, and this one has more than %lld bytes",
+            total_);
         return false;
     }
 
