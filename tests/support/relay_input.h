@@ -2,15 +2,16 @@
 #ifndef ZYROVFS_TESTS_RELAY_INPUT_H
 #define ZYROVFS_TESTS_RELAY_INPUT_H
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/mman.h>
 #include <unistd.h>
 
+#include <array>
+#include <csignal>
 #include <string>
 #include <thread>
 #include <utility>
-
-#include "core/handle.h"
 
 namespace relay_input {
 
@@ -28,8 +29,28 @@ inline std::string Field(const std::string& name, const std::string& value) {
            Closing(kBoundary, "--\r\n");
 }
 
-inline ZYROVFS::UniqueFd FileOf(const std::string& bytes) {
-    ZYROVFS::UniqueFd file(memfd_create("request", MFD_CLOEXEC));
+/** An open descriptor; tests of the shipped library have no other owner for one. */
+class Descriptor {
+  public:
+    explicit Descriptor(int fd) : fd_(fd) {}
+    Descriptor(Descriptor&& other) noexcept : fd_(std::exchange(other.fd_, -1)) {}
+    Descriptor(const Descriptor&) = delete;
+    Descriptor& operator=(const Descriptor&) = delete;
+    ~Descriptor() { Close(); }
+
+    int Get() const { return fd_; }
+    void Close() {
+        if (fd_ >= 0) {
+            close(std::exchange(fd_, -1));
+        }
+    }
+
+  private:
+    int fd_;
+};
+
+inline Descriptor FileOf(const std::string& bytes) {
+    Descriptor file(memfd_create("request", MFD_CLOEXEC));
     EXPECT_EQ(write(file.Get(), bytes.data(), bytes.size()), static_cast<ssize_t>(bytes.size()));
     lseek(file.Get(), 0, SEEK_SET);
     return file;
@@ -43,7 +64,7 @@ class Input {
     Input(const Input&) = delete;
     Input& operator=(const Input&) = delete;
     ~Input() {
-        if (old_) {
+        if (old_.Get() >= 0) {
             dup2(old_.Get(), STDIN_FILENO);
         } else {
             close(STDIN_FILENO);
@@ -51,38 +72,51 @@ class Input {
     }
 
   private:
-    ZYROVFS::UniqueFd old_;
+    Descriptor old_;
 };
 
 /** Somebody at the other end of a pipe, who writes these bytes and goes. */
 class Sender {
   public:
-    explicit Sender(std::string bytes) {
-        int ends[2] = {-1, -1};
-        EXPECT_EQ(pipe(ends), 0);
-        from_.Reset(ends[0]);
-        thread_ = std::thread([to = ends[1], bytes = std::move(bytes)] {
-            for (size_t at = 0; at < bytes.size();) {
-                const ssize_t n = write(to, bytes.data() + at, bytes.size() - at);
-                if (n < 0) {
-                    break;  // nobody reads on
-                }
-                at += static_cast<size_t>(n);
-            }
-            close(to);
-        });
-    }
+    explicit Sender(const std::string& bytes) : Sender(Pipe(), bytes) {}
     Sender(const Sender&) = delete;
     Sender& operator=(const Sender&) = delete;
     ~Sender() {
-        from_.Reset();
+        from_.Close();
         thread_.join();
     }
 
     int Get() const { return from_.Get(); }
 
   private:
-    ZYROVFS::UniqueFd from_;
+    using Ends = std::array<int, 2>;
+
+    static Ends Pipe() {
+        Ends ends{-1, -1};
+        EXPECT_EQ(pipe2(ends.data(), O_CLOEXEC), 0);
+        return ends;
+    }
+
+    Sender(const Ends& ends, const std::string& bytes)
+        : from_(ends[0]), thread_(Send, ends[1], bytes) {}
+
+    static void Send(int to, const std::string& bytes) {
+        // A reader that has gone is no reason to die.
+        sigset_t broken;
+        sigemptyset(&broken);
+        sigaddset(&broken, SIGPIPE);
+        pthread_sigmask(SIG_BLOCK, &broken, nullptr);
+        for (size_t at = 0; at < bytes.size();) {
+            const ssize_t n = write(to, bytes.data() + at, bytes.size() - at);
+            if (n < 0) {
+                break;
+            }
+            at += static_cast<size_t>(n);
+        }
+        close(to);
+    }
+
+    Descriptor from_;
     std::thread thread_;
 };
 

@@ -69,7 +69,7 @@ TEST_F(RelayUploads, MetadataThatCannotBeHadDoesNotStopAnUpload) {
 
 TEST_F(RelayUploads, ARequestOfAtMostTheTailsSizeIsReadAtOnceAndForwardedUpToTheBoundary) {
     const std::string file = Pattern(kTail - Closing().size());
-    const UniqueFd request = relay_input::FileOf(file + Closing());
+    const relay_input::Descriptor request = relay_input::FileOf(file + Closing());
     const Input input(request.Get());
     driver_.upload = [&](XferData* xfer, const Json::Value&) {
         char byte = 0;
@@ -88,7 +88,7 @@ TEST_F(RelayUploads, ARequestOfAtMostTheTailsSizeIsReadAtOnceAndForwardedUpToThe
 
 TEST_F(RelayUploads, ALargerRequestIsNotReadBeyondWhereTheTailBegins) {
     const std::string request = Pattern(3 * kTail) + Closing();
-    const UniqueFd source = relay_input::FileOf(request);
+    const relay_input::Descriptor source = relay_input::FileOf(request);
     const Input input(source.Get());
     const auto start = static_cast<off_t>(request.size() - kTail);
     driver_.upload = [&](XferData* xfer, const Json::Value&) {
