@@ -7,6 +7,7 @@
 #include <cstring>
 
 #include "cloud/transfer.h"
+#include "core/handle.h"
 #include "support/input_seam.h"
 #include "unit/cloud/relay_fixture.h"
 

@@ -12,6 +12,7 @@
 #include <string>
 
 #include "cloud/transfer.h"
+#include "core/handle.h"
 #include "support/input_seam.h"
 #include "support/relay_input.h"
 #include "support/seams.h"
