@@ -231,7 +231,7 @@ TEST_F(RelayUploads, ASpeedFunctionSaysHowMuchIsTakenNext) {
         told.push_back({last, current, total});
         return answer;
     };
-    const std::string request = Pattern(4 * kTail) + Closing();
+    const std::string request = Pattern(6 * kTail) + Closing();
     driver_.upload = [&](XferData* xfer, const Json::Value&) {
         std::string room(kTail + 1000, '\0');
         const std::pair<long long, size_t> rows[] = {

@@ -204,6 +204,7 @@ TEST_F(UploadCounts, TellWhatWasSentAndThatTheSourceHasNoMore) {
 
 TEST_F(UploadCounts, APieceThatIsFullIsNotTheEnd) {
     SentBytes sent;
+    lseek(context_.fd, 0, SEEK_SET);
     context_.limited = true;
     context_.chunk_left = 1000;
     ASSERT_TRUE(Send(kSizeNotKnown, sent)) << seams::LogDump();
@@ -216,6 +217,7 @@ TEST_F(UploadCounts, APieceThatIsFullIsNotTheEnd) {
 
 TEST_F(UploadCounts, OfWhatWasAnnouncedNoMoreIsTaken) {
     SentBytes sent;
+    lseek(context_.fd, 0, SEEK_SET);
     ASSERT_TRUE(Send(1000, sent)) << seams::LogDump();
     EXPECT_EQ(sent.count, 1000U);
     EXPECT_EQ(lseek(context_.fd, 0, SEEK_CUR), 1000);
