@@ -7,6 +7,7 @@
 
 #include <filesystem>
 
+#include "support/locations.h"
 #include "support/vfs_cloud_remote.h"
 
 namespace {
@@ -26,7 +27,7 @@ constexpr unsigned kBen = 4002;
 /** lighttpd with its own log-in on one port, and with none on the other. */
 void StartWebServer() {
     Must("mkdir -p /run/web/root");
-    Must("cp " BUILD_DIR "/web/zyrovfs-web /run/web/zyrovfs-web");
+    Must("cp " + BuildDir() + "/web/zyrovfs-web /run/web/zyrovfs-web");
     Must("chown root:www-data /run/web/zyrovfs-web; chmod 4750 /run/web/zyrovfs-web");
     Must("printf 'amy:a\\nben:b\\ndaemon:d\\nroot:r\\nnobody-here:n\\n' >/run/web/users");
     std::ofstream("/run/web/lighttpd.conf") << R"(
@@ -332,9 +333,9 @@ TEST(Web, WhatIsNoRequestIsRefused) {
 }
 
 TEST(Web, WhomThePolicyShutsOutIsToldSo) {
-    Must(BUILD_DIR "/tools/zyrovfs/zyrovfs policy set --type admins");
+    Must(BuildDir() + "/tools/zyrovfs/zyrovfs policy set --type admins");
     const Answer answer = Ask("-u ben:b", std::string(kSite) + "/files/api/connections");
-    Must(BUILD_DIR "/tools/zyrovfs/zyrovfs policy set --type all");
+    Must(BuildDir() + "/tools/zyrovfs/zyrovfs policy set --type all");
     EXPECT_EQ(answer.status, 403);
     EXPECT_THAT(answer.body, HasSubstr("The administrator has not allowed you"));
 }
