@@ -70,6 +70,7 @@ struct Capabilities {
     __tag_vfs_err_ upload_without_token = VFS_ERR_UNAUTHORIZED;
     /** A browser's file of unknown size beyond one request, with fields behind it. */
     bool takes_any_stream = true;
+    bool streams_in_session = false;   ///< a file of unknown size, however small
     bool repeats_bad_answers = false;  ///< an answer that is no JSON is asked for again
     std::vector<StatusCase> statuses;
 };
@@ -215,6 +216,7 @@ class DriverRelay : public DriverTest {
   protected:
     /** From the browser to `path`; `size` as the library is told. */
     bool Relay(const BrowserFile& file, const std::string& path, long long size);
+    void ExpectRefusal(const Fault& fault, bool known);
     _tag_cgi_upload_progress_ progress{0, 0, 0};
 };
 class DriverCancel : public DriverTest {};

@@ -129,17 +129,26 @@ TEST_P(DriverRelay, ACancelAtEachStageStoresNothing) {
     EXPECT_EQ(SumOf("/up.bin"), file.sum);
 }
 
-TEST_P(DriverRelay, ACloudThatRefusesIsToldAndNothingIsSentAgain) {
+void DriverRelay::ExpectRefusal(const Fault& fault, bool known) {
+    Restore();
+    Add(fault);
     const BrowserFile file(4 * kMiB);
-    for (const bool known : {true, false}) {
-        Restore();
-        Add(On(Op::kUpload).Answer(503));
-        EXPECT_FALSE(Relay(file, "/up.bin", known ? file.size : -1));
-        EXPECT_EQ(progress.error, Cloud::GetUploadErrorCode(cloud.get()));
-        EXPECT_NE(Code(), VFS_ERR_NONE);
-        EXPECT_EQ(SumOf("/up.bin"), "");
-        // A stream cannot be sent again.
-        EXPECT_LE(Count(Op::kUpload), 1U) << sim.Journal().Text();
+    EXPECT_FALSE(Relay(file, "/up.bin", known ? file.size : -1)) << fault.Text();
+    EXPECT_NE(Code(), VFS_ERR_NONE) << fault.Text();
+    EXPECT_EQ(progress.error, Cloud::GetUploadErrorCode(cloud.get())) << fault.Text();
+    EXPECT_EQ(SumOf("/up.bin"), "") << fault.Text();
+    // A stream cannot be sent again.
+    EXPECT_LE(Count(Op::kUpload), 1U) << sim.Journal().Text();
+}
+
+TEST_P(DriverRelay, ACloudThatRefusesIsToldAndNothingIsSentAgain) {
+    ExpectRefusal(On(Op::kUpload).Answer(503), true);
+    if (!can.streams_in_session) {
+        ExpectRefusal(On(Op::kUpload).Answer(503), false);
+        return;
+    }
+    for (const SessionStep& step : rig->SessionSteps()) {
+        ExpectRefusal(Fault::On(step.at.method, step.at.path).After(step.after).Answer(503), false);
     }
 }
 
