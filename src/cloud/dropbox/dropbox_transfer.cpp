@@ -100,8 +100,10 @@ bool Dropbox::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
         };
         const auto finish = [&] {
             if (offset != total) {
-                SetError(VFS_ERR_TRANSFER_ABORTED, "");
                 LOG_ERROR("upload size is not match");
+                if (GetErrorCode() == VFS_ERR_NONE) {
+                    SetError(VFS_ERR_TRANSFER_ABORTED, "");
+                }
                 return false;
             }
             return CommitChunkUpload(session, path, total);
