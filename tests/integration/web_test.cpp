@@ -71,6 +71,7 @@ class Site : public testing::Environment {
                   }),
                   0);
         dav_id = machine::Read("/run/dav-id");
+        Must(BuildDir() + "/tools/zyrovfs/zyrovfs policy set --type all");
         StartWebServer();
     }
 };
@@ -333,7 +334,7 @@ TEST(Web, WhatIsNoRequestIsRefused) {
 }
 
 TEST(Web, WhomThePolicyShutsOutIsToldSo) {
-    Must(BuildDir() + "/tools/zyrovfs/zyrovfs policy set --type admins");
+    Must(BuildDir() + "/tools/zyrovfs/zyrovfs policy set --type admin");
     const Answer answer = Ask("-u ben:b", std::string(kSite) + "/files/api/connections");
     Must(BuildDir() + "/tools/zyrovfs/zyrovfs policy set --type all");
     EXPECT_EQ(answer.status, 403);
