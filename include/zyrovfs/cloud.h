@@ -46,6 +46,13 @@ using ProgressCallback = int (*)(unsigned long long chunk, unsigned long long do
 /** Asked before each piece of `chunk` bytes: how many bytes to take next, for a limited rate. */
 using SpeedCallback = long long (*)(unsigned long long chunk, unsigned long long done);
 
+/** Told after each piece of a relayed upload: bytes of the request so far, and all of them. */
+using RelayProgressCallback = void (*)(unsigned long long current, unsigned long long total);
+/** Asked before each piece of a relayed upload, with the size of the last one: how many bytes to
+ * take next, for a limited rate; 0 or more than fit is as many as fit. */
+using RelaySpeedCallback = long long (*)(unsigned long long last, unsigned long long current,
+                                         unsigned long long total);
+
 /** A read or write function as libcurl calls it. */
 using CurlCallback = size_t (*)(char* data, size_t size, size_t count, void* context);
 
@@ -72,8 +79,18 @@ struct XferData {
 struct FormUploadData {
     XferData* xfer;
     std::string name;
-    unsigned long long size;
+    unsigned long long size;  ///< all ones is a size not known: the form goes out in chunks
     Json::Value params;
+};
+
+/** A browser's request that carries a file, shared with the web layer, whose own record may go on
+ * behind these members. */
+struct _tag_cgi_upload_progress_ {
+    unsigned long long current;  ///< bytes of the request consumed so far
+    unsigned long long total;    ///< the request's content length
+    /** 0; what GetUploadErrorCode says of the driver; -7 when the browser sent nothing for an hour
+     * or its bytes cannot be waited for; -9 for the rest. */
+    int error;
 };
 
 class ZYROVFS_API Cloud {
@@ -147,7 +164,8 @@ class ZYROVFS_API Cloud {
     static bool CopyFile(Cloud* src, Cloud* dst, const std::string& src_uri,
                          const std::string& dst_uri, long long size, ProgressCallback progress,
                          CancelCallback cancel, SpeedCallback speed);
-    /** Sends `size` bytes from the descriptor's position; a retry begins at its position 0. */
+    /** Sends `size` bytes from the descriptor's position; a retry begins at its position 0. -1 is a
+     * size not known: that of a regular file is found out, anything else is sent to its end. */
     static bool UploadFile(Cloud* cloud, const std::string& uri, int fd, long long size,
                            ProgressCallback progress, CancelCallback cancel, SpeedCallback speed);
     /** Receives into the descriptor, from its position on; what broke off goes on where it stopped,
@@ -164,6 +182,48 @@ class ZYROVFS_API Cloud {
                                      SpeedCallback speed);
     /** Exit status of an upload program, negative, by the driver's code; -9 for the rest. */
     static int GetUploadErrorCode(Cloud* cloud);
+
+    // --- relay between a browser and a driver, for a CGI program: no temporary file. One relay per
+    // process at a time; it is a transfer, too. The pointers must outlive the relay.
+    // ----------------
+
+    /**
+     * Prepares the upload of a file that the program's standard input brings: the multipart body
+     * of a request, positioned at the first byte of the file's content, `progress->current` bytes
+     * of `progress->total` consumed. `boundary` is the text that closes the part, its leading
+     * dashes included, of which the first 253 bytes count. `size` is the file's, -1 when it is not
+     * known; one that does not go with the request makes RelayUploadFile fail. `transferred`, if
+     * given, is added the bytes of the file. `cancel`, `relay_progress` and `speed` may be null.
+     * False, with `progress->error` set to -9, for a null argument, an empty boundary, and without
+     * a standard input.
+     */
+    static bool RelayUploadInit(Cloud* cloud, const char* uri, _tag_cgi_upload_progress_* progress,
+                                const char* boundary, RelayProgressCallback relay_progress,
+                                CancelCallback cancel, RelaySpeedCallback speed,
+                                unsigned long long* transferred, long long size);
+    /**
+     * Sends what RelayUploadInit has prepared, up to the first place in the last 131072 bytes of
+     * the request where the boundary begins a line: what follows the file in the request must be
+     * shorter than that. False leaves `progress->error` and the driver's record; a file that did
+     * not come whole, or not of the size that was told, is a failure. Needs a RelayUploadInit of
+     * its own each time. The rest of a request that failed is left in standard input.
+     */
+    static bool RelayUploadFile();
+    /**
+     * Prepares downloads of `path`, a share path. `mime`, if not empty, asks for a document in this
+     * format, where the service has formats. False for a null `cloud` or `path`.
+     */
+    static bool RelayDownloadInit(Cloud* cloud, const char* path, SpeedCallback speed,
+                                  const std::string& mime);
+    /** `mime` as it was given, with the file's size, or with 0 in its place when a format was asked
+     * for: that size is not known beforehand. */
+    static bool RelayDownloadGetFileSizeAndMimeType(long long* size, std::string& mime);
+    /**
+     * Receives into `fd`. Services are asked for the bytes from `from` up to and with the one at
+     * `to`; equal numbers ask for the whole file, and one byte cannot be asked for alone. May be
+     * called again for another part. False when not all of it came, and for numbers out of order.
+     */
+    static bool RelayDownloadFile(int fd, long long from, long long to);
 
     bool Upload(XferData* xfer, const Json::Value& meta);
     bool Download(XferData* xfer, const Json::Value& meta);

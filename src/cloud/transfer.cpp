@@ -1,8 +1,10 @@
 #include "cloud/transfer.h"
 
 #include <strings.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <climits>
 #include <memory>
 #include <new>
@@ -191,6 +193,16 @@ class Passes {
     const long long size_;
 };
 
+/** Bytes to send when nobody told: a file says it, anything else just ends. An empty file in the
+ * place of what was there is the worst guess. */
+long long SizeOf(int fd, long long size) {
+    struct stat file {};
+    if (size >= 0 || fstat(fd, &file) != 0 || !S_ISREG(file.st_mode)) {
+        return std::max(size, -1LL);
+    }
+    return std::max<long long>(0, file.st_size - lseek64(fd, 0, SEEK_CUR));
+}
+
 /** Where a file ends that is sent from its position on; -1 when it has no position. */
 long long SourceEnd(int fd, long long size) {
     const off64_t start = size < 0 ? -1 : lseek64(fd, 0, SEEK_CUR);
@@ -279,9 +291,10 @@ bool Cloud::UploadFile(Cloud* cloud, const std::string& uri, int fd, long long s
     return WithContext(cloud, [&](XferContext& context) {
         context.fd = fd;
         XferData xfer{FileReadCallback, 1, &context};
-        BeginTransfer(static_cast<unsigned long long>(size), {progress, cancel, speed});
-        transfer.source_end = SourceEnd(fd, size);
-        return cloud->Upload(&xfer, DescribeFile(*cloud, uri, size, "Upload"));
+        const long long bytes = SizeOf(fd, size);
+        BeginTransfer(static_cast<unsigned long long>(bytes), {progress, cancel, speed});
+        transfer.source_end = SourceEnd(fd, bytes);
+        return cloud->Upload(&xfer, DescribeFile(*cloud, uri, bytes, "Upload"));
     });
 }
 

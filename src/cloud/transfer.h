@@ -79,6 +79,9 @@ void SetPlatformErrorFromCode(__tag_vfs_err_ code);
  * chunk's size for a failure; a failed chunk of this very size goes through. */
 inline constexpr size_t kWriteFailed = 23;
 
+/** Platform error when fewer bytes could be moved than were there or announced. */
+inline constexpr unsigned int kPlatformShort = 0x3b00;
+
 /** Bytes of a local file, for an upload. */
 size_t FileReadCallback(char* data, size_t size, size_t count, void* context);
 /** Bytes into a local file or a buffer, for a download. */

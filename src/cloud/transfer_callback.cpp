@@ -24,7 +24,6 @@ namespace {
 
 constexpr long long kMostAtOnce = 131072;
 constexpr unsigned int kPlatformFailed = 0x8000;
-constexpr unsigned int kPlatformShort = 0x3b00;
 
 struct ErrnoRow {
     int error;

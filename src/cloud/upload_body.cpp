@@ -2,18 +2,31 @@
 
 #include <unistd.h>
 
+#include <algorithm>
+
+#include "cloud/transfer.h"
+#include "core/error_cell.h"
 #include "core/json.h"
+#include "core/log.h"
 
 namespace ZYROCloud {
 
-uint64_t TotalBytes(const Json::Value& meta) {
-    uint64_t total = 0;
-    ZYROVFS::json::toUInt64(meta["total_bytes"], total);
-    return total;
+using namespace ZYROVFS;
+
+UploadSize::UploadSize(const Json::Value& meta) : known(true), total(0) {
+    int64_t source = 0;
+    int64_t most = 0;
+    json::toInt64(meta["filesize"], source);
+    json::toUInt64(meta["total_bytes"], total);
+    if (json::toInt64(meta["total_bytes"], most) && most < 0) {
+        total = kSizeNotKnown;
+    }
+    known = source != -1 && total != kSizeNotKnown;
 }
 
-UploadBody::UploadBody(const XferData& xfer)
+UploadBody::UploadBody(const XferData& xfer, uint64_t announced)
     : xfer_(xfer),
+      announced_(announced),
       start_(xfer.context == nullptr || xfer.context->fd == -1
                  ? -1
                  : lseek64(xfer.context->fd, 0, SEEK_CUR)),
@@ -33,15 +46,35 @@ void UploadBody::GiveRewindTo(APIHandler& api) {
 }
 
 size_t UploadBody::Read(char* data, size_t size, size_t count, void* body) {
-    auto& self = *static_cast<UploadBody*>(body);
-    const size_t got = self.xfer_.callback(data, size, count, self.xfer_.context);
-    self.read_ = self.read_ || got != 0;
+    return static_cast<UploadBody*>(body)->ReadPiece(data, size * count);
+}
+
+size_t UploadBody::ReadPiece(char* data, size_t room) {
+    const uint64_t left = announced_ - sent_.count;
+    const auto want = static_cast<size_t>(std::min<uint64_t>(room, left));
+    if (want == 0) {
+        return 0;
+    }
+    const size_t got = xfer_.callback(data, 1, want, xfer_.context);
+    if (got > want) {
+        return got;  // a failure
+    }
+    const XferContext* context = xfer_.context;
+    const bool paused = context != nullptr && context->limited && context->chunk_left == 0;
+    sent_.count += got;
+    sent_.ended = got == 0 && !paused;
+    if (got == 0 && announced_ != kSizeNotKnown) {
+        LOG_ERROR("The file ended %llu bytes before its size",
+                  static_cast<unsigned long long>(left));
+        SetPlatformErr(kPlatformShort);
+        return CURL_READFUNC_ABORT;
+    }
     return got;
 }
 
-bool UploadBody::GoTo(curl_off_t offset) const {
+bool UploadBody::GoTo(curl_off_t offset) {
     if (!IsFile()) {
-        return offset == 0 && !read_;
+        return offset == 0 && sent_.count == 0;
     }
     XferContext& context = *xfer_.context;
     if (context.limited && offset > static_cast<curl_off_t>(piece_left_)) {
@@ -53,32 +86,42 @@ bool UploadBody::GoTo(curl_off_t offset) const {
     if (context.limited) {
         context.chunk_left = piece_left_ - static_cast<unsigned int>(offset);
     }
+    sent_ = {static_cast<uint64_t>(offset), false};
     return true;
 }
 
 int UploadBody::Seek(void* body, curl_off_t offset, int origin) {
-    const auto& self = *static_cast<UploadBody*>(body);
+    auto& self = *static_cast<UploadBody*>(body);
     return origin == SEEK_SET && offset >= 0 && self.GoTo(offset) ? CURL_SEEKFUNC_OK
                                                                   : CURL_SEEKFUNC_CANTSEEK;
 }
 
-bool SendUpload(Cloud& cloud, const XferData& xfer) {
+bool SendUpload(Cloud& cloud, const XferData& xfer, uint64_t announced, SentBytes* sent) {
     APIHandler* api = cloud.GetAPIHandler();
     if (api == nullptr || xfer.context == nullptr) {
         return false;
     }
-    UploadBody body(xfer);
+    UploadBody body(xfer, announced);
     if (api->IsForm()) {
         body.GiveRewindTo(*api);
     } else {
         body.GiveTo(*api);
     }
-    const bool sent = api->Process(0);
+    const bool done = api->Process(0);
     api->ForgetSeek();
     if (!api->IsForm()) {
         api->SetReadFunAndData(xfer.callback, xfer.context);
     }
-    return sent;
+    if (sent != nullptr) {
+        *sent = body.Sent();
+    }
+    return done;
+}
+
+bool IsAtEnd(const XferData& xfer) {
+    char byte = 0;
+    xfer.context->limited = false;
+    return xfer.callback != nullptr && xfer.callback(&byte, 1, 1, xfer.context) == 0;
 }
 
 AttemptPlan WholeUploadPlan(Cloud& cloud, const XferData& xfer, const std::string& what,

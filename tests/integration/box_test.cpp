@@ -9,6 +9,7 @@
 #include <memory>
 
 #include "support/cloudsim/cloudsim.h"
+#include "support/relay_input.h"
 #include "support/xattrtree/xattrtree.h"
 #include "zyrovfs/zyrovfs_netdrive.h"
 
@@ -251,6 +252,69 @@ TEST_F(BoxRoad, ARevokedAccountIsRefusedAndItsProfileKept) {
     EXPECT_EQ(amy->driver->GetErrorCode(), VFS_ERR_UNAUTHORIZED);
     EXPECT_EQ(amy->Token(VFS_CONFIG_SERVER, "refresh_token"), before);
     EXPECT_EQ(amy->Token(VFS_CONFIG_CONNECT, "refresh_token"), before);
+}
+
+// --- between a browser and the cloud
+// --------------------------------------------------------------
+
+/** A CGI program's part of an upload: standard input is a pipe from the web server. */
+class Browser {
+  public:
+    explicit Browser(const std::string& bytes) : sender_(bytes), input_(sender_.Get()) {}
+
+    bool Upload(Connection& to, const std::string& path, unsigned long long total, long long size) {
+        progress.total = total;
+        return Cloud::RelayUploadInit(to.driver.get(), (to.id + path).c_str(), &progress,
+                                      relay_input::kBoundary, nullptr, nullptr, nullptr, nullptr,
+                                      size) &&
+               Cloud::RelayUploadFile();
+    }
+
+    ZYROCloud::_tag_cgi_upload_progress_ progress{0, 0, 0};
+
+  private:
+    relay_input::Sender sender_;
+    relay_input::Input input_;
+};
+
+TEST_F(BoxRoad, ABrowsersFileGoesUpThroughAPipe) {
+    for (const size_t size : {size_t{0}, size_t{131073}, 5 * kMiB + 7}) {
+        const auto content = cloudsim::MakePattern(size, 5);
+        const std::string request = content->Bytes() + relay_input::Closing();
+        for (const long long known : {-1LL, static_cast<long long>(size)}) {
+            const std::string path = "/" + std::to_string(size) + (known < 0 ? "u" : "k");
+            Browser browser(request);
+            ASSERT_TRUE(browser.Upload(*amy, path, request.size(), known))
+                << amy->driver->GetError().toStyledString();
+            EXPECT_EQ(amy->account.Get(amy->account.Find(path)).sha1, content->Sha1());
+            EXPECT_EQ(browser.progress.current, request.size());
+            EXPECT_EQ(browser.progress.error, 0);
+        }
+    }
+}
+
+TEST_F(BoxRoad, ABrowserThatGoesAwayLeavesTheFileThatIsThere) {
+    amy->account.AddPath("/a.txt", "old");
+    amy->Show("/a.txt");
+    const std::string request = std::string(3 * kMiB, 'x') + relay_input::Closing();
+    Browser browser(request.substr(0, 2 * kMiB));
+    EXPECT_FALSE(browser.Upload(*amy, "/a.txt", request.size(), -1));
+    EXPECT_EQ(browser.progress.error, -9);
+    EXPECT_EQ(amy->account.Bytes(amy->account.Find("/a.txt")), "old");
+}
+
+TEST_F(BoxRoad, AFileComesDownToABrowserWholeAndInParts) {
+    const auto content = cloudsim::MakePattern(2 * kMiB, 6);
+    amy->account.AddContent(amy->account.Root(), "film", content);
+    amy->Show("/film");
+    const std::string uri = amy->id + "/film";
+    ASSERT_TRUE(Cloud::RelayDownloadInit(amy->driver.get(), uri.c_str(), nullptr, ""));
+    const File whole;
+    ASSERT_TRUE(Cloud::RelayDownloadFile(whole.Fd(), 0, 2 * kMiB));
+    EXPECT_EQ(whole.Sha1(), content->Sha1());
+    const File part;
+    ASSERT_TRUE(Cloud::RelayDownloadFile(part.Fd(), 1000000, 1000999));
+    EXPECT_EQ(cloudsim::MakeFile(part.Fd())->Bytes(), content->Bytes().substr(1000000, 1000));
 }
 
 }  // namespace

@@ -68,6 +68,9 @@ struct Capabilities {
     bool upload_survives_refusal = false;
     /** How an upload ends that no token can be had for. */
     __tag_vfs_err_ upload_without_token = VFS_ERR_UNAUTHORIZED;
+    /** A browser's file of unknown size beyond one request, with fields behind it. */
+    bool takes_any_stream = true;
+    bool streams_in_session = false;   ///< a file of unknown size, however small
     bool repeats_bad_answers = false;  ///< an answer that is no JSON is asked for again
     std::vector<StatusCase> statuses;
 };
@@ -209,6 +212,13 @@ class DriverTest : public profiles::ProfileTest, public testing::WithParamInterf
 class DriverItems : public DriverTest {};
 class DriverChanges : public DriverTest {};
 class DriverTransfer : public DriverTest {};
+class DriverRelay : public DriverTest {
+  protected:
+    /** From the browser to `path`; `size` as the library is told. */
+    bool Relay(const BrowserFile& file, const std::string& path, long long size);
+    void ExpectRefusal(const Fault& fault, bool known);
+    _tag_cgi_upload_progress_ progress{0, 0, 0};
+};
 class DriverCancel : public DriverTest {};
 class DriverSessions : public DriverTest {
   protected:
@@ -227,6 +237,7 @@ class DriverNames : public DriverTest {};
     INSTANTIATE_TEST_SUITE_P(Service, DriverItems, testing::Values(maker));    \
     INSTANTIATE_TEST_SUITE_P(Service, DriverChanges, testing::Values(maker));  \
     INSTANTIATE_TEST_SUITE_P(Service, DriverTransfer, testing::Values(maker)); \
+    INSTANTIATE_TEST_SUITE_P(Service, DriverRelay, testing::Values(maker));    \
     INSTANTIATE_TEST_SUITE_P(Service, DriverCancel, testing::Values(maker));   \
     INSTANTIATE_TEST_SUITE_P(Service, DriverSessions, testing::Values(maker)); \
     INSTANTIATE_TEST_SUITE_P(Service, DriverToken, testing::Values(maker));    \

@@ -22,7 +22,9 @@ Json::Value Attributes(const std::string& name, const std::string& parent_id, ui
     Json::Value attributes;
     attributes["name"] = Utils::EscapeDoubleQuote(name);
     attributes["parent"]["id"] = parent_id;
-    attributes["size"] = static_cast<Json::UInt64>(size);
+    if (size != kSizeNotKnown) {
+        attributes["size"] = static_cast<Json::UInt64>(size);
+    }
     return attributes;
 }
 
@@ -65,7 +67,7 @@ bool Box::UploadProcess(XferData* xfer, const Json::Value& meta) {
     return Guard(*this, [&] {
         return PreflightCheck(meta.get("id", "").asString(), meta.get("name", "").asString(),
                               meta.get("parent_id", "").asString(),
-                              meta.get("full_path", "").asString(), TotalBytes(meta)) &&
+                              meta.get("full_path", "").asString(), UploadSize(meta).total) &&
                DirectUpload(xfer, meta);
     });
 }
@@ -86,7 +88,8 @@ bool Box::SendForm(XferData* xfer, const Json::Value& meta) {
     if (!meta.isMember("name") || !meta.isMember("parent_id") || !meta.isMember("total_bytes")) {
         return false;
     }
-    const uint64_t total = TotalBytes(meta);
+    const UploadSize size(meta);
+    const uint64_t total = size.known ? size.total : kSizeNotKnown;
     FormUploadData form{xfer, "file", total, Json::Value()};
     form.params["attributes"] =
         json::toString(Attributes(meta["name"].asString(), meta["parent_id"].asString(), total));

@@ -13,6 +13,8 @@
 
 namespace ZYROCloud {
 
+struct SentBytes;
+
 class Dropbox : public DriverOf<DropboxErrorHandler> {
   public:
     using DriverOf::DriverOf;
@@ -63,14 +65,14 @@ class Dropbox : public DriverOf<DropboxErrorHandler> {
 
     // --- contents ------------------------------------------------------------------------------
 
-    /** One request up to 32 MiB, an upload session for more. */
+    /** One request up to 32 MiB, an upload session for more, and when there is no telling. */
     bool UploadProcess(XferData* xfer, const Json::Value& meta) override;
     /** A name that is taken gives a file under a changed one. */
     bool DirectUpload(XferData* xfer, const Json::Value& meta);
     bool ChunkedUpload(XferData* xfer, const Json::Value& meta);
     bool StartChunkUploadSession(std::string& out);
-    /** Sends `size` bytes as those from `*offset` on, which moves on, also for a place that the
-     * service refuses (VFS_ERR_RANGE_FAILED). */
+    /** Sends up to `size` bytes as those from `*offset` on, which moves on by what was sent, also
+     * for a place that the service refuses (VFS_ERR_RANGE_FAILED): then by all. */
     bool StartChunkUpload(XferData* xfer, const std::string& session, unsigned long long* offset,
                           unsigned long long size);
     bool CommitChunkUpload(const std::string& session, const std::string& path,
@@ -81,7 +83,10 @@ class Dropbox : public DriverOf<DropboxErrorHandler> {
     bool ReplaceTarget(const std::string& from, const std::string& to, const std::string& action,
                        const std::string& copy_ref);
     bool SendChunk(XferData* xfer, const std::string& session, const std::string& path,
-                   unsigned long long* offset, unsigned long long size);
+                   unsigned long long* offset, unsigned long long size, SentBytes& sent);
+    bool SendAt(XferData* xfer, const std::string& session, unsigned long long* offset,
+                unsigned long long size, SentBytes& sent);
+    bool SendToEnd(XferData* xfer, const std::string& session, const std::string& path);
     bool PrepareDownload(XferData* xfer, const Json::Value& meta, const std::string& path);
 };
 

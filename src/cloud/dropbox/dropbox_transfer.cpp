@@ -53,8 +53,8 @@ bool PrepareUpload(Cloud& cloud, Request& request, XferData* xfer) {
 
 bool Dropbox::UploadProcess(XferData* xfer, const Json::Value& meta) {
     return Guard(*this, [&] {
-        return TotalBytes(meta) <= kLargestDirect ? DirectUpload(xfer, meta)
-                                                  : ChunkedUpload(xfer, meta);
+        return UploadSize(meta).total <= kLargestDirect ? DirectUpload(xfer, meta)
+                                                        : ChunkedUpload(xfer, meta);
     });
 }
 
@@ -83,25 +83,45 @@ bool Dropbox::DirectUpload(XferData* xfer, const Json::Value& meta) {
 bool Dropbox::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
     return Guard(*this, [&] {
         const std::string path = ServerPath(meta);
-        const unsigned long long total = TotalBytes(meta);
+        const UploadSize size(meta);
+        const unsigned long long total = size.total;
         std::string session;
         if (path.empty() || !HasSource(xfer) || !StartChunkUploadSession(session)) {
             return false;
         }
         xfer->context->limited = true;
+        if (!size.known) {
+            return SendToEnd(xfer, session, path);
+        }
         unsigned long long offset = 0;
+        SentBytes sent;
         const auto send = [&](unsigned long long length) {
-            return SendChunk(xfer, session, path, &offset, length);
+            return SendChunk(xfer, session, path, &offset, length, sent);
         };
         const auto finish = [&] {
             if (offset != total) {
                 LOG_ERROR("upload size is not match");
+                if (GetErrorCode() == VFS_ERR_NONE) {
+                    SetError(VFS_ERR_TRANSFER_ABORTED, "");
+                }
                 return false;
             }
             return CommitChunkUpload(session, path, total);
         };
         return ForEachChunk(total, kLargestDirect, send, finish);
     });
+}
+
+/** A source that just ends: its size is what was sent when it has. */
+bool Dropbox::SendToEnd(XferData* xfer, const std::string& session, const std::string& path) {
+    unsigned long long offset = 0;
+    SentBytes sent;
+    while (!sent.ended) {
+        if (!SendChunk(xfer, session, path, &offset, kLargestDirect, sent)) {
+            return false;
+        }
+    }
+    return CommitChunkUpload(session, path, offset);
 }
 
 bool Dropbox::StartChunkUploadSession(std::string& out) {
@@ -125,10 +145,10 @@ bool Dropbox::StartChunkUploadSession(std::string& out) {
 }
 
 bool Dropbox::SendChunk(XferData* xfer, const std::string& session, const std::string& path,
-                        unsigned long long* offset, unsigned long long size) {
+                        unsigned long long* offset, unsigned long long size, SentBytes& sent) {
     const XferContext& context = *xfer->context;
     AttemptPlan plan;
-    plan.send = [&] { return StartChunkUpload(xfer, session, offset, size); };
+    plan.send = [&] { return SendAt(xfer, session, offset, size, sent); };
     plan.judge = [&](__tag_vfs_err_ code) {
         return JudgeUpload(*this, context, code == VFS_ERR_RANGE_FAILED);
     };
@@ -146,6 +166,12 @@ bool Dropbox::SendChunk(XferData* xfer, const std::string& session, const std::s
 
 bool Dropbox::StartChunkUpload(XferData* xfer, const std::string& session,
                                unsigned long long* offset, unsigned long long size) {
+    SentBytes sent;
+    return SendAt(xfer, session, offset, size, sent);
+}
+
+bool Dropbox::SendAt(XferData* xfer, const std::string& session, unsigned long long* offset,
+                     unsigned long long size, SentBytes& sent) {
     return Guard(*this, [&] {
         if (!HasSource(xfer) || offset == nullptr) {
             SetError(VFS_ERR_CLOUD_FAILED, "");
@@ -158,16 +184,17 @@ bool Dropbox::StartChunkUpload(XferData* xfer, const std::string& session,
         if (!PrepareUpload(*this, request, xfer)) {
             return false;
         }
-        const bool sent = SendUpload(*this, *xfer);
-        if (!sent) {
-            SetError(api->GetError());
-            LOG_ERROR(kRequestFailed, url.c_str(), json::toString(GetError()).c_str());
+        if (SendUpload(*this, *xfer, kSizeNotKnown, &sent)) {
+            *offset += sent.count;
+            return true;
         }
+        SetError(api->GetError());
+        LOG_ERROR(kRequestFailed, url.c_str(), json::toString(GetError()).c_str());
         // Callers go on behind a piece that the service found in the wrong place: it has it.
-        if (sent || GetErrorCode() == VFS_ERR_RANGE_FAILED) {
+        if (GetErrorCode() == VFS_ERR_RANGE_FAILED) {
             *offset += size;
         }
-        return sent;
+        return false;
     });
 }
 

@@ -1,5 +1,7 @@
 #include <strings.h>
+#include <unistd.h>
 
+#include <cerrno>
 #include <charconv>
 
 #include "cloud/answer_header.h"
@@ -216,7 +218,7 @@ class Session {
     }
 
     bool Seek() {
-        if (xfer_.context->fd == -1) {
+        if (xfer_.context->fd == -1 || IsFreshPipe()) {
             return IsAtStart();
         }
         if (total_ == kSizeNotKnown) {
@@ -232,6 +234,12 @@ class Session {
             drive_.SetError(VFS_ERR_CLOUD_FAILED, "");
         }
         return false;
+    }
+
+    /** Of a descriptor that just ends nothing is known, not even whether it can go back. */
+    bool IsFreshPipe() const {
+        return total_ == kSizeNotKnown && !sent_ && lseek64(xfer_.context->fd, 0, SEEK_CUR) < 0 &&
+               errno == ESPIPE;
     }
 
     /** A stream has nothing but its first byte to begin with. */

@@ -15,7 +15,7 @@ using namespace gdrive;
 
 bool GDrive::UploadProcess(XferData* xfer, const Json::Value& meta) {
     return Guard(*this, [&] {
-        const bool at_once = TotalBytes(meta) <= kLargestDirect && SourceSize(meta) != -1;
+        const bool at_once = UploadSize(meta).total <= kLargestDirect && SourceSize(meta) != -1;
         return at_once ? DirectUpload(xfer, meta) : ResumableUpload(xfer, meta);
     });
 }
@@ -39,7 +39,7 @@ bool GDrive::DirectUpload(XferData* xfer, const Json::Value& meta) {
 }
 
 bool GDrive::SendForm(XferData& xfer, const Json::Value& meta, const std::string& url) {
-    FormUploadData form{&xfer, "file", TotalBytes(meta), Json::Value()};
+    FormUploadData form{&xfer, "file", UploadSize(meta).total, Json::Value()};
     // The service tells the two parts apart by their order.
     form.params["Metadata"] = json::toString(Uploaded(meta));
     api->SetFormUploadData(&form);

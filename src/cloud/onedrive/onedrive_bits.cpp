@@ -25,6 +25,15 @@ std::string RangeText(long long offset, long long length, long long total) {
            std::to_string(total);
 }
 
+/** What each fragment has to tell. Of a browser's file it is known when the file is the last thing
+ * in the request; a file of another size fails. */
+int64_t FileSize(const Json::Value& meta, const UploadSize& size) {
+    int64_t total = 0;
+    const bool guess = !size.known && meta.isMember(kLikelyBytes);
+    json::toInt64(meta.get(guess ? kLikelyBytes : "total_bytes", 0), total);
+    return total;
+}
+
 /** Bytes of the file that the service has, by its last answer; 0 when it does not say. */
 long long Received(const APIHandler* api) {
     int64_t received = 0;
@@ -98,7 +107,7 @@ bool OneDrive::SendFragment(XferData* xfer, const std::string& url, long long le
     }
     xfer->context->chunk_size = static_cast<unsigned int>(length);
     xfer->context->chunk_left = static_cast<unsigned int>(length);
-    if (SendUpload(*this, *xfer)) {
+    if (SendUpload(*this, *xfer, static_cast<uint64_t>(length))) {
         return HasTaken();
     }
     SetError(api->GetError());
@@ -132,6 +141,19 @@ class Fragments {
         // which the service knows. It has said where it really is; the fragment itself follows.
         Believe();
         return offset_ < begin_ || offset_ >= end_ || (GoBack() && SendWithRetries(end_ - offset_));
+    }
+
+    /** Whether a file of a size that was guessed is no longer than that: closed, it would count as
+     * whole. */
+    bool EndsHere() {
+        if (IsAtEnd(xfer_)) {
+            return true;
+        }
+        drive_.SetError(VFS_ERR_NOT_SUPPORTED, "");
+        LOG_ERROR(
+            "The service takes no file of unknown size, and this one has more than %lld bytes",
+            total_);
+        return false;
     }
 
     bool Close() {
@@ -226,8 +248,8 @@ class Fragments {
 bool OneDrive::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
     return Guard(*this, [&] {
         const std::string url = meta.get("url", "").asString();
-        int64_t total = 0;
-        json::toInt64(meta.get("total_bytes", 0), total);
+        const UploadSize size(meta);
+        const int64_t total = FileSize(meta, size);
         std::string session;
         if (url.empty() || xfer == nullptr || xfer->context == nullptr ||
             !StartUploadSession(url, session)) {
@@ -237,12 +259,13 @@ bool OneDrive::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
             LOG_ERROR("Wrong size when uploading");
             return false;
         }
-        xfer->context->limited = true;
+        // A source that counts to the end of its request must not count for us.
+        xfer->context->limited = size.known;
         Fragments file(*this, *xfer, url, session, total);
         return ForEachChunk(
             static_cast<unsigned long long>(total), kMostAtOnce,
             [&](unsigned long long length) { return file.Send(static_cast<long long>(length)); },
-            [&] { return file.Close(); });
+            [&] { return (size.known || file.EndsHere()) && file.Close(); });
     });
 }
 

@@ -16,14 +16,6 @@ using namespace onedrive;
 
 namespace {
 
-/** The size of the source, as far as it is known; what comes from a browser may be shorter than
- * "total_bytes" says. */
-bool IsSizeKnown(const Json::Value& meta) {
-    int64_t size = 0;
-    json::toInt64(meta.get("filesize", 0), size);
-    return size >= 0 && meta.isMember("total_bytes");
-}
-
 /** Name and folder of a path. The folder ends where the name stands for the first time, be it that
  * of a folder on the way: what the system has uploaded so far lies where that leads. */
 void CutAtFirstName(const std::string& path, std::string& parent, std::string& name) {
@@ -67,9 +59,10 @@ bool OneDrive::SendWhole(XferData& xfer, const Json::Value& meta, const std::str
     if (!request.Put(url).Query(query).Prepare(&xfer)) {
         return false;
     }
-    int64_t total = 0;
-    json::toInt64(meta["total_bytes"], total);
-    if (!api->SetUploadOpt(false) || (IsSizeKnown(meta) && !api->SetUploadSize(total))) {
+    const UploadSize size(meta);
+    const bool announced = size.known && meta.isMember("total_bytes");
+    if (!api->SetUploadOpt(false) ||
+        (announced && !api->SetUploadSize(static_cast<long long>(size.total)))) {
         SetError(VFS_ERR_CLOUD_FAILED, "");
         return false;
     }

@@ -184,12 +184,9 @@ bool VFSCloud::UploadProcess(XferData* xfer, const Json::Value& meta) {
             return false;
         }
         api->SetUploadOpt(true);
-        if (IsDav(url)) {
-            int64_t total = -1;
-            json::toInt64(meta["total_bytes"], total);
-            if (total >= 1) {
-                api->SetUploadSize(total);
-            }
+        const UploadSize size(meta);
+        if (IsDav(url) && size.known && size.total >= 1) {
+            api->SetUploadSize(static_cast<long long>(size.total));
         }
         return Send(url);
     });

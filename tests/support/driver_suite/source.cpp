@@ -5,6 +5,7 @@
 #include <sys/mman.h>
 #include <unistd.h>
 
+#include <utility>
 #include <vector>
 
 namespace driver_suite {
@@ -35,6 +36,16 @@ Source::Source(const std::string& text) : size(static_cast<long long>(text.size(
     const auto content = cloudsim::MakeBytes(text);
     file = MakeFile(*content);
     sum = content->Sha1();
+}
+
+BrowserFile::BrowserFile(long long bytes, const std::string& behind) : size(bytes) {
+    Source file(bytes);
+    const std::string rest = std::string("\r\n") + kBoundary + behind;
+    EXPECT_EQ(pwrite(file.file.Get(), rest.data(), rest.size(), bytes),
+              static_cast<ssize_t>(rest.size()));
+    request = std::move(file.file);
+    total = static_cast<unsigned long long>(bytes) + rest.size();
+    sum = file.sum;
 }
 
 Target::Target() : file(memfd_create("target", 0)) {}

@@ -23,6 +23,17 @@ struct Source {
     std::string sum;
 };
 
+/** A browser's request with a made-up file in it, from the file's first byte on. */
+struct BrowserFile {
+    explicit BrowserFile(long long bytes, const std::string& behind = "--\r\n");
+
+    static constexpr const char* kBoundary = "--a-boundary-of-the-browser";
+    ZYROVFS::UniqueFd request;
+    long long size;            ///< of the file
+    unsigned long long total;  ///< of the request
+    std::string sum;
+};
+
 /** A file to receive into. */
 struct Target {
     Target();

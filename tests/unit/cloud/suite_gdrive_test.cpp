@@ -28,6 +28,7 @@ Capabilities GDriveCan() {
     can.copy_onto_file = can.copy_onto_folder = Meeting::kBeside;
     can.largest_file = 5497558138880;
     can.refused_file = 5497558138881;
+    can.streams_in_session = true;
     can.largest_direct = 33554432;
     can.statuses = {{400, VFS_ERR_TOKEN_REVOKED, false},
                     {403, VFS_ERR_FORBIDDEN, true},

@@ -12,6 +12,7 @@ Capabilities OneDriveCan() {
     can.hides_names = false;
     can.largest_file = 10737418240;
     can.refused_file = 10737418241;
+    can.takes_any_stream = false;
     can.largest_direct = 33554432;
     // The folder's id is asked for first, and a folder without one is not found.
     can.upload_without_token = VFS_ERR_NOT_FOUND;

@@ -100,6 +100,34 @@ TEST_F(Transfers, AnUploadOfMoreThanTwoGiBTellsItsSizeInFull) {
     EXPECT_EQ(last_done, static_cast<unsigned long long>(size));
 }
 
+TEST_F(Transfers, AnUploadOfUnknownSizeFindsOutTheSizeOfAFile) {
+    driver_.Keep();
+    Put("source", "0123456789");
+    for (const off_t position : {0, 4, 10, 15}) {
+        driver_.metas.clear();
+        const UniqueFd fd = Open("source");
+        lseek(fd.Get(), position, SEEK_SET);
+        EXPECT_TRUE(Upload(fd.Get(), -1));
+        const std::string rest = position > 10 ? "" : std::string("0123456789").substr(position);
+        EXPECT_EQ(driver_.kept, rest);
+        EXPECT_EQ(driver_.metas.at(0)["total_bytes"].asUInt(), rest.size());
+        EXPECT_EQ(driver_.metas[0]["filesize"].asUInt(), rest.size());
+    }
+}
+
+TEST_F(Transfers, AnUploadOfUnknownSizeThatIsNoFileIsSaidToBeUnknown) {
+    driver_.Keep();
+    int ends[2] = {-1, -1};
+    ASSERT_EQ(pipe(ends), 0);
+    ASSERT_EQ(write(ends[1], "abc", 3), 3);
+    close(ends[1]);
+    const UniqueFd from(ends[0]);
+    EXPECT_TRUE(Upload(from.Get(), -7));
+    EXPECT_EQ(driver_.kept, "abc");
+    EXPECT_EQ(driver_.metas.at(0)["total_bytes"].asInt64(), -1);
+    EXPECT_EQ(driver_.metas[0]["filesize"].asInt64(), -1);
+}
+
 TEST_F(Transfers, ADownloadWritesFromTheDescriptorsPositionOn) {
     Put("target", "0123456789");
     const UniqueFd fd = Open("target");

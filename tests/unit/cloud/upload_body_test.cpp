@@ -8,6 +8,7 @@
 #include <string>
 
 #include "core/handle.h"
+#include "core/json.h"
 #include "support/bare_driver.h"
 #include "support/seams.h"
 #include "support/wire_server.h"
@@ -142,6 +143,93 @@ TEST_F(UploadBodies, AnUploadInOneRequestSaysWhatItGaveUp) {
     seams::Reset();
     EXPECT_FALSE(RunAttempts(stream, once));
     EXPECT_TRUE(seams::Sleeps().empty());
+}
+
+// --- how much is sent ---------------------------------------------------------------------------
+
+TEST(UploadSizes, AreKnownUnlessTheFilesSizeIsMinusOne) {
+    const struct {
+        const char* meta;
+        bool known;
+        uint64_t total;
+    } rows[] = {
+        {"{}", true, 0},
+        {R"({"total_bytes":7})", true, 7},
+        {R"({"total_bytes":7,"filesize":7})", true, 7},
+        {R"({"total_bytes":"7","filesize":"7"})", true, 7},
+        {R"({"total_bytes":900,"filesize":-1})", false, 900},
+        {R"({"total_bytes":900,"filesize":"-1"})", false, 900},
+        {R"({"total_bytes":-1,"filesize":-1})", false, kSizeNotKnown},
+        {R"({"total_bytes":-1})", false, kSizeNotKnown},
+        {R"({"total_bytes":18446744073709551615})", false, kSizeNotKnown},
+        {R"({"total_bytes":{},"filesize":[]})", true, 0},
+        {R"({"total_bytes":6000000000,"filesize":6000000000})", true, 6000000000},
+    };
+    for (const auto& row : rows) {
+        Json::Value meta;
+        ASSERT_TRUE(ZYROVFS::json::fromString(meta, row.meta));
+        const UploadSize size(meta);
+        EXPECT_EQ(size.known, row.known) << row.meta;
+        EXPECT_EQ(size.total, row.total) << row.meta;
+    }
+    EXPECT_THROW(UploadSize(Json::Value(7)), Json::LogicError);
+}
+
+/** Sends the rest of the file as a body of unknown length. */
+class UploadCounts : public UploadBodies {
+  protected:
+    bool Send(uint64_t announced, SentBytes& sent) {
+        const wire::WireServer server({{wire::ReadRequest(), wire::Send(wire::Answer(201))}});
+        Json::Value headers;
+        headers["Expect"] = "";
+        APIHandler& api = *driver_.GetAPIHandler();
+        driver_.Init();
+        EXPECT_TRUE(api.Init() && driver_.InitXferData(&xfer_) && api.SetUploadOpt(true) &&
+                    api.AddHeader(headers));
+        if (announced != kSizeNotKnown) {
+            EXPECT_TRUE(api.SetUploadSize(static_cast<long long>(announced)));
+        }
+        api.SetURL(server.Url(), false);
+        return SendUpload(driver_, xfer_, announced, &sent);
+    }
+};
+
+TEST_F(UploadCounts, TellWhatWasSentAndThatTheSourceHasNoMore) {
+    SentBytes sent;
+    lseek(context_.fd, static_cast<off_t>(kSize) - 1000, SEEK_SET);
+    ASSERT_TRUE(Send(kSizeNotKnown, sent)) << seams::LogDump();
+    EXPECT_EQ(sent.count, 1000U);
+    EXPECT_TRUE(sent.ended);
+}
+
+TEST_F(UploadCounts, APieceThatIsFullIsNotTheEnd) {
+    SentBytes sent;
+    lseek(context_.fd, 0, SEEK_SET);
+    context_.limited = true;
+    context_.chunk_left = 1000;
+    ASSERT_TRUE(Send(kSizeNotKnown, sent)) << seams::LogDump();
+    EXPECT_EQ(sent.count, 1000U);
+    EXPECT_FALSE(sent.ended);
+    EXPECT_FALSE(IsAtEnd(xfer_));
+    lseek(context_.fd, 0, SEEK_END);
+    EXPECT_TRUE(IsAtEnd(xfer_));
+}
+
+TEST_F(UploadCounts, OfWhatWasAnnouncedNoMoreIsTaken) {
+    SentBytes sent;
+    lseek(context_.fd, 0, SEEK_SET);
+    ASSERT_TRUE(Send(1000, sent)) << seams::LogDump();
+    EXPECT_EQ(sent.count, 1000U);
+    EXPECT_EQ(lseek(context_.fd, 0, SEEK_CUR), 1000);
+}
+
+TEST_F(UploadCounts, LessThanWasAnnouncedEndsTheRequestAtOnce) {
+    SentBytes sent;
+    seams::Reset();
+    lseek(context_.fd, static_cast<off_t>(kSize) - 1000, SEEK_SET);
+    EXPECT_FALSE(Send(1001, sent));
+    EXPECT_TRUE(seams::Logged("The file ended 1 bytes before its size")) << seams::LogDump();
+    EXPECT_EQ(YLIBCErrGet(), 0x3b00U);
 }
 
 }  // namespace

@@ -3,6 +3,8 @@
 namespace ZYROCloud {
 namespace {
 
+using testing::Not;
+
 constexpr const char* kUploadPath = "/api/2.0/files/content";
 
 class BoxUpload : public BoxTest {
@@ -50,6 +52,24 @@ TEST_F(BoxUpload, TellsNameParentAndSizeInBothRequests) {
     for (const auto& entry : entries) {
         EXPECT_FALSE(entry.HasHeader("Expect"));
         EXPECT_EQ(entry.Header("Authorization"), box->Bearer());
+    }
+}
+
+TEST_F(BoxUpload, OfAnUnknownSizeTellsNoSizeThatMayBeWrongAndSendsAllThereIs) {
+    for (const long long most : {900LL, -1LL}) {
+        service.Journal().Clear();
+        Bytes bytes(1, "hello");
+        Json::Value meta = Meta("/a.txt", 0);
+        meta["total_bytes"] = static_cast<Json::Int64>(most);
+        meta["filesize"] = -1;
+        EXPECT_TRUE(box->UploadProcess(&bytes.xfer, meta)) << seams::LogDump();
+        EXPECT_EQ(Stored(), "hello") << most;
+        const auto entries = service.Journal().All();
+        // The check is for the space that there is: the most that may come has to fit.
+        EXPECT_EQ(Object(entries.front().body)["size"],
+                  most == -1 ? Json::Value() : Json::Value(900));
+        EXPECT_THAT(entries.back().body, Not(HasSubstr("\"size\"")));
+        EXPECT_EQ(entries.back().Header("Transfer-Encoding"), "chunked");
     }
 }
 

@@ -87,6 +87,43 @@ TEST_F(DropboxSession, RefusedAtAnyStepHasTheCodeOfTheStatus) {
     }
 }
 
+TEST_F(DropboxSession, OfAStreamOfUnknownSizeIsFinishedWhereTheStreamEnds) {
+    const std::pair<size_t, std::vector<unsigned long long>> rows[] = {
+        {5, {0}}, {kPiece, {0, kPiece}}, {kPiece + 1, {0, kPiece}}};
+    for (const auto& [size, offsets] : rows) {
+        Give({kStarted, kTaken, kTaken, kTaken});
+        Bytes bytes(1, content_.substr(0, size));
+        bytes.context.fd = -1;
+        EXPECT_TRUE(drive->UploadProcess(
+            &bytes.xfer,
+            Object(R"({"server_path":"/a.txt","total_bytes":90000000,"filesize":-1})")))
+            << size << seams::LogDump();
+        EXPECT_EQ(Offsets(), offsets) << size;
+        EXPECT_EQ(All().back().Line(), kFinish);
+        EXPECT_EQ(All().back().Argument()["cursor"]["offset"].asUInt64(), size);
+    }
+}
+
+TEST_F(DropboxSession, OfAStreamOfUnknownSizeThatFailsIsNeitherRepeatedNorFinished) {
+    Give({kStarted, kTaken, Answer(503)});
+    Bytes bytes(1, content_);
+    bytes.context.fd = -1;
+    EXPECT_FALSE(drive->UploadProcess(
+        &bytes.xfer, Object(R"({"server_path":"/a.txt","total_bytes":-1,"filesize":-1})")));
+    EXPECT_THAT(Requests(), ElementsAre(kStart, kAppend, kAppend));
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_RATE_LIMITED);
+}
+
+TEST_F(DropboxSession, OfAFileThatIsShorterThanItsSizeIsNotFinished) {
+    Give({kStarted, kTaken});
+    Bytes bytes(1, "four");
+    EXPECT_FALSE(
+        drive->ChunkedUpload(&bytes.xfer, Object(R"({"server_path":"/a.txt","total_bytes":5})")));
+    EXPECT_THAT(Requests(), ElementsAre(kStart, kAppend));
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_TRANSFER_ABORTED);
+    EXPECT_TRUE(seams::Logged("upload size is not match")) << seams::LogDump();
+}
+
 TEST_F(DropboxSession, RefusedSaysAtWhichStep) {
     Give({Answer(400)});
     EXPECT_FALSE(UploadLittle());

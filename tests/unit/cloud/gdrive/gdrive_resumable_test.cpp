@@ -1,5 +1,7 @@
 #include <algorithm>
 
+#include "cloud/size_limit.h"
+#include "cloud/transfer.h"
 #include "unit/cloud/gdrive/gdrive_upload_fixture.h"
 
 namespace ZYROCloud {
@@ -210,14 +212,27 @@ TEST_F(GDriveResumable, BeginsAtTheFirstByteOfAFileWhereverThatStands) {
 
 class GDriveFile : public GDriveResumable {
   protected:
-    bool Upload(long long size) {
-        const UniqueFd file(memfd_create("file", MFD_CLOEXEC));
+    GDriveFile() : file(memfd_create("file", MFD_CLOEXEC)) {
         const auto length = static_cast<ssize_t>(whole.size());
         EXPECT_EQ(write(file.Get(), whole.data(), whole.size()), length);
         lseek(file.Get(), 0, SEEK_SET);
+    }
+    bool Upload(long long size) {
         return Cloud::UploadFile(drive.get(), server_id + "/a.bin", file.Get(), size, nullptr,
                                  nullptr, nullptr);
     }
+    /** As from a caller who knows no size. */
+    bool UploadToItsEnd() {
+        BeginTransfer(kSizeNotKnown, {});
+        XferContext context;
+        context.fd = file.Get();
+        XferData xfer{FileReadCallback, 1, &context};
+        Json::Value meta;
+        EXPECT_TRUE(drive->GetMetaDataByURI(server_id + "/a.bin", meta, "Upload"));
+        meta["total_bytes"] = meta["filesize"] = -1;
+        return drive->Upload(&xfer, meta);
+    }
+    const UniqueFd file;
     const std::string whole = Content(kDirect + 100);
 };
 
@@ -234,7 +249,7 @@ TEST_F(GDriveFile, ThatIsLongerThanAnnouncedIsStoredUpToThere) {
 }
 
 TEST_F(GDriveFile, OfASizeThatNobodyKnowsIsStoredWhole) {
-    EXPECT_TRUE(Upload(-1)) << seams::LogDump();
+    EXPECT_TRUE(UploadToItsEnd()) << seams::LogDump();
     EXPECT_TRUE(Stored() == whole);
     EXPECT_EQ(Put(1).Header("Transfer-Encoding"), "chunked");
 }
@@ -242,7 +257,7 @@ TEST_F(GDriveFile, OfASizeThatNobodyKnowsIsStoredWhole) {
 TEST_F(GDriveFile, OfASizeThatNobodyKnowsIsSentAgainFromItsStart) {
     service.AddFault(OnPut(1).Answer(503));
     service.AddFault(Arrived(2, "bytes=0-524287"));
-    EXPECT_TRUE(Upload(-1)) << seams::LogDump();
+    EXPECT_TRUE(UploadToItsEnd()) << seams::LogDump();
     EXPECT_TRUE(Stored() == whole);
     EXPECT_FALSE(Put(3).HasHeader("Content-Range"));
 }

@@ -456,5 +456,37 @@ TEST_F(OneDriveBits, AFragmentWithoutASourceFailsAndTheOffsetIsTheServicesWord) 
     EXPECT_THAT(Requests(), IsEmpty());
 }
 
+TEST_F(OneDriveBits, OfAnUnknownSizeTakesTheLikelyOneAndClosesOnlyWhenItWasRight) {
+    const struct {
+        long long likely;
+        bool right;
+        std::vector<std::string> packets;
+        __tag_vfs_err_ code;
+    } rows[] = {
+        {10, true, {"Create-Session", "Fragment", "Close-Session"}, VFS_ERR_NONE},
+        {9, false, {"Create-Session", "Fragment"}, VFS_ERR_NOT_SUPPORTED},
+        {11, false, {"Create-Session"}, VFS_ERR_TRANSFER_ABORTED},
+    };
+    for (const auto& row : rows) {
+        Give({opened, Has(row.likely), ok});
+        lseek(file.Get(), kTotal - 10, SEEK_SET);
+        BeginTransfer(10, {});
+        XferContext context;
+        XferData xfer{[](char* to, size_t size, size_t count, void*) {
+                          return static_cast<size_t>(read(file.Get(), to, size * count));
+                      },
+                      1, &context};
+        Json::Value meta = Object(R"({"total_bytes":90000000,"filesize":-1})");
+        meta["url"] = Api("/storage");
+        meta["likely_bytes"] = static_cast<Json::Int64>(row.likely);
+        drive->SetError(VFS_ERR_NONE, "");
+        EXPECT_EQ(drive->ChunkedUpload(&xfer, meta), row.right) << row.likely << seams::LogDump();
+        EXPECT_EQ(drive->GetErrorCode(), row.code) << row.likely;
+        const std::vector<std::string> packets = Packets();
+        EXPECT_TRUE(std::equal(row.packets.begin(), row.packets.end(), packets.begin()));
+        EXPECT_EQ(std::count(packets.begin(), packets.end(), "Close-Session"), row.right ? 1 : 0);
+    }
+}
+
 }  // namespace
 }  // namespace ZYROCloud

@@ -201,6 +201,14 @@ TEST_F(VfsCloud, AWebdavUploadOfSizeZeroOrOfUnknownSizeSetsNoUploadSize) {
         EXPECT_EQ(curl_seam::Values(CURLOPT_INFILESIZE_LARGE), c.sizes) << c.url << c.total;
         EXPECT_THAT(curl_seam::Values(CURLOPT_UPLOAD), ElementsAre(1));
     }
+    // As long as the request that brings it, and shorter.
+    curl_seam::Now() = curl_seam::State();
+    Results({CURLE_OK});
+    Content content(1);
+    Json::Value meta = Meta("dav://x/a", 900);
+    meta["filesize"] = -1;
+    EXPECT_TRUE(cloud.UploadProcess(&content.xfer, meta));
+    EXPECT_THAT(curl_seam::Values(CURLOPT_INFILESIZE_LARGE), testing::IsEmpty());
 }
 
 TEST_F(VfsCloud, OnlyTheCodePageUtf8TurnsTheServersUtf8On) {

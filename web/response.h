@@ -1,0 +1,24 @@
+/** Answers, with the headers that keep a browser from running any of it. */
+#ifndef ZYROVFS_WEB_RESPONSE_H
+#define ZYROVFS_WEB_RESPONSE_H
+
+#include <json/value.h>
+
+#include <string>
+
+namespace web {
+
+/** Writes all of it to the web server. False when that has gone away. */
+bool Write(const std::string& bytes);
+
+/** Status line and headers of an answer; `headers` are lines of their own, "\r\n" at each end. */
+std::string Head(int status, const std::string& type, const std::string& headers = "");
+
+void AnswerJson(int status, const Json::Value& value);
+
+/** Reads what a browser is still sending, up to a bound: it shows an answer only then. */
+void DrainInput();
+
+}  // namespace web
+
+#endif
