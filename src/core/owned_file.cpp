@@ -65,7 +65,7 @@ bool WriteFresh(int fd, const std::string& text, mode_t mode, FileOwner owner) {
 }  // namespace
 
 bool OwnedFolder::Stat(const std::string& name, struct stat& info) const {
-    if (!IsNameOrInvalid(name) ||
+    if (!fd_ || !IsNameOrInvalid(name) ||
         fstatat(fd_.Get(), name.c_str(), &info, AT_SYMLINK_NOFOLLOW) != 0) {
         return false;
     }
