@@ -73,10 +73,18 @@ bool OwnedFolder::Stat(const std::string& name, struct stat& info) const {
         return true;
     }
     struct stat own {};
-    const bool anybody_may_plant =
-        fstat(fd_.Get(), &own) == 0 && (own.st_mode & (S_IWGRP | S_IWOTH)) != 0;
-    errno = anybody_may_plant && MoveAside(name) ? ENOENT : EPERM;
+    const bool planted = ours_ && fstat(fd_.Get(), &own) == 0 &&
+                         (own.st_mode & (S_IWGRP | S_IWOTH)) != 0 && MoveAside(name);
+    errno = planted ? ENOENT : EPERM;
     return false;
+}
+
+bool OwnedFolder::MoveStrangerAside(const std::string& name) const {
+    struct stat info {};
+    if (!fd_ || fstatat(fd_.Get(), name.c_str(), &info, AT_SYMLINK_NOFOLLOW) != 0) {
+        return fd_ && errno == ENOENT;
+    }
+    return Believes(info) || MoveAside(name);
 }
 
 UniqueFd OwnedFolder::OpenFile(const std::string& name, int flags) const {

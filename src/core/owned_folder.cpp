@@ -143,7 +143,7 @@ OwnedFolder OwnedFolder::Open(const std::string& path, uid_t user) {
     }
     size_t at = MachinePart(path);
     const std::string start = at > 0 ? path.substr(0, at) : path[0] == '/' ? "/" : ".";
-    OwnedFolder folder(UniqueFd(open(start.c_str(), kEnter)), user);
+    OwnedFolder folder(UniqueFd(open(start.c_str(), kEnter)), user, IsOurFolder(path));
     while (folder && (at = path.find_first_not_of('/', at)) != std::string::npos) {
         const size_t end = std::min(path.find('/', at), path.size());
         if (!folder.Enter(path.substr(at, end - at), path.substr(0, end))) {

@@ -31,8 +31,8 @@ mode_t SafeFolderMode(const std::string& path, mode_t mode);
 /**
  * An open folder. Its operations take names of entries, never paths, and work by descriptor, so
  * that what was checked is what is used. What they find counts only when it belongs to root or to
- * the user; what a stranger has planted in a folder that all may write to is moved aside, under a
- * name that begins with ".foreign.", and then counts as missing. Failures leave errno.
+ * the user; what a stranger has planted in a folder of ours that all may write to is moved aside,
+ * under a name that begins with ".foreign.", and then counts as missing. Failures leave errno.
  */
 class OwnedFolder {
   public:
@@ -50,8 +50,11 @@ class OwnedFolder {
     explicit operator bool() const { return static_cast<bool>(fd_); }
     int Get() const { return fd_.Get(); }
 
-    /** Describes an entry, links not followed. ENOENT also for a stranger's. */
+    /** Describes an entry, links not followed. A stranger's fails with ENOENT when it could be moved
+     * aside, with EPERM where that is not ours to do. */
     bool Stat(const std::string& name, struct stat& info) const;
+    /** Moves aside what a stranger has under this name; also in a folder that is not our own. */
+    bool MoveStrangerAside(const std::string& name) const;
     /** Opens a regular file that is there: no link, no FIFO, no device, no further name of a file
      * that stands elsewhere. */
     UniqueFd OpenFile(const std::string& name, int flags) const;
@@ -85,13 +88,15 @@ class OwnedFolder {
     bool SetMode(mode_t mode) const;
 
   private:
-    OwnedFolder(UniqueFd fd, uid_t user) : fd_(std::move(fd)), user_(user) {}
+    OwnedFolder(UniqueFd fd, uid_t user, bool ours)
+        : fd_(std::move(fd)), user_(user), ours_(ours) {}
     bool Enter(const std::string& name, const std::string& path);
     bool Believes(const struct stat& info) const;
     bool MoveAside(const std::string& name) const;
 
     UniqueFd fd_;
     uid_t user_ = 0;
+    bool ours_ = false;
 };
 
 }  // namespace ZYROVFS
