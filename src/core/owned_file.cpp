@@ -151,6 +151,9 @@ bool OwnedFolder::Read(const std::string& name, size_t limit, std::string& text)
 bool OwnedFolder::Replace(const std::string& name, const std::string& text, mode_t mode,
                           FileOwner owner) const noexcept try {
     struct stat old {};
+    if (!fd_) {
+        return false;
+    }
     Stat(name, old);  // a stranger's file in a sticky folder would keep the user from its place
     const std::string fresh = RandomName(name);
     UniqueFd fd = fresh.empty() || !IsNameOrInvalid(name) ? UniqueFd()

@@ -48,10 +48,12 @@ bool IsShared(const std::string& path) {
     return IsSharedConfig(path) || IsListed(path, paths::kSharedVolatileFolders);
 }
 
-/** Whether others may remove and rename what is not theirs. Group root is root. */
-bool IsLoose(const struct stat& info) {
+/** Whether others may remove and rename what is not theirs, or in the configuration put anything of
+ * theirs. Group root is root. */
+bool IsLoose(const std::string& path, const struct stat& info) {
     const mode_t others = info.st_gid == 0 ? S_IWOTH : kOthersMayWrite;
-    return (info.st_mode & others) != 0 && (info.st_mode & S_ISVTX) == 0;
+    return (info.st_mode & others) != 0 &&
+           ((info.st_mode & S_ISVTX) == 0 || IsSharedConfig(path));
 }
 
 mode_t Tightened(const std::string& path, mode_t mode) {
@@ -123,7 +125,7 @@ bool OwnedFolder::Enter(const std::string& name, const std::string& path) {
         return false;
     }
     if (Believes(info)) {
-        if (IsLoose(info) && !Tighten(next.Get(), path, info)) {
+        if (IsLoose(path, info) && !Tighten(next.Get(), path, info)) {
             return false;
         }
     } else if (!IsShared(path)) {
