@@ -47,7 +47,7 @@ bool IsText(const std::string& text) {
  * the lock is root's alone, so nobody else can hold it. */
 UniqueFd LockDocument() {
     constexpr unsigned kKeepOwner = static_cast<unsigned>(-1);
-    Utils::MkdirP(paths::kConfigRoot, nullptr, 0, kKeepOwner, kKeepOwner, 0755);
+    ZYROVFS::Utils::MkdirP(paths::kConfigRoot, nullptr, 0, kKeepOwner, kKeepOwner, 0755);
     const std::string path = std::string(paths::kServiceConfig) + ".lock";
     const EntryPath place = SplitPath(path);
     UniqueFd fd = OwnedFolder::Open(place.folder, 0).Lock(place.name, LOCK_EX, 0600);
