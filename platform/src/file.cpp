@@ -62,15 +62,15 @@ int AppendNames(const char* path, std::string_view suffix, PYLIBCSZLIST* list) {
     return static_cast<int>(names.size());
 }
 
-/** Root touches files in users' folders: a link there is not followed, and nothing is waited for. */
+/** Root touches files in users' folders: a link there is not followed, and nothing is waited for.
+ */
 bool Touch(const std::string& path) {
     std::string name;
     const zos::Fd dir = zos::OpenFolderOf(path, name);
     struct stat info {};
     if (dir && fstatat(dir.Get(), name.c_str(), &info, AT_SYMLINK_NOFOLLOW) == 0) {
         errno = S_ISLNK(info.st_mode) ? ELOOP : 0;
-        return errno == 0 &&
-               utimensat(dir.Get(), name.c_str(), nullptr, AT_SYMLINK_NOFOLLOW) == 0;
+        return errno == 0 && utimensat(dir.Get(), name.c_str(), nullptr, AT_SYMLINK_NOFOLLOW) == 0;
     }
     const zos::Fd fd = dir && errno == ENOENT ? zos::OpenOrMake(path, O_WRONLY, 0666) : zos::Fd();
     // Times are set once more, for a file that somebody else made between the two calls.

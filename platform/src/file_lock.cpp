@@ -31,9 +31,8 @@ int YLIBCFileLockTimeByFile(const char* path, int exclusive, int seconds, int* f
         return 0;
     }
     *fd = -1;
-    zos::Fd file = zos::OrOutOfMemory(zos::Fd(), [path] {
-        return zos::OpenOrMake(path, O_RDWR, 0600);
-    });
+    zos::Fd file =
+        zos::OrOutOfMemory(zos::Fd(), [path] { return zos::OpenOrMake(path, O_RDWR, 0600); });
     if (!file) {
         SET_SYSTEM_ERROR(ZOS_ERR_OPEN_FAILED);
         return 0;

@@ -21,8 +21,8 @@ Fd OpenFolderOf(const std::string& path, std::string& name);
 Fd EnterRootsFolder(int parent, const char* name, bool make, mode_t mode);
 
 /**
- * Opens a regular file, made with `mode` if it is missing; no FIFO is waited for. In two steps, since
- * the kernel may refuse to open by O_CREAT what another owner has in a sticky folder.
+ * Opens a regular file, made with `mode` if it is missing; no FIFO is waited for. In two steps,
+ * since the kernel may refuse to open by O_CREAT what another owner has in a sticky folder.
  */
 Fd OpenOrMake(const std::string& path, int flags, mode_t mode);
 

@@ -11,6 +11,7 @@
 #include "core/entry_name.h"
 #include "core/fd_io.h"
 #include "core/owned_folder.h"
+#include "core/user_mount.h"
 
 namespace ZYROVFS {
 namespace {
@@ -65,8 +66,14 @@ bool WriteFresh(int fd, const std::string& text, mode_t mode, FileOwner owner) {
 }  // namespace
 
 bool OwnedFolder::Stat(const std::string& name, struct stat& info) const {
-    if (!fd_ || !IsNameOrInvalid(name) ||
-        fstatat(fd_.Get(), name.c_str(), &info, AT_SYMLINK_NOFOLLOW) != 0) {
+    if (!fd_ || !IsNameOrInvalid(name)) {
+        return false;
+    }
+    if (IsUsersMount(fd_.Get(), name.c_str())) {
+        errno = EPERM;
+        return false;
+    }
+    if (fstatat(fd_.Get(), name.c_str(), &info, AT_SYMLINK_NOFOLLOW) != 0) {
         return false;
     }
     if (Believes(info)) {
@@ -156,8 +163,8 @@ bool OwnedFolder::Replace(const std::string& name, const std::string& text, mode
     }
     Stat(name, old);  // a stranger's file in a sticky folder would keep the user from its place
     const std::string fresh = RandomName(name);
-    UniqueFd fd = fresh.empty() || !IsNameOrInvalid(name) ? UniqueFd()
-                                                          : MakeFile(fresh, O_WRONLY, 0600);
+    UniqueFd fd =
+        fresh.empty() || !IsNameOrInvalid(name) ? UniqueFd() : MakeFile(fresh, O_WRONLY, 0600);
     if (!fd) {
         return false;
     }
@@ -190,9 +197,8 @@ bool OwnedFolder::MakeLink(const std::string& name, const char* target) const {
 bool OwnedFolder::ReadLink(const std::string& name, std::string& target) const {
     char buffer[PATH_MAX];
     struct stat info {};
-    const ssize_t length = Stat(name, info)
-                               ? readlinkat(fd_.Get(), name.c_str(), buffer, sizeof buffer)
-                               : -1;
+    const ssize_t length =
+        Stat(name, info) ? readlinkat(fd_.Get(), name.c_str(), buffer, sizeof buffer) : -1;
     if (length < 0) {
         return false;
     }
@@ -210,7 +216,8 @@ bool OwnedFolder::MakeFolder(const std::string& name, mode_t mode, FileOwner own
         return true;
     }
     const int saved = errno;
-    unlinkat(fd_.Get(), name.c_str(), AT_REMOVEDIR);  // half made, it would pass for ready next time
+    unlinkat(fd_.Get(), name.c_str(),
+             AT_REMOVEDIR);  // half made, it would pass for ready next time
     errno = saved;
     return false;
 }

@@ -12,6 +12,7 @@
 #include "core/entry_name.h"
 #include "core/identity.h"
 #include "core/paths.h"
+#include "core/user_mount.h"
 
 namespace ZYROVFS {
 namespace {
@@ -52,8 +53,7 @@ bool IsShared(const std::string& path) {
  * theirs. Group root is root. */
 bool IsLoose(const std::string& path, const struct stat& info) {
     const mode_t others = info.st_gid == 0 ? S_IWOTH : kOthersMayWrite;
-    return (info.st_mode & others) != 0 &&
-           ((info.st_mode & S_ISVTX) == 0 || IsSharedConfig(path));
+    return (info.st_mode & others) != 0 && ((info.st_mode & S_ISVTX) == 0 || IsSharedConfig(path));
 }
 
 mode_t Tightened(const std::string& path, mode_t mode) {
@@ -77,8 +77,8 @@ bool Tighten(int fd, const std::string& path, const struct stat& info) {
     }
     const EffectiveUid as_root(0);
     const UniqueFd folder = Reopen(fd);
-    return (folder && fchmod(folder.Get(), Tightened(path, info.st_mode)) == 0) ||
-           errno == EROFS || (errno == EPERM || errno == EACCES);
+    return (folder && fchmod(folder.Get(), Tightened(path, info.st_mode)) == 0) || errno == EROFS ||
+           (errno == EPERM || errno == EACCES);
 }
 
 /** What is in it stays with those whose it is: users may have live mounts below. */
@@ -121,6 +121,10 @@ bool OwnedFolder::MoveAside(const std::string& name) const {
 bool OwnedFolder::Enter(const std::string& name, const std::string& path) {
     UniqueFd next(openat(fd_.Get(), name.c_str(), kEnter | O_NOFOLLOW));
     struct stat info {};
+    if (next && IsUsersMount(next.Get(), "")) {
+        errno = EPERM;
+        return false;
+    }
     if (!next || fstat(next.Get(), &info) != 0) {
         return false;
     }

@@ -50,8 +50,8 @@ class OwnedFolder {
     explicit operator bool() const { return static_cast<bool>(fd_); }
     int Get() const { return fd_.Get(); }
 
-    /** Describes an entry, links not followed. A stranger's fails with ENOENT when it could be moved
-     * aside, with EPERM where that is not ours to do. */
+    /** Describes an entry, links not followed. A stranger's fails with ENOENT when it could be
+     * moved aside, with EPERM where that is not ours to do. */
     bool Stat(const std::string& name, struct stat& info) const;
     /** Moves aside what a stranger has under this name; also in a folder that is not our own. */
     bool MoveStrangerAside(const std::string& name) const;

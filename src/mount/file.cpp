@@ -48,9 +48,9 @@ bool WriteFile(const char* path, const char* text) {
     const UniqueFd fd = folder.OpenOrMake(SplitPath(path).name, O_RDWR, 0600);
     if (!fd) {
         // What is no regular file is told as what it is: nothing to truncate.
-        LOG_ERROR(errno == EINVAL ? "Could not truncate PID file [%s], %m"
-                                  : "Can't open file %s, %m",
-                  path);
+        LOG_ERROR(
+            errno == EINVAL ? "Could not truncate PID file [%s], %m" : "Can't open file %s, %m",
+            path);
         return false;
     }
     struct flock range = WholeFileForWriting();

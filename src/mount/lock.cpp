@@ -145,8 +145,7 @@ bool LockMnt(bool exclusive) {
         LOG_ERROR("Failed to lock init");
         return false;
     }
-    if (!TakeWithin110Seconds(*FindSlot(kMntMask), path, actor,
-                              exclusive ? kExclusive : kShared)) {
+    if (!TakeWithin110Seconds(*FindSlot(kMntMask), path, actor, exclusive ? kExclusive : kShared)) {
         LOG_ERROR("Failed to lock %s, %m", path.c_str());
         return false;
     }

@@ -68,7 +68,8 @@ Rules MakeRules(int replace_non_dir, unsigned uid, unsigned gid, unsigned mode) 
     };
 }
 
-/** Who stands above may do as root likes; a link that others could have put there is none to follow.
+/** Who stands above may do as root likes; a link that others could have put there is none to
+ * follow.
  */
 bool IsRootsLink(int above, const char* name, const char* path) {
     struct stat folder {};

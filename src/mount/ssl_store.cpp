@@ -230,8 +230,7 @@ bool Utils::DownloadCert(const char* user, const char* password, const char* url
         }
         const EntryPath place = SplitPath(certPath);
         struct stat info {};
-        if (save_failed ||
-            !OwnedFolder::Open(place.folder, GetActorUID()).Stat(place.name, info)) {
+        if (save_failed || !OwnedFolder::Open(place.folder, GetActorUID()).Stat(place.name, info)) {
             LOG_ERROR("Failed to save cert %s", certPath);
             return Fail(VFS_ERR_FAILED);
         }
