@@ -1,12 +1,10 @@
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <cstring>
 
 #include "core/log.h"
 #include "core/paths.h"
 #include "http/api_handler.h"
+#include "mount/known_hosts.h"
 #include "mount/ssl_verify.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
@@ -19,11 +17,6 @@ namespace {
 
 bool StartsWith(const std::string& text, const char* start) {
     return text.compare(0, strlen(start), start) == 0;
-}
-
-/** As the effective user sees it. */
-bool IsThere(const std::string& path) {
-    return faccessat(AT_FDCWD, path.c_str(), F_OK, AT_EACCESS) == 0;
 }
 
 /** User, password and query of a URL are nobody else's business. */
@@ -109,7 +102,7 @@ bool APIHandler::SetVFSURL(const std::string& url) {
     }
     const bool ssh = StartsWith(url, "sftp://");
     const std::string known_hosts = paths::KnownHosts(GetActorUID());
-    if (ssh && IsThere(known_hosts)) {
+    if (ssh && HasKnownHosts(GetActorUID())) {
         Logged(curl_easy_setopt(curl_, CURLOPT_SSH_KNOWNHOSTS, known_hosts.c_str()));
     }
     if (ssh || StartsWith(url, "ftp://") || StartsWith(url, "ftps://")) {
