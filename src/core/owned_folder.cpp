@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <charconv>
 #include <cstring>
 #include <iterator>
 
@@ -29,6 +30,19 @@ bool IsListed(const std::string& path, const char* const (&list)[N]) {
 bool IsBelow(const std::string& path, const char* folder) {
     const size_t length = strlen(folder);
     return path.compare(0, length, folder) == 0 && path.size() > length && path[length] == '/';
+}
+
+/** Whose a path of ours is: it says so behind the folder that all users share. */
+uid_t UserOf(const std::string& path, uid_t otherwise) {
+    for (const char* folder : paths::kFoldersOfUsers) {
+        uid_t user = 0;
+        const char* begin = path.c_str() + strlen(folder) + 1;
+        if (IsBelow(path, folder)) {
+            const auto [end, error] = std::from_chars(begin, path.c_str() + path.size(), user);
+            return error == std::errc() && (*end == '/' || *end == '\0') ? user : otherwise;
+        }
+    }
+    return otherwise;
 }
 
 /** How much of an absolute path the machine's own folders make. */
@@ -149,7 +163,8 @@ OwnedFolder OwnedFolder::Open(const std::string& path, uid_t user) {
     }
     size_t at = MachinePart(path);
     const std::string start = at > 0 ? path.substr(0, at) : path[0] == '/' ? "/" : ".";
-    OwnedFolder folder(UniqueFd(open(start.c_str(), kEnter)), user, IsOurFolder(path));
+    OwnedFolder folder(UniqueFd(open(start.c_str(), kEnter)), UserOf(path, user),
+                       IsOurFolder(path));
     while (folder && (at = path.find_first_not_of('/', at)) != std::string::npos) {
         const size_t end = std::min(path.find('/', at), path.size());
         if (!folder.Enter(path.substr(at, end - at), path.substr(0, end))) {

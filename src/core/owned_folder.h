@@ -39,11 +39,12 @@ class OwnedFolder {
     OwnedFolder() = default;
 
     /**
-     * Reaches `path`, which has to be there. On the way, what is ours and open to the harm of
-     * others is repaired as far as this process may: a folder that all may write to becomes sticky
-     * (one of the configuration is closed to them), a shared folder that a stranger made becomes
-     * root's, a stranger's folder in a user's place is moved aside. A link or a file on the way
-     * fails with ENOTDIR, a folder that cannot be trusted with EPERM.
+     * Reaches `path`, which has to be there. Below the folders that hold one for each user, it is
+     * for the user whom the path names, and `user` counts elsewhere. On the way, what is ours and
+     * open to the harm of others is repaired as far as this process may: a folder that all may
+     * write to becomes sticky (one of the configuration is closed to them), a shared folder that a
+     * stranger made becomes root's, a stranger's folder in a user's place is moved aside. A link or
+     * a file on the way fails with ENOTDIR, a folder that cannot be trusted with EPERM.
      */
     static OwnedFolder Open(const std::string& path, uid_t user);
 

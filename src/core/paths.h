@@ -78,6 +78,9 @@ inline std::string MountLock(unsigned int uid) {
     return "/tmp/zyrovfs/lock/user/" + std::to_string(uid) + "/mnt.lock";
 }
 
+/** Each holds a folder per user, named by the user id. */
+inline constexpr const char* kFoldersOfUsers[] = {kConfigRoot, kConnectRoot, "/var/tmp/user",
+                                                  "/tmp/zyrovfs/lock/user"};
 /** The machine's own folders, which root lays out as root likes, with links too. Below them nothing
  * of ours is a link. */
 inline constexpr const char* kMachineFolders[] = {"/usr", "/var/tmp", "/tmp", "/etc/ssl/certs"};
