@@ -8,6 +8,7 @@
 
 #include "core/entry_name.h"
 #include "core/handle.h"
+#include "core/identity.h"
 #include "core/log.h"
 #include "core/no_throw.h"
 #include "core/owned_folder.h"
@@ -49,6 +50,8 @@ void UnmountAll(unsigned int uid) {
 /** What leads to the tree is looked at first: rm goes by the path, through any link above it. */
 void RemoveTree(const std::string& path, unsigned int uid) {
     const char* const argv[] = {paths::kRm, "-rf", path.c_str(), nullptr};
+    // The folders above are sticky: only root takes root's folders out of them.
+    const EffectiveUid as_root(0);
     const OwnedFolder above = OwnedFolder::Open(SplitPath(path).folder, uid);
     if ((!above && errno != ENOENT) || YLIBCExecv(paths::kRm, argv) != 0) {
         LOG_ERROR("Failed to rm -rf %s, errno=%X", path.c_str(), errno);

@@ -142,7 +142,7 @@ TEST_F(SslPeer, AUserWithoutAnyFolderGetsBothOnTheFirstQuestion) {
     struct stat info {};
     ASSERT_EQ(stat(parent_.c_str(), &above), 0);
     ASSERT_EQ(stat(folder_.c_str(), &info), 0);
-    EXPECT_EQ(above.st_mode & 07777, 0777U);
+    EXPECT_EQ(above.st_mode & 07777, 01777U);
     EXPECT_EQ(info.st_mode & 07777, 0700U);
     EXPECT_EQ(info.st_uid, kAmy);
     EXPECT_EQ(info.st_gid, 0U);

@@ -95,7 +95,7 @@ TEST_F(TaskTest, AddAppendsIdAndProcessInFoldersOpenToAll) {
     EXPECT_EQ(Queue(), "first\t11\nsecond\t12\n");
     struct stat info {};
     ASSERT_EQ(stat(kFolder.c_str(), &info), 0);
-    EXPECT_EQ(info.st_mode & 07777, 0777U);
+    EXPECT_EQ(info.st_mode & 07777, 01777U) << "and nobody takes what is another's";
     EXPECT_TRUE(fs::exists(kLock));
     EXPECT_THAT(seams::LogLines(), IsEmpty()) << seams::LogDump();
 }
