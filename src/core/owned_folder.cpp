@@ -179,9 +179,4 @@ UniqueFd OwnedFolder::OpenForReading() const {
     return Reopen(fd_.Get());
 }
 
-bool OwnedFolder::SetMode(mode_t mode) const {
-    const UniqueFd folder = OpenForReading();
-    return folder && fchmod(folder.Get(), mode) == 0;
-}
-
 }  // namespace ZYROVFS

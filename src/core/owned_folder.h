@@ -85,8 +85,6 @@ class OwnedFolder {
     bool MakeFolder(const std::string& name, mode_t mode, FileOwner owner) const;
     /** The folder itself for reading, as fdopendir and fsync need it. */
     UniqueFd OpenForReading() const;
-    /** The folder's own mode; for its owner and root. */
-    bool SetMode(mode_t mode) const;
 
   private:
     OwnedFolder(UniqueFd fd, uid_t user, bool ours)

@@ -180,8 +180,7 @@ TEST_F(MountLock, FileThatCannotBeOpenedFailsAtOnce) {
     ASSERT_EQ(chmod(kFile, 0600), 0);
     const int status = support::ExitOf([] {
         return scratch::BecomeUser(1001) && !LockMnt(false) && seams::MicroSleeps().empty() &&
-                       YLIBCErrGet() == 0x900 &&
-                       seams::LoggedPart("mnt.lock, Permission denied")
+                       YLIBCErrGet() == 0x900 && seams::LoggedPart("mnt.lock, Permission denied")
                    ? 0
                    : 1;
     });
