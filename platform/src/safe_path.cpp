@@ -1,9 +1,12 @@
 #include "safe_path.h"
 
 #include <fcntl.h>
+#include <sys/random.h>
 #include <sys/stat.h>
 
 #include <algorithm>
+#include <cinttypes>
+#include <cstdio>
 
 namespace zos {
 namespace {
@@ -58,6 +61,20 @@ bool Claim(int dir, mode_t mode) {
            fchmod(dir, strangers ? mode : info.st_mode & ~kOthersMayWrite & 07777) == 0;
 }
 
+/** A stranger's link or file would keep everybody from the folder that belongs in its place. */
+void MoveStrangersFileAside(int parent, const char* name) {
+    struct stat info {};
+    uint64_t number = 0;
+    if (geteuid() != 0 || fstatat(parent, name, &info, AT_SYMLINK_NOFOLLOW) != 0 ||
+        S_ISDIR(info.st_mode) || info.st_uid == 0 ||
+        getrandom(&number, sizeof number, 0) != sizeof number) {
+        return;
+    }
+    char aside[64];
+    std::snprintf(aside, sizeof aside, ".foreign.%.16s.%016" PRIx64, name, number);
+    renameat2(parent, name, parent, aside, RENAME_NOREPLACE);
+}
+
 }  // namespace
 
 Fd OpenFolderOf(const std::string& path, std::string& name) {
@@ -75,6 +92,9 @@ Fd OpenFolderOf(const std::string& path, std::string& name) {
 }
 
 Fd EnterRootsFolder(int parent, const char* name, bool make, mode_t mode) {
+    if (make) {
+        MoveStrangersFileAside(parent, name);
+    }
     const bool made = make && mkdirat(parent, name, 0700) == 0;
     if (make && !made && errno != EEXIST) {
         return Fd();
