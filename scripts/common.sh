@@ -5,7 +5,7 @@ cd "$(dirname "${BASH_SOURCE[0]}")/.."
 # What the library is built with and what it runs on.
 BUILD_PACKAGES=(
   g++ cmake ninja-build pkg-config ccache
-  libglib2.0-dev libsoup2.4-dev libjsoncpp-dev libcurl4-openssl-dev libssl-dev libcli11-dev
+  mold libglib2.0-dev libsoup2.4-dev libjsoncpp-dev libcurl4-openssl-dev libssl-dev libcli11-dev
 )
 RUN_PACKAGES=(
   dbus-daemon gvfs gvfs-daemons gvfs-backends gvfs-fuse fuse3 libglib2.0-bin

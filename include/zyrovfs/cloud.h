@@ -27,7 +27,7 @@ class APIHandler;
 using ZYROVFS::__tag_vfs_err_;
 
 /** Kinds of remote storage, as GetCloudType tells them. */
-enum _tag_cloud_type {
+enum _tag_cloud_type : int {
     CLOUD_TYPE_UNKNOWN = 0,
     CLOUD_TYPE_VFS = 1,
     CLOUD_TYPE_GOOGLE = 2,

@@ -7,6 +7,7 @@
 #include <filesystem>
 #include <sstream>
 
+#include "support/locations.h"
 #include "support/machine.h"
 
 namespace {
@@ -17,8 +18,8 @@ using testing::AllOf;
 using testing::HasSubstr;
 using testing::Not;
 
-const std::string kTool = BUILD_DIR "/tools/zyrovfs/zyrovfs";
-const std::string kBuild = " --build " BUILD_DIR;
+const std::string kTool = BuildDir() + "/tools/zyrovfs/zyrovfs";
+const std::string kBuild = " --build " + BuildDir();
 const std::string kMounts = "/usr/share/gvfs/mounts/";
 
 /** machine::Run, whose name tests have for their own. */

@@ -6,6 +6,7 @@
 #include <filesystem>
 #include <memory>
 
+#include "support/locations.h"
 #include "support/machine.h"
 
 namespace {
@@ -15,7 +16,7 @@ using machine::Outcome;
 using testing::HasSubstr;
 using testing::Not;
 
-const std::string kTool = BUILD_DIR "/tools/zyrovfs/zyrovfs";
+const std::string kTool = BuildDir() + "/tools/zyrovfs/zyrovfs";
 const std::string kPolicy = "/usr/zyro/etc/zyrovfs/user.conf";
 
 Outcome Policy(const std::string& arguments) {

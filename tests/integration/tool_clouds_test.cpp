@@ -13,6 +13,7 @@
 
 #include "support/cloudsim/cloudsim.h"
 #include "support/cloudsim/mounted_account.h"
+#include "support/locations.h"
 #include "support/machine.h"
 
 namespace {
@@ -22,7 +23,7 @@ using machine::Outcome;
 using testing::AllOf;
 using testing::HasSubstr;
 
-const std::string kTool = BUILD_DIR "/tools/zyrovfs/zyrovfs";
+const std::string kTool = BuildDir() + "/tools/zyrovfs/zyrovfs";
 constexpr size_t kMiB = 1 << 20;
 
 Outcome ForAmy(const std::string& arguments) {

@@ -7,6 +7,7 @@
 #include <filesystem>
 #include <sstream>
 
+#include "support/locations.h"
 #include "support/machine.h"
 
 namespace {
@@ -18,7 +19,7 @@ using testing::HasSubstr;
 using testing::Not;
 using testing::StartsWith;
 
-const std::string kTool = BUILD_DIR "/tools/zyrovfs/zyrovfs";
+const std::string kTool = BuildDir() + "/tools/zyrovfs/zyrovfs";
 constexpr unsigned kAmy = 4001;
 const std::string kFtp = "ftp://remo@127.0.0.1:2121";
 const std::string kTree = "/var/tmp/user/4001/gvfs/";

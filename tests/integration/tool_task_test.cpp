@@ -7,6 +7,7 @@
 
 #include <filesystem>
 
+#include "support/locations.h"
 #include "support/machine.h"
 
 namespace {
@@ -17,7 +18,7 @@ using machine::Read;
 using testing::AllOf;
 using testing::HasSubstr;
 
-const std::string kTool = BUILD_DIR "/tools/zyrovfs/zyrovfs";
+const std::string kTool = BuildDir() + "/tools/zyrovfs/zyrovfs";
 const std::string kQueue = "/var/tmp/user/4001/zyrovfs/task/copy/copy";
 
 Outcome Task(const std::string& arguments) {

@@ -9,6 +9,7 @@
 #include <algorithm>
 #include <filesystem>
 
+#include "support/locations.h"
 #include "support/machine.h"
 
 namespace {
@@ -19,7 +20,7 @@ using testing::AllOf;
 using testing::HasSubstr;
 using testing::Not;
 
-const std::string kTool = BUILD_DIR "/tools/zyrovfs/zyrovfs";
+const std::string kTool = BuildDir() + "/tools/zyrovfs/zyrovfs";
 constexpr unsigned kAmy = 4001;
 const std::string kId = "ftp://amy@nas.example:2121";
 

@@ -12,6 +12,7 @@
 #include <thread>
 
 #include "support/cloudsim/cloudsim.h"
+#include "support/locations.h"
 #include "support/machine.h"
 #include "support/xattrtree/xattrtree.h"
 
@@ -27,7 +28,7 @@ using testing::Not;
 
 namespace fs = std::filesystem;
 
-const std::string kTool = BUILD_DIR "/tools/zyrovfs/zyrovfs";
+const std::string kTool = BuildDir() + "/tools/zyrovfs/zyrovfs";
 const std::string kBox = "box://amy@example.com";
 const std::string kHome = "/home/amy/";
 constexpr size_t kMiB = 1 << 20;

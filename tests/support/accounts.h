@@ -3,12 +3,15 @@
 #define ZYROVFS_TESTS_ACCOUNTS_H
 
 #include <dlfcn.h>
+#include <gnu/libc-version.h>
 #include <gtest/gtest.h>
 
 #include <filesystem>
 #include <fstream>
 #include <sstream>
 #include <string>
+
+#include "support/locations.h"
 
 namespace accounts {
 
@@ -71,11 +74,11 @@ inline void BindToServices(const std::string& services) {
     // Once: a library that is in use must not be written over.
     static const bool in_place = [] {
         Dl_info libc{};
-        dladdr(reinterpret_cast<void*>(&fopen), &libc);
+        dladdr(reinterpret_cast<void*>(&gnu_get_libc_version), &libc);
         const auto folder = std::filesystem::path(libc.dli_fname).parent_path();
         for (const char* name : {"libnss_ldap.so.2", "libnss_winbind.so.2"}) {
             std::filesystem::remove(folder / name);
-            std::filesystem::copy_file(std::string(TESTS_BUILD_DIR "/") + name, folder / name);
+            std::filesystem::copy_file(BuildDir() + "/tests/" + name, folder / name);
         }
         return true;
     }();

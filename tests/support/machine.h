@@ -14,6 +14,8 @@
 
 #include <unistd.h>
 
+#include "support/locations.h"
+
 namespace machine {
 
 struct Outcome {
@@ -58,7 +60,7 @@ inline void AddUser(const std::string& name, unsigned uid) {
 
 /** tests/support/servers/remote with these arguments. */
 inline std::string Remote(const std::string& arguments) {
-    return Must(std::string(SOURCE_DIR "/tests/support/servers/remote ") + arguments);
+    return Must(SourceDir() + "/tests/support/servers/remote " + arguments);
 }
 
 inline std::string Read(const std::string& path) {

@@ -18,6 +18,8 @@ namespace {
 
 /** Name of the step of OpenSSL that fails. */
 std::string failing_step;
+/** The platform deciphers this installation's passphrase before; these calls are its own. */
+int platform_updates = 0;
 
 template <typename Function>
 Function Real(const char* name) {
@@ -45,7 +47,7 @@ extern "C" int MD5_Final(unsigned char* digest, MD5_CTX* context) {
 }
 extern "C" int EVP_CipherUpdate(EVP_CIPHER_CTX* cipher, unsigned char* out, int* length,
                                 const unsigned char* in, int size) {
-    if (Fails("EVP_CipherUpdate") && out != nullptr) {
+    if (Fails("EVP_CipherUpdate") && out != nullptr && platform_updates-- <= 0) {
         return 0;
     }
     return Real<int (*)(EVP_CIPHER_CTX*, unsigned char*, int*, const unsigned char*, int)>(
@@ -172,6 +174,7 @@ TEST_F(Decrypt, EachStepOfTheDigestHasItsLineAndNoOtherFollows) {
 
 TEST_F(Decrypt, AFailedStepOfTheCipherIsAnUpdateFailure) {
     failing_step = "EVP_CipherUpdate";
+    platform_updates = 1;
     ExpectRefused("Failed to decrypt update");
 }
 

@@ -1,0 +1,1 @@
+// Its headers are compiled once, for all tests of units.
