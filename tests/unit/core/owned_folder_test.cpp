@@ -97,13 +97,14 @@ TEST_F(Owned, FileFifoAndDeviceAreNoFolders) {
 }
 
 TEST_F(Owned, MachinesOwnFoldersMayBeLinksOfRoots) {
-    fs::create_directories("/var/tmp.real/zyrovfs/5001");
-    fs::rename("/var/tmp", "/var/tmp.saved");
-    fs::create_directory_symlink("/var/tmp.real", "/var/tmp");
+    fs::remove_all("/var/tmp");
+    fs::create_directories("/var/real/zyrovfs/5001");
+    fs::create_directory_symlink("/var/real", "/var/tmp");
     const bool opened = static_cast<bool>(Open());
     fs::remove("/var/tmp");
-    fs::rename("/var/tmp.saved", "/var/tmp");
-    fs::remove_all("/var/tmp.real");
+    fs::remove_all("/var/real");
+    fs::create_directory("/var/tmp");
+    ASSERT_EQ(chmod("/var/tmp", 01777), 0);
     EXPECT_TRUE(opened);
 }
 
