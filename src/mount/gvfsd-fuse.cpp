@@ -13,6 +13,7 @@
 #include "core/error_cell.h"
 #include "core/fd_io.h"
 #include "core/handle.h"
+#include "core/identity.h"
 #include "core/log.h"
 #include "core/no_throw.h"
 #include "core/owned_folder.h"
@@ -75,8 +76,21 @@ int SpawnFuse(const std::string& mount_point, GPid& pid) {
     return kLaunched;
 }
 
+/** Only root takes what is root's or a stranger's out of a sticky folder; the user makes the mount
+ * point then. */
+void ClearMountPoint(uid_t uid) {
+    const EffectiveUid as_root(0);
+    const EntryPath place = SplitPath(paths::FuseTree(uid));
+    const OwnedFolder above = OwnedFolder::Open(place.folder, uid);
+    struct stat info {};
+    if (above.Stat(place.name, info) && !S_ISDIR(info.st_mode)) {
+        above.Remove(place.name);  // what stays is told by whoever cannot make the folder
+    }
+}
+
 /** The helper's work: as the user, since the mount must be the user's. */
 int LaunchAsUser(uid_t uid) {
+    ClearMountPoint(uid);
     if (!BecomeUserBySavedRoot(uid)) {
         return kLaunchFailed;
     }

@@ -201,13 +201,9 @@ TEST_F(FuseTreeThatIsALink, OfAStrangersIsMovedAsideAndNotFollowed) {
 TEST_F(FuseTreeThatIsALink, OfTheUsersOwnIsNotFollowedEither) {
     ASSERT_TRUE(MakeStaleMount("/tmp/stale"));
     ASSERT_TRUE(stranger::As(kUser, [] { return symlink("/tmp/stale", kTree.c_str()) == 0; }));
-    BreakUmount();
-    // Where the user's folder is closed to the user, the link cannot be replaced by the launch.
-    chmod("/var/tmp/user/4001", 0755);
-    EXPECT_FALSE(GVFSD_FUSE::Init());
-    EXPECT_EQ(Report("umount"), "");
-    EXPECT_TRUE(seams::Logged("Failed to umount " + kTree)) << seams::LogDump();
-    umount2("/tmp/stale", MNT_DETACH);
+    EXPECT_TRUE(GVFSD_FUSE::Init()) << seams::LogDump();
+    EXPECT_EQ(umount2("/tmp/stale", MNT_DETACH), 0) << "root has unmounted it already";
+    EXPECT_TRUE(std::filesystem::is_directory(std::filesystem::symlink_status(kTree)));
 }
 
 TEST_F(Fuse, StaleMountPointIsRepairedUnderAServiceThatIgnoresItsChildren) {
