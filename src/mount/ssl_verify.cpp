@@ -176,13 +176,12 @@ char* Utils::GetCertData(const char* path) {
     const EntryPath place = SplitPath(isTrustRootCA(path) ? paths::kCaBundle : path);
     const OwnedFolder folder = OwnedFolder::Open(place.folder, GetActorUID());
     const UniqueFd fd = folder.OpenFile(place.name, O_RDONLY);
-    if (!fd) {
+    if (!fd && errno != EISDIR) {
         LOG_ERROR("Failed to open [%s], %m", path);
         return nullptr;
     }
     std::string text;
-    errno = 0;
-    UniqueCString data(ReadUpTo(fd.Get(), kCertFileLimit, text)
+    UniqueCString data(fd && ReadUpTo(fd.Get(), kCertFileLimit, text)
                            ? static_cast<char*>(calloc(text.size() + 1, 1))
                            : nullptr);
     if (data == nullptr) {

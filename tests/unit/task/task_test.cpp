@@ -643,7 +643,7 @@ TEST_F(TaskTest, RootSwitchesNothing) {
 
 TEST_F(TaskTest, AFailedSwitchIsLoggedAndTheOperationGoesOn) {
     PutQueue("job\t11\n");
-    fs::permissions(kFolder, fs::perms::all);
+    fs::permissions(kFolder, fs::perms::all | fs::perms::sticky_bit);
     AsSavedRoot(1001, [&] {
         seams::FailIdentity("seteuid(0)", EPERM);
         EXPECT_EQ(Runnable(tasks_, "job", 11), 1);
