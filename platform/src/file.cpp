@@ -11,6 +11,7 @@
 #include <string_view>
 #include <vector>
 
+#include "safe_path.h"
 #include "support.h"
 #include "zosplatform/process.h"
 
@@ -61,6 +62,21 @@ int AppendNames(const char* path, std::string_view suffix, PYLIBCSZLIST* list) {
     return static_cast<int>(names.size());
 }
 
+/** Root touches files in users' folders: a link there is not followed, and nothing is waited for.
+ */
+bool Touch(const std::string& path) {
+    std::string name;
+    const zos::Fd dir = zos::OpenFolderOf(path, name);
+    struct stat info {};
+    if (dir && fstatat(dir.Get(), name.c_str(), &info, AT_SYMLINK_NOFOLLOW) == 0) {
+        errno = S_ISLNK(info.st_mode) ? ELOOP : 0;
+        return errno == 0 && utimensat(dir.Get(), name.c_str(), nullptr, AT_SYMLINK_NOFOLLOW) == 0;
+    }
+    const zos::Fd fd = dir && errno == ENOENT ? zos::OpenOrMake(path, O_WRONLY, 0666) : zos::Fd();
+    // Times are set once more, for a file that somebody else made between the two calls.
+    return fd && futimens(fd.Get(), nullptr) == 0;
+}
+
 }  // namespace
 
 int YLIBCFileCheckDir(const char* path) {
@@ -89,20 +105,13 @@ int YLIBCFileTouch(const char* path) {
         SET_PLATFORM_ERROR(ZOS_ERR_BAD_PARAMETER);
         return kFailed;
     }
-    if (utimensat(AT_FDCWD, path, nullptr, 0) == 0) {
-        return 0;
-    }
-    if (errno == ENOENT) {
-        // Times are set once more, for a file that somebody else made between the two calls. No
-        // file is made behind a user's link to nowhere: root touches files in users' folders.
-        const zos::Fd fd(
-            open(path, O_WRONLY | O_CREAT | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW, 0666));
-        if (fd && futimens(fd.Get(), nullptr) == 0) {
+    return zos::OrOutOfMemory(kFailed, [path] {
+        if (Touch(path)) {
             return 0;
         }
-    }
-    SET_SYSTEM_ERROR(ZOS_ERR_OPEN_FAILED);
-    return kFailed;
+        SET_SYSTEM_ERROR(ZOS_ERR_OPEN_FAILED);
+        return kFailed;
+    });
 }
 
 int YLIBCReadPidFile(const char* path) {

@@ -1,7 +1,7 @@
 #include <fcntl.h>
 #include <sys/file.h>
-#include <sys/stat.h>
 
+#include "safe_path.h"
 #include "support.h"
 #include "zosplatform/file.h"
 
@@ -9,20 +9,6 @@ namespace {
 
 constexpr useconds_t kPause = 50000;
 constexpr long kTriesPerSecond = 1000000 / kPause;
-
-/** Root locks files in folders that belong to users: no link is followed, no FIFO waited for. */
-zos::Fd OpenLockFile(const char* path) {
-    zos::Fd fd(open(path, O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY, 0600));
-    struct stat info {};
-    if (!fd || fstat(fd.Get(), &info) != 0) {
-        return zos::Fd();
-    }
-    if (!S_ISREG(info.st_mode)) {
-        errno = ENXIO;
-        return zos::Fd();
-    }
-    return fd;
-}
 
 /** Tries are counted rather than timed, so that a clock that is set cannot stretch the wait. */
 bool Lock(int fd, int operation, long tries) {
@@ -45,7 +31,8 @@ int YLIBCFileLockTimeByFile(const char* path, int exclusive, int seconds, int* f
         return 0;
     }
     *fd = -1;
-    zos::Fd file = OpenLockFile(path);
+    zos::Fd file =
+        zos::OrOutOfMemory(zos::Fd(), [path] { return zos::OpenOrMake(path, O_RDWR, 0600); });
     if (!file) {
         SET_SYSTEM_ERROR(ZOS_ERR_OPEN_FAILED);
         return 0;

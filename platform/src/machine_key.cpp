@@ -6,14 +6,14 @@
 #include <sys/stat.h>
 
 #include <cstdlib>
-#include <string_view>
 
+#include "safe_path.h"
 #include "support.h"
 
 namespace zos {
 namespace {
 
-constexpr std::string_view kKeyDir = "/usr/zyro/etc/private";
+constexpr const char* kKeyDir = "private";  // below /usr/zyro/etc
 constexpr const char* kKeyName = "zyrovfs.key";
 /** Backends read the key as the user they work for, and every user has this group. */
 constexpr gid_t kUsersGroup = 100;
@@ -57,26 +57,32 @@ bool IsRootsAlone(const struct stat& info, mode_t forbidden) {
     return false;
 }
 
-/** The mode is set behind the umask's back: under 077 no backend could reach the key. */
-bool MakeDir(const std::string& path, mode_t mode, gid_t group) {
-    if (mkdir(path.c_str(), 0700) != 0) {
-        return errno == EEXIST;
-    }
-    return chown(path.c_str(), 0, group) == 0 && chmod(path.c_str(), mode) == 0;
-}
-
-bool MakeKeyDir() {
-    for (size_t slash = kKeyDir.find('/', 1); slash != std::string_view::npos;
-         slash = kKeyDir.find('/', slash + 1)) {
-        if (!MakeDir(std::string(kKeyDir.substr(0, slash)), kParentMode, 0)) {
-            return false;
+/** The folders above the key. Where others could write to one, they could put another key's folder
+ * in the place of this: root closes it. */
+Fd OpenParent(bool make) {
+    Fd dir(open("/usr", O_PATH | O_DIRECTORY | O_CLOEXEC));
+    for (const char* name : {"zyro", "etc"}) {
+        if (dir) {
+            dir = EnterRootsFolder(dir.Get(), name, make, kParentMode);
         }
     }
-    return MakeDir(std::string(kKeyDir), kKeyDirMode, kUsersGroup);
+    return dir;
+}
+
+/** The mode is set behind the umask's back: under 077 no backend could reach the key. */
+bool MakeKeyDir() {
+    const Fd parent = OpenParent(true);
+    if (!parent || mkdirat(parent.Get(), kKeyDir, 0700) != 0) {
+        return parent && errno == EEXIST;
+    }
+    const Fd dir(openat(parent.Get(), kKeyDir, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    return dir && fchown(dir.Get(), 0, kUsersGroup) == 0 && fchmod(dir.Get(), kKeyDirMode) == 0;
 }
 
 Fd OpenKeyDir() {
-    Fd dir(open(kKeyDir.data(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    const Fd parent = OpenParent(false);
+    Fd dir(parent ? openat(parent.Get(), kKeyDir, O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC)
+                  : -1);
     struct stat info {};
     if (!dir || fstat(dir.Get(), &info) != 0 || !IsRootsAlone(info, S_IWGRP | S_IWOTH)) {
         return Fd();

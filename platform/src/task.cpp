@@ -13,6 +13,7 @@
 #include <ctime>
 #include <string_view>
 
+#include "safe_path.h"
 #include "support.h"
 
 namespace {
@@ -43,21 +44,10 @@ bool IsTrusted(int fd) {
     return false;
 }
 
-/** One folder down, made first if `make`; anybody may have put something in its place before. */
+/** Anybody may have put something in its place before; what is no link root makes its own. */
 zos::Fd Enter(const zos::Fd& parent, const std::string& name, bool make, mode_t mode) {
-    bool made = false;
-    if (make) {
-        made = mkdirat(parent.Get(), name.c_str(), 0700) == 0;
-        if (!made && errno != EEXIST) {
-            return zos::Fd();
-        }
-    }
-    zos::Fd dir(
-        openat(parent.Get(), name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
-    if (!dir || (made && fchmod(dir.Get(), mode) != 0) || !IsTrusted(dir.Get())) {
-        return zos::Fd();
-    }
-    return dir;
+    zos::Fd dir = zos::EnterRootsFolder(parent.Get(), name.c_str(), make, mode);
+    return dir && IsTrusted(dir.Get()) ? std::move(dir) : zos::Fd();
 }
 
 struct Place {

@@ -5,18 +5,18 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
-#include <filesystem>
 #include <iterator>
 
-#include <fcntl.h>
-
 #include "cloud/service_document.h"
+#include "core/entry_name.h"
 #include "core/handle.h"
 #include "core/json.h"
 #include "core/log.h"
 #include "core/no_throw.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
 #include "zyrovfs/cloud_utils.h"
+#include "zyrovfs/utils.h"
 
 namespace ZYROCloud::Utils {
 
@@ -46,13 +46,13 @@ bool IsText(const std::string& text) {
 /** Two programs that change the document at once would each drop what the other wrote. The file of
  * the lock is root's alone, so nobody else can hold it. */
 UniqueFd LockDocument() {
-    std::error_code ignored;
-    std::filesystem::create_directories(paths::kConfigRoot, ignored);
+    constexpr unsigned kKeepOwner = static_cast<unsigned>(-1);
+    ZYROVFS::Utils::MkdirP(paths::kConfigRoot, nullptr, 0, kKeepOwner, kKeepOwner, 0755);
     const std::string path = std::string(paths::kServiceConfig) + ".lock";
-    UniqueFd fd(open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
-    if (!fd || flock(fd.Get(), LOCK_EX) != 0) {
+    const EntryPath place = SplitPath(path);
+    UniqueFd fd = OwnedFolder::Open(place.folder, 0).Lock(place.name, LOCK_EX, 0600);
+    if (!fd) {
         LOG_ERROR("Failed to lock %s, %m", path.c_str());
-        fd.Reset();
     }
     return fd;
 }

@@ -8,8 +8,10 @@
 #include <iterator>
 
 #include "cloud/service_document.h"
+#include "core/entry_name.h"
 #include "core/json.h"
 #include "core/log.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
 #include "zyrovfs/server.h"
 
@@ -23,9 +25,7 @@ namespace {
 constexpr size_t kPlainBuffer = 4097;
 
 /** Whoever may write the document decides where tokens are sent. */
-bool IsTrusted(const struct stat& info) {
-    return info.st_uid == 0 && (info.st_mode & (S_IWGRP | S_IWOTH)) == 0;
-}
+constexpr const char* kOthersMayWrite = "others than root may write it";
 
 State Refuse(const char* why) {
     LOG_ERROR("Ignored %s, %s", paths::kServiceConfig, why);
@@ -36,15 +36,19 @@ State Refuse(const char* why) {
 
 State Read(Json::Value& document) {
     document = Json::Value(Json::objectValue);
+    const EntryPath place = SplitPath(paths::kServiceConfig);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, 0);
     struct stat info {};
-    if (lstat(paths::kServiceConfig, &info) != 0) {
-        return errno == ENOENT ? State::kMissing : Refuse(strerror(errno));
+    if (!folder || !folder.Stat(place.name, info)) {
+        const bool foreign = errno == EPERM;
+        return errno == ENOENT ? State::kMissing
+                               : Refuse(foreign ? kOthersMayWrite : strerror(errno));
     }
-    if (!IsTrusted(info)) {
-        return Refuse("others than root may write it");
+    if ((info.st_mode & (S_IWGRP | S_IWOTH)) != 0) {
+        return Refuse(kOthersMayWrite);
     }
     Json::Value read;
-    if (!json::fromFile(read, paths::kServiceConfig)) {
+    if (!json::fromFile(read, folder, place.name)) {
         return Refuse(strerror(errno));
     }
     if (!read.isObject()) {

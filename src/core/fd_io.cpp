@@ -4,6 +4,7 @@
 #include <zosplatform/file.h>
 
 #include <cerrno>
+#include <cstdint>
 
 namespace ZYROVFS {
 
@@ -12,13 +13,22 @@ bool WriteAll(int fd, const std::string& text) {
 }
 
 bool ReadAll(int fd, std::string& text) {
+    return ReadUpTo(fd, SIZE_MAX, text);
+}
+
+bool ReadUpTo(int fd, size_t limit, std::string& text) {
     char buffer[65536];
-    for (;;) {
+    for (size_t left = limit;;) {
         const ssize_t n = read(fd, buffer, sizeof buffer);
         if (n == 0) {
             return true;
         }
+        if (n > 0 && static_cast<size_t>(n) > left) {
+            errno = EFBIG;
+            return false;
+        }
         if (n > 0) {
+            left -= static_cast<size_t>(n);
             text.append(buffer, static_cast<size_t>(n));
         } else if (errno != EINTR) {
             return false;

@@ -1,9 +1,8 @@
 #include "core/json.h"
 
-#include <fcntl.h>
 #include <json/reader.h>
 #include <json/writer.h>
-#include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -11,9 +10,8 @@
 #include <cmath>
 #include <memory>
 
-#include "core/fd_io.h"
-#include "core/handle.h"
-#include "core/replace_file.h"
+#include "core/entry_name.h"
+#include "core/owned_folder.h"
 
 namespace ZYROVFS::json {
 namespace {
@@ -90,33 +88,28 @@ bool FromDecimal(const std::string& text, T& number) {
 
 }  // namespace
 
-bool fromFile(Json::Value& value, const std::string& path) try {
+bool fromFile(Json::Value& value, const OwnedFolder& folder, const std::string& name) try {
     value = Json::Value();
-    const UniqueFd fd(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK));
-    if (!fd) {
-        return false;
-    }
-    struct stat info {};
-    if (fstat(fd.Get(), &info) != 0) {
-        return false;
-    }
-    if (!S_ISREG(info.st_mode)) {
-        errno = S_ISDIR(info.st_mode) ? EISDIR : EINVAL;
-        return false;
-    }
-    if (static_cast<size_t>(info.st_size) > kLargestDocument) {
-        errno = EFBIG;
-        return false;
-    }
     std::string text;
-    text.reserve(static_cast<size_t>(info.st_size));
-    return ReadAll(fd.Get(), text) && Parse(text.data(), text.data() + text.size(), value);
+    return folder.Read(name, kLargestDocument, text) &&
+           Parse(text.data(), text.data() + text.size(), value);
 } catch (const std::exception&) {
     errno = ENOMEM;
     return false;
 }
 
-bool toFile(const Json::Value& value, const std::string& path, mode_t mode, FileOwner owner) try {
+bool fromFile(Json::Value& value, const std::string& path) try {
+    value = Json::Value();
+    const EntryPath place = SplitPath(path);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, geteuid());
+    return folder && fromFile(value, folder, place.name);
+} catch (const std::exception&) {
+    errno = ENOMEM;
+    return false;
+}
+
+bool toFile(const Json::Value& value, const OwnedFolder& folder, const std::string& name,
+            mode_t mode, FileOwner owner) try {
     // What cannot be read back must not replace what can.
     if (!CanBeReadBack(value, kMostLevels)) {
         errno = EINVAL;
@@ -127,7 +120,16 @@ bool toFile(const Json::Value& value, const std::string& path, mode_t mode, File
         errno = EFBIG;
         return false;
     }
-    return ReplaceFile(path, text, mode, owner);
+    return folder.Replace(name, text, mode, owner);
+} catch (const std::exception&) {
+    errno = ENOMEM;
+    return false;
+}
+
+bool toFile(const Json::Value& value, const std::string& path, mode_t mode, FileOwner owner) try {
+    const EntryPath place = SplitPath(path);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, geteuid());
+    return folder && toFile(value, folder, place.name, mode, owner);
 } catch (const std::exception&) {
     errno = ENOMEM;
     return false;

@@ -8,24 +8,24 @@
 #include <cstdint>
 #include <string>
 
-#include "core/replace_file.h"
+#include "core/owned_folder.h"
 
 namespace ZYROVFS::json {
 
 /**
- * Reads a whole document. Only a regular file is read: users may write to the directories that
- * hold profiles, so a symbolic link or a FIFO in a file's place is refused rather than followed or
- * waited for. False leaves `value` null and errno telling the cause (EINVAL for bad JSON).
+ * Reads a whole document. Only a regular file of root's or of the folder's user is read, up to 64
+ * MiB. False leaves `value` null and errno telling the cause (EINVAL for bad JSON).
  */
+bool fromFile(Json::Value& value, const OwnedFolder& folder, const std::string& name);
+/** The same by path, for this process's effective user. */
 bool fromFile(Json::Value& value, const std::string& path);
 
 /**
- * Replaces a whole document: new file beside the old one, written, flushed to disk, renamed over.
- * A crash, a kill or a full disk at any point leaves the old document. False keeps the old file
- * and leaves errno telling the cause; EINVAL and EFBIG are for a value that fromFile would refuse.
- * With an owner the new file is given to it before it takes its place; a caller that may not give
- * files away keeps them.
+ * Replaces a whole document, as OwnedFolder::Replace does. False keeps the old file and leaves
+ * errno telling the cause; EINVAL and EFBIG are for a value that fromFile would refuse.
  */
+bool toFile(const Json::Value& value, const OwnedFolder& folder, const std::string& name,
+            mode_t mode = 0600, FileOwner owner = {});
 bool toFile(const Json::Value& value, const std::string& path, mode_t mode = 0600,
             FileOwner owner = {});
 

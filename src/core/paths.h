@@ -78,6 +78,18 @@ inline std::string MountLock(unsigned int uid) {
     return "/tmp/zyrovfs/lock/user/" + std::to_string(uid) + "/mnt.lock";
 }
 
+/** Each holds a folder per user, named by the user id. */
+inline constexpr const char* kFoldersOfUsers[] = {kConfigRoot, kConnectRoot, "/var/tmp/user",
+                                                  "/tmp/zyrovfs/lock/user"};
+/** The machine's own folders, which root lays out as root likes, with links too. Below them nothing
+ * of ours is a link. */
+inline constexpr const char* kMachineFolders[] = {"/usr", "/var/tmp", "/tmp", "/etc/ssl/certs"};
+/** Shared by all users and not for them to change. */
+inline constexpr const char* kSharedConfigFolders[] = {"/usr/zyro", "/usr/zyro/etc", kConfigRoot};
+/** Shared by all users, who may each put a folder of their own there. */
+inline constexpr const char* kSharedVolatileFolders[] = {
+    kConnectRoot, "/var/tmp/user", "/tmp/zyrovfs", "/tmp/zyrovfs/lock", "/tmp/zyrovfs/lock/user"};
+
 }  // namespace ZYROVFS::paths
 
 #endif

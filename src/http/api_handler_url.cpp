@@ -1,6 +1,4 @@
-#include <fcntl.h>
 #include <strings.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cstring>
@@ -8,6 +6,7 @@
 #include "core/log.h"
 #include "core/paths.h"
 #include "http/api_handler.h"
+#include "mount/known_hosts.h"
 #include "mount/ssl_verify.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
@@ -22,11 +21,6 @@ constexpr char kSchemeEnd[] = "://";
 
 bool StartsWith(const std::string& text, const char* start) {
     return text.compare(0, strlen(start), start) == 0;
-}
-
-/** As the effective user sees it. */
-bool IsThere(const std::string& path) {
-    return faccessat(AT_FDCWD, path.c_str(), F_OK, AT_EACCESS) == 0;
 }
 
 /** User, password and query of a URL are nobody else's business. */
@@ -151,7 +145,7 @@ bool APIHandler::SetVFSURL(const std::string& url) {
     }
     SetRoute(url, wanted_);
     const std::string known_hosts = paths::KnownHosts(GetActorUID());
-    if (IsSsh(url) && IsThere(known_hosts)) {
+    if (IsSsh(url) && HasKnownHosts(GetActorUID())) {
         Logged(curl_easy_setopt(curl_, CURLOPT_SSH_KNOWNHOSTS, known_hosts.c_str()));
     }
     if (IsFileProtocol(url)) {

@@ -8,7 +8,9 @@
 #include <climits>
 #include <cstdlib>
 
+#include "core/entry_name.h"
 #include "core/log.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
 #include "mount/fork_as_user.h"
 #include "zyrovfs/global.h"
@@ -23,9 +25,12 @@ int ParsePid(const std::string& text) {
     return pid < 0 || pid > INT_MAX ? 0 : static_cast<int>(pid);
 }
 
-bool Exists(const std::string& path) {
+/** A stranger's file is none: it could name any process, or a bus that listens for passwords. */
+bool Exists(const std::string& path, uid_t uid) {
+    const EntryPath place = SplitPath(path);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, uid);
     struct stat info {};
-    return stat(path.c_str(), &info) == 0 || (errno != ENOENT && errno != ENOTDIR);
+    return (folder && folder.Stat(place.name, info)) || (errno != ENOENT && errno != ENOTDIR);
 }
 
 bool IsRunning(const Daemon& daemon, SourceLine at) {
@@ -71,7 +76,7 @@ bool ReadPid(const Daemon& daemon, int& pid, SourceLine at) {
     }
     const MountLockRelease release;
     const std::string path = daemon.pid_file(uid);
-    if (!Exists(path)) {
+    if (!Exists(path, uid)) {
         return true;
     }
     std::string line;

@@ -3,16 +3,22 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
 
+#include "core/entry_name.h"
+#include "core/fd_io.h"
 #include "core/handle.h"
 #include "core/log.h"
+#include "core/no_throw.h"
 #include "mount/glib_handle.h"
 #include "mount/mkdir.h"
+#include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 
 namespace ZYROVFS::Utils {
 namespace {
+
+/** Beyond any line of ours, and no burden. */
+constexpr size_t kLongestLine = 4 << 20;
 
 struct flock WholeFileForWriting() {
     struct flock range {};
@@ -33,22 +39,54 @@ bool Rewrite(int fd, const char* path, const std::string& line) {
     return true;
 }
 
-/** A FIFO or a device in the file's place is refused: neither waited for nor read without end. */
-UniqueFile OpenRegular(const char* path) {
-    UniqueFd fd(open(path, O_RDONLY | O_NONBLOCK | O_CLOEXEC));
-    struct stat info {};
-    if (!fd || fstat(fd.Get(), &info) != 0) {
-        return nullptr;
+bool WriteFile(const char* path, const char* text) {
+    const uid_t actor = GetActorUID();
+    const OwnedFolder folder = CreateParentFolder(path, actor);
+    if (!folder) {
+        return false;
     }
-    if (!S_ISREG(info.st_mode)) {
-        errno = S_ISDIR(info.st_mode) ? EISDIR : EINVAL;
-        return nullptr;
+    const UniqueFd fd = folder.OpenOrMake(SplitPath(path).name, O_RDWR, 0600);
+    if (!fd) {
+        // What is no regular file is told as what it is: nothing to truncate.
+        LOG_ERROR(
+            errno == EINVAL ? "Could not truncate PID file [%s], %m" : "Can't open file %s, %m",
+            path);
+        return false;
     }
-    UniqueFile stream(fdopen(fd.Get(), "r"));
-    if (stream != nullptr) {
-        fd.Release();
+    struct flock range = WholeFileForWriting();
+    if (fcntl(fd.Get(), F_SETLK, &range) != 0) {
+        if (errno == EACCES || errno == EAGAIN) {
+            return true;  // another writer is at it, and what it writes is as good as ours
+        }
+        LOG_ERROR("Unable to lock file [%s], %m", path);
+        return false;
     }
-    return stream;
+    return Rewrite(fd.Get(), path, std::string(text) + "\n");
+}
+
+/** The first line of a text that may be cut off behind `kLongestLine` bytes. */
+bool FirstLine(const std::string& text, std::string& out) {
+    const size_t end = text.find('\n');
+    if (end == 0 || text.empty()) {
+        return false;
+    }
+    out = text.substr(0, end);
+    return true;
+}
+
+bool ReadFirstLine(const char* path, std::string& out) {
+    const EntryPath place = SplitPath(path);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, GetActorUID());
+    const UniqueFd fd = folder ? folder.OpenFile(place.name, O_RDONLY) : UniqueFd();
+    std::string text;
+    const bool whole = fd && ReadUpTo(fd.Get(), kLongestLine, text);
+    if (!whole && (!fd || errno != EFBIG || text.find('\n') == std::string::npos)) {
+        if (errno != ENOENT) {
+            LOG_ERROR("Can't open file %s, %m", path);
+        }
+        return false;
+    }
+    return FirstLine(text, out);
 }
 
 UniqueObject<GFileInfo> Query(GFile* file, const char* path, const char* attributes) {
@@ -83,24 +121,7 @@ bool CreateFile(const char* path, const char* text) {
         LOG_ERROR("Wrong parameters");
         return false;
     }
-    if (!CreateParentFolder(path)) {
-        return false;
-    }
-    // The folders belong to users: a link that one of them planted must not lead root elsewhere.
-    const UniqueFd fd(open(path, O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
-    if (!fd) {
-        LOG_ERROR("Can't open file %s, %m", path);
-        return false;
-    }
-    struct flock range = WholeFileForWriting();
-    if (fcntl(fd.Get(), F_SETLK, &range) != 0) {
-        if (errno == EACCES || errno == EAGAIN) {
-            return true;  // another writer is at it, and what it writes is as good as ours
-        }
-        LOG_ERROR("Unable to lock file [%s], %m", path);
-        return false;
-    }
-    return Rewrite(fd.Get(), path, std::string(text) + "\n");
+    return NoThrow(VFS_ERR_FAILED, [=] { return WriteFile(path, text); });
 }
 
 bool CreatePidFile(const char* path, int pid) {
@@ -112,25 +133,7 @@ bool GetFileLine(const char* path, std::string& out) {
         LOG_ERROR("Wrong parameters");
         return false;
     }
-    const UniqueFile stream = OpenRegular(path);
-    if (stream == nullptr) {
-        if (errno != ENOENT) {
-            LOG_ERROR("Can't open file %s, %m", path);
-        }
-        return false;
-    }
-    char* buffer = nullptr;
-    size_t capacity = 0;
-    ssize_t length = getline(&buffer, &capacity, stream.get());
-    const UniqueCString line(buffer);
-    if (length > 0 && buffer[length - 1] == '\n') {
-        --length;
-    }
-    if (length <= 0) {
-        return false;
-    }
-    out.assign(buffer, static_cast<size_t>(length));
-    return true;
+    return NoThrow(VFS_ERR_FAILED, [&] { return ReadFirstLine(path, out); });
 }
 
 int GetFileInfo(const char* path, std::string& owner, std::string& group, unsigned int& mode) {

@@ -1,4 +1,5 @@
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <sys/statfs.h>
 #include <unistd.h>
 #include <zosplatform/process.h>
@@ -8,11 +9,14 @@
 #include <cstdio>
 #include <cstdlib>
 
+#include "core/entry_name.h"
 #include "core/error_cell.h"
 #include "core/fd_io.h"
 #include "core/handle.h"
+#include "core/identity.h"
 #include "core/log.h"
 #include "core/no_throw.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
 #include "mount/daemon.h"
 #include "mount/fork_as_user.h"
@@ -72,8 +76,21 @@ int SpawnFuse(const std::string& mount_point, GPid& pid) {
     return kLaunched;
 }
 
+/** Only root takes what is root's or a stranger's out of a sticky folder; the user makes the mount
+ * point then. */
+void ClearMountPoint(uid_t uid) {
+    const EffectiveUid as_root(0);
+    const EntryPath place = SplitPath(paths::FuseTree(uid));
+    const OwnedFolder above = OwnedFolder::Open(place.folder, uid);
+    struct stat info {};
+    if (above.Stat(place.name, info) && !S_ISDIR(info.st_mode)) {
+        above.Remove(place.name);  // what stays is told by whoever cannot make the folder
+    }
+}
+
 /** The helper's work: as the user, since the mount must be the user's. */
 int LaunchAsUser(uid_t uid) {
+    ClearMountPoint(uid);
     if (!BecomeUserBySavedRoot(uid)) {
         return kLaunchFailed;
     }
@@ -135,11 +152,47 @@ int RunFuse(uid_t uid, int& pid) {
     return result;
 }
 
-[[noreturn]] void UnmountAsRoot(const std::string& path) noexcept {
+/** Lets nobody but root change what a folder holds while root goes by a path through it. */
+class ClosedToOthers {
+  public:
+    explicit ClosedToOthers(const OwnedFolder& folder) : fd_(folder.OpenForReading()) {
+        closed_ = fd_ && fstat(fd_.Get(), &info_) == 0 && fchown(fd_.Get(), 0, -1) == 0 &&
+                  fchmod(fd_.Get(), info_.st_mode & 0755) == 0;
+    }
+    ClosedToOthers(const ClosedToOthers&) = delete;
+    ClosedToOthers& operator=(const ClosedToOthers&) = delete;
+    ~ClosedToOthers() {
+        if (closed_ && (fchown(fd_.Get(), info_.st_uid, -1) != 0 ||
+                        fchmod(fd_.Get(), info_.st_mode & 07777) != 0)) {
+            LOG_ERROR("Failed to open a folder to its users again, %m");
+        }
+    }
+    explicit operator bool() const { return closed_; }
+
+  private:
+    UniqueFd fd_;
+    struct stat info_ {};
+    bool closed_ = false;
+};
+
+/** umount goes by the path and through links: it must end at the tree's own mount point, not at
+ * whatever file system the user or somebody else has made a link to. */
+bool Unmount(const std::string& path, uid_t uid) {
+    const EntryPath place = SplitPath(path);
+    const OwnedFolder above = OwnedFolder::Open(place.folder, uid);
+    const ClosedToOthers closed(above);
+    struct stat info {};
+    if (!closed || (above.Stat(place.name, info) && S_ISLNK(info.st_mode))) {
+        return false;
+    }
+    return YLIBCExec(paths::kUmount, path.c_str(), nullptr) == 0;
+}
+
+[[noreturn]] void UnmountAsRoot(const std::string& path, uid_t uid) noexcept {
     if (!BecomeRootForGood()) {
         _exit(1);
     }
-    if (YLIBCExec(paths::kUmount, path.c_str(), nullptr) != 0) {
+    if (!Unmount(path, uid)) {
         LOG_ERROR("Failed to umount %s", path.c_str());
     }
     _exit(0);
@@ -151,7 +204,7 @@ void RepairMountPoint(uid_t uid) {
     const std::string path = paths::FuseTree(uid);
     const pid_t child = YLIBCProcFork();
     if (child == 0) {
-        UnmountAsRoot(path);
+        UnmountAsRoot(path, uid);
     }
     if (child < 0) {
         LOG_ERROR("Failed to fork, %m");

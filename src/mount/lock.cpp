@@ -4,10 +4,11 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
 
+#include "core/entry_name.h"
 #include "core/error_cell.h"
 #include "core/handle.h"
+#include "core/identity.h"
 #include "core/log.h"
 #include "core/paths.h"
 #include "mount/mkdir.h"
@@ -26,7 +27,7 @@ constexpr int kExclusive = LOCK_EX | LOCK_NB;
 constexpr unsigned kMntMask = 0x10;
 
 struct LockSlot {
-    FILE* stream;  ///< null while the lock is not held
+    UniqueFd file;  ///< none while the lock is not held
     unsigned mask;
     int count;
     int operation;  ///< the flock operation by which it is held
@@ -34,8 +35,8 @@ struct LockSlot {
 
 /** The locks of this process, whoever it acts for; a mask of 0 ends the table. */
 LockSlot rgslckList[] = {
-    {nullptr, kMntMask, 0, 0},
-    {nullptr, 0, 0, 0},
+    {UniqueFd(), kMntMask, 0, 0},
+    {UniqueFd(), 0, 0, 0},
 };
 
 LockSlot* FindSlot(unsigned mask) {
@@ -48,33 +49,52 @@ LockSlot* FindSlot(unsigned mask) {
 }
 
 int Release(LockSlot& slot) {
-    if (slot.stream == nullptr) {
+    if (!slot.file) {
         return 0;
     }
     if (slot.count >= 2) {
         --slot.count;
         return 0;
     }
-    const bool unlocked = flock(fileno(slot.stream), LOCK_UN) == 0;
+    const bool unlocked = flock(slot.file.Get(), LOCK_UN) == 0;
     if (!unlocked) {
         SetPlatformErr(ZOS_ERR_UNLOCK_FAILED);
     }
-    fclose(slot.stream);
-    slot.stream = nullptr;
+    slot.file.Reset();
     slot.count = 0;
     return unlocked ? 0 : -1;
 }
 
-enum class Attempt { kTaken, kBusy, kRefused };
+enum class Attempt { kTaken, kBusy, kRefused, kFailed };
 
-Attempt TakeFree(LockSlot& slot, const char* path, int operation) {
-    // A child that only forks shares the lock; a program that it executes must not keep it.
-    slot.stream = fopen(path, "re");
-    if (slot.stream == nullptr) {
-        return Attempt::kBusy;
+/** Readable for the user's own processes whatever the umask of the one that made it. */
+bool OpenToReaders(int fd) {
+    constexpr mode_t kMode = 0644;
+    struct stat info {};
+    return fstat(fd, &info) == 0 &&
+           ((info.st_mode & kMode) == kMode || fchmod(fd, info.st_mode | kMode) == 0);
+}
+
+/** As root where the process can be: an older version's file may be closed to the user. */
+UniqueFd OpenLockFile(const std::string& path, uid_t actor) {
+    const EffectiveUid as_root(0);
+    const EntryPath place = SplitPath(path);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, actor);
+    UniqueFd fd = folder ? folder.OpenOrMake(place.name, O_RDONLY, 0644) : UniqueFd();
+    if (fd && !OpenToReaders(fd.Get())) {
+        errno = 0;  // nobody else's to change, and open it is
+    }
+    return fd;
+}
+
+/** Opened anew by each attempt: whoever cleans up below /tmp may have removed what others hold. */
+Attempt TakeFree(LockSlot& slot, const std::string& path, uid_t actor, int operation) {
+    slot.file = OpenLockFile(path, actor);
+    if (!slot.file) {
+        return Attempt::kFailed;
     }
     slot.count = 1;
-    if (flock(fileno(slot.stream), operation) != 0) {
+    if (flock(slot.file.Get(), operation) != 0) {
         const int saved = errno;
         Release(slot);
         errno = saved;
@@ -84,9 +104,9 @@ Attempt TakeFree(LockSlot& slot, const char* path, int operation) {
     return Attempt::kTaken;
 }
 
-Attempt Take(LockSlot& slot, const char* path, int operation) {
-    if (slot.stream == nullptr) {
-        return TakeFree(slot, path, operation);
+Attempt Take(LockSlot& slot, const std::string& path, uid_t actor, int operation) {
+    if (!slot.file) {
+        return TakeFree(slot, path, actor, operation);
     }
     ++slot.count;
     if (slot.operation == kShared && operation == kExclusive) {
@@ -98,25 +118,15 @@ Attempt Take(LockSlot& slot, const char* path, int operation) {
     return Attempt::kTaken;
 }
 
-/** Anybody may write to the folder of the lock: nothing found there is followed or waited for. */
-bool MakeLockFile(const char* path) {
-    struct stat info {};
-    if (stat(path, &info) == 0 && S_ISREG(info.st_mode)) {
-        return true;
-    }
-    const UniqueFd fd(
-        open(path, O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC, 0666));
-    if (!fd) {
-        SetPlatformErr(ZOS_ERR_OPEN_FAILED);
-    }
-    return static_cast<bool>(fd);
-}
-
-bool TakeWithin110Seconds(LockSlot& slot, const char* path, int operation) {
+bool TakeWithin110Seconds(LockSlot& slot, const std::string& path, uid_t actor, int operation) {
     for (int attempt = 1;; ++attempt) {
-        const Attempt result = Take(slot, path, operation);
+        const Attempt result = Take(slot, path, actor, operation);
         if (result == Attempt::kTaken) {
             return true;
+        }
+        if (result == Attempt::kFailed) {
+            SetPlatformErr(ZOS_ERR_OPEN_FAILED);
+            return false;
         }
         if (result == Attempt::kRefused || attempt == kAttempts) {
             SetPlatformErr(ZOS_ERR_TRY_AGAIN);
@@ -129,14 +139,13 @@ bool TakeWithin110Seconds(LockSlot& slot, const char* path, int operation) {
 }  // namespace
 
 bool LockMnt(bool exclusive) {
-    const std::string path = paths::MountLock(GetActorUID());
-    if (!CreateParentFolder(path)) {
+    const uid_t actor = GetActorUID();
+    const std::string path = paths::MountLock(actor);
+    if (!CreateParentFolder(path, actor)) {
         LOG_ERROR("Failed to lock init");
         return false;
     }
-    LockSlot* slot = FindSlot(kMntMask);
-    if (!MakeLockFile(path.c_str()) ||
-        !TakeWithin110Seconds(*slot, path.c_str(), exclusive ? kExclusive : kShared)) {
+    if (!TakeWithin110Seconds(*FindSlot(kMntMask), path, actor, exclusive ? kExclusive : kShared)) {
         LOG_ERROR("Failed to lock %s, %m", path.c_str());
         return false;
     }

@@ -1,12 +1,15 @@
 #include "mount/mkdir.h"
 
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
+#include <utility>
 
+#include "core/entry_name.h"
 #include "core/error_cell.h"
 #include "core/handle.h"
 #include "core/identity.h"
@@ -41,6 +44,12 @@ class NoUmask {
     mode_t saved_;
 };
 
+mode_t ModeUnderUmask() {
+    const mode_t mask = umask(0);
+    umask(mask);
+    return 0777 & ~mask;
+}
+
 struct Rules {
     bool replace_non_dir;
     bool change_owner;
@@ -55,62 +64,98 @@ Rules MakeRules(int replace_non_dir, unsigned uid, unsigned gid, unsigned mode) 
         uid != kLeaveAlone || gid != kLeaveAlone,
         uid == kLeaveAlone ? geteuid() : uid,
         gid == kLeaveAlone ? getegid() : gid,
-        mode == kLeaveAlone ? 0777 : static_cast<mode_t>(mode),
+        mode == kLeaveAlone ? ModeUnderUmask() : static_cast<mode_t>(mode),
     };
 }
 
-bool IsFolder(const char* path) {
-    struct stat info {};
-    return stat(path, &info) == 0 && S_ISDIR(info.st_mode);
+/** Who stands above may do as root likes; a link that others could have put there is none to
+ * follow.
+ */
+bool IsRootsLink(int above, const char* name, const char* path) {
+    struct stat folder {};
+    struct stat link {};
+    return !IsOurFolder(path) && fstat(above, &folder) == 0 &&
+           fstatat(above, name, &link, AT_SYMLINK_NOFOLLOW) == 0 && folder.st_uid == 0 &&
+           (folder.st_mode & (S_IWGRP | S_IWOTH)) == 0 && link.st_uid == 0;
 }
 
-bool IsThere(const char* path) {
-    struct stat info {};
-    return lstat(path, &info) == 0;
+UniqueFd EnterFolder(int above, const char* name, const char* path) {
+    constexpr int kEnter = O_PATH | O_DIRECTORY | O_CLOEXEC;
+    UniqueFd folder(openat(above, name, kEnter | O_NOFOLLOW));
+    if (!folder && errno == ENOTDIR && IsRootsLink(above, name, path)) {
+        folder.Reset(openat(above, name, kEnter));
+    }
+    return folder;
 }
 
-int MakeFolder(const char* path, const Rules& rules) {
-    if (mkdir(path, rules.mode) != 0) {
+bool IsThere(int above, const char* name) {
+    struct stat info {};
+    return fstatat(above, name, &info, AT_SYMLINK_NOFOLLOW) == 0;
+}
+
+/** `path` is the whole of it up to there. */
+struct Component {
+    int above;
+    const char* name;
+    const char* path;
+    bool last;
+};
+
+int MakeFolder(const Component& at, const Rules& rules) {
+    if (mkdirat(at.above, at.name, SafeFolderMode(at.path, rules.mode)) != 0) {
         // Made by somebody else meanwhile: theirs to own.
         return errno == EEXIST ? 0 : FailMkdir(errno, ZOS_ERR_SYSTEM);
     }
-    if (rules.change_owner && chown(path, rules.uid, rules.gid) != 0) {
+    if (rules.change_owner &&
+        fchownat(at.above, at.name, rules.uid, rules.gid, AT_SYMLINK_NOFOLLOW) != 0) {
         const int error = errno;
-        LOG_ERROR("Failed to chown %s, %m", path);
+        LOG_ERROR("Failed to chown %s, %m", at.path);
         return FailMkdir(error, ZOS_ERR_SYSTEM);
     }
     return 0;
 }
 
-/** `path` ends behind the component in question. */
-int PassComponent(const char* path, bool last, const Rules& rules) {
-    if (IsFolder(path)) {
-        return 0;
-    }
-    if (IsThere(path)) {
+int MakeInPlace(const Component& at, const Rules& rules) {
+    if (IsThere(at.above, at.name)) {
         if (!rules.replace_non_dir) {
-            return last ? FailMkdir(EEXIST, ZOS_ERR_EXISTS)
-                        : FailMkdir(ENOTDIR, ZOS_ERR_NOT_A_FOLDER);
+            return at.last ? FailMkdir(EEXIST, ZOS_ERR_EXISTS)
+                           : FailMkdir(ENOTDIR, ZOS_ERR_NOT_A_FOLDER);
         }
-        if (remove(path) != 0) {
-            LOG_ERROR("Failed to remove %s, %m", path);
+        if (unlinkat(at.above, at.name, 0) != 0) {
+            LOG_ERROR("Failed to remove %s, %m", at.path);
         }
     }
-    return MakeFolder(path, rules);
+    return MakeFolder(at, rules);
+}
+
+/** Goes one component down, by descriptor: what is made stands where we have come to. */
+int PassComponent(UniqueFd& folder, const Component& at, const Rules& rules) {
+    UniqueFd next = EnterFolder(at.above, at.name, at.path);
+    if (!next) {
+        if (MakeInPlace(at, rules) != 0) {
+            return -1;
+        }
+        next = EnterFolder(at.above, at.name, at.path);
+        if (!next && !at.last) {
+            return FailMkdir(errno, ZOS_ERR_SYSTEM);
+        }
+    }
+    folder = std::move(next);
+    return 0;
 }
 
 /** Works on a copy of the path, which it cuts behind one component after the other. */
 int Walk(char* path, size_t& reached, const Rules& rules) {
+    UniqueFd folder(open(*path == '/' ? "/" : ".", O_PATH | O_DIRECTORY | O_CLOEXEC));
     char* begin = path + strspn(path, "/");
     while (*begin != '\0') {
         char* end = begin + strcspn(begin, "/");
         char* next = end + strspn(end, "/");
-        const bool last = *next == '\0';
         reached = static_cast<size_t>(end - path);
 
         const char separator = *end;
         *end = '\0';
-        if (PassComponent(path, last, rules) != 0) {
+        if (PassComponent(folder, {folder.Get(), begin, path, *next == '\0'}, rules) != 0) {
             return -1;
         }
         *end = separator;
@@ -159,17 +204,23 @@ bool CreateFolder(const char* path, char** stop, bool replaceNonDir, unsigned in
     return false;
 }
 
-bool CreateParentFolder(const std::string& path, SourceLine at) {
+OwnedFolder CreateOwnedFolder(const std::string& path, uid_t user) {
     constexpr unsigned kOpenToAll = 0777;
-    const size_t slash = path.find_last_of('/');
-    const std::string folder = slash == std::string::npos ? "."
-                               : slash == 0               ? "/"
-                                                          : path.substr(0, slash);
-    if (CreateFolder(folder.c_str(), nullptr, true, kLeaveAlone, kLeaveAlone, kOpenToAll)) {
-        return true;
+    OwnedFolder folder = OwnedFolder::Open(path, user);
+    if (!folder &&
+        CreateFolder(path.c_str(), nullptr, true, kLeaveAlone, kLeaveAlone, kOpenToAll)) {
+        folder = OwnedFolder::Open(path, user);
     }
-    LOG_ERROR_AT(at, "Failed to mkdir %s, %m", folder.c_str());
-    return false;
+    return folder;
+}
+
+OwnedFolder CreateParentFolder(const std::string& path, uid_t user, SourceLine at) {
+    const std::string above = SplitPath(path).folder;
+    OwnedFolder folder = CreateOwnedFolder(above, user);
+    if (!folder) {
+        LOG_ERROR_AT(at, "Failed to mkdir %s, %m", above.c_str());
+    }
+    return folder;
 }
 
 }  // namespace ZYROVFS::Utils

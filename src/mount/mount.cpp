@@ -1,6 +1,5 @@
 #include <fcntl.h>
 #include <unistd.h>
-#include <zosplatform/file.h>
 #include <zosplatform/process.h>
 
 #include <cerrno>
@@ -15,6 +14,7 @@
 #include "core/no_throw.h"
 #include "core/paths.h"
 #include "mount/fork_as_user.h"
+#include "mount/known_hosts.h"
 #include "mount/mount_child.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
@@ -29,9 +29,10 @@ bool Contains(const std::string& text, const char* part) {
     return text.find(part) != std::string::npos;
 }
 
-void RemoveHostKey(const std::string& uri, const std::string& known_hosts) {
+void RemoveHostKey(const std::string& uri, uid_t actor) {
+    const std::string known_hosts = paths::KnownHosts(actor);
     std::string host;
-    if (!YLIBCFileExist(known_hosts.c_str()) || !Server::GetSFTPHost(uri.c_str(), host)) {
+    if (!HasKnownHosts(actor) || !Server::GetSFTPHost(uri.c_str(), host)) {
         return;
     }
     if (YLIBCExec(paths::kSshKeygen, "-R", host.c_str(), "-f", known_hosts.c_str(),
@@ -44,7 +45,7 @@ void RemoveHostKey(const std::string& uri, const std::string& known_hosts) {
 void ForgetHostKey(const std::string& uri) {
     const uid_t actor = GetActorUID();
     IF_RUN_AS(actor, 0) {
-        RemoveHostKey(uri, paths::KnownHosts(actor));
+        RemoveHostKey(uri, actor);
     }
     else {
         LOG_ERROR("Failed to change to uid %u", actor);

@@ -1,19 +1,19 @@
-#include <fcntl.h>
 #include <openssl/bio.h>
 #include <openssl/pem.h>
 #include <openssl/ssl.h>
 #include <openssl/x509_vfy.h>
 #include <strings.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
 
+#include "core/entry_name.h"
 #include "core/no_throw.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
-#include "core/replace_file.h"
 #include "mount/curl.h"
+#include "mount/mkdir.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 
@@ -29,7 +29,9 @@ bool save_failed = false;
 /** Folder and file of a server, and the address to ask, without the user. */
 struct Location {
     std::string url;
-    std::string file;
+    OwnedFolder folder;
+    std::string name;  ///< in the folder
+    std::string file;  ///< the same as a path
 };
 
 enum class Verdict { kTrusted, kUntrusted, kFailed };
@@ -49,7 +51,9 @@ bool SavePem(X509* certificate, const std::string& path) {
     char* text = nullptr;
     const long length = BIO_get_mem_data(bio.get(), &text);
     // Readable whatever the umask: the user's backends read what root writes here.
-    if (!ReplaceFile(path, std::string(text, static_cast<size_t>(length)), 0644)) {
+    const EntryPath place = SplitPath(path);
+    if (!OwnedFolder::Open(place.folder, GetActorUID())
+             .Replace(place.name, std::string(text, static_cast<size_t>(length)), 0644)) {
         LOG_ERROR("Failed to write %s, %m", path.c_str());
         return false;
     }
@@ -85,37 +89,19 @@ CURLcode SaverCtxFn(CURL*, void* ctx, void* path) noexcept try {
     return CURLE_OUT_OF_MEMORY;
 }
 
-/** The effective user's view; access() would answer for the real one. */
-bool Exists(const std::string& path) {
-    struct stat info {};
-    return stat(path.c_str(), &info) == 0;
-}
-
-/** Links count as strangers here: anyone may have put one into the folder above. */
-bool IsFolder(const std::string& path) {
-    struct stat info {};
-    return lstat(path.c_str(), &info) == 0 && S_ISDIR(info.st_mode);
-}
-
-/**
- * The folder above is that of the user's profiles, which a user who never saved one does not have
- * yet. Every user may write there, so the new folder is given away by its descriptor and not by its
- * name.
- */
-bool MakeSslFolder(const std::string& path, uid_t uid) {
-    const std::string above = paths::UserConfigDir(uid);
-    if (!Exists(above) && !Utils::CreateFolder(above.c_str(), nullptr, true, -1, -1, 0777)) {
-        return false;
+/** The folder above is that of the user's profiles, which a user who never saved one does not have
+ * yet. */
+OwnedFolder OpenSslFolder(uid_t uid) {
+    const std::string path = paths::SslDir(uid);
+    OwnedFolder folder = OwnedFolder::Open(path, uid);
+    if (folder) {
+        return folder;
     }
-    if (mkdir(path.c_str(), 0700) != 0) {
-        return errno == EEXIST && IsFolder(path);
+    const OwnedFolder above = Utils::CreateOwnedFolder(paths::UserConfigDir(uid), uid);
+    if (above && (above.MakeFolder(SplitPath(path).name, 0700, {uid, 0}) || errno == EEXIST)) {
+        folder = OwnedFolder::Open(path, uid);
     }
-    const UniqueFd fd(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
-    if (!fd || fchown(fd.Get(), uid, 0) != 0) {
-        rmdir(path.c_str());  // half made, it would pass for ready next time
-        return false;
-    }
-    return true;
+    return folder;
 }
 
 /** dav is http under another name. */
@@ -137,9 +123,10 @@ bool Locate(const char* given, Location& location) {
         LOG_ERROR("Failed to get host from %s", url.c_str());
         return Fail(VFS_ERR_HOST_UNREACHABLE);
     }
-    const std::string folder = paths::SslDir(GetActorUID());
-    if (!MakeSslFolder(folder, GetActorUID())) {
-        LOG_ERROR("Failed to create ssl folder %s", folder.c_str());
+    const std::string path = paths::SslDir(GetActorUID());
+    location.folder = OpenSslFolder(GetActorUID());
+    if (!location.folder) {
+        LOG_ERROR("Failed to create ssl folder %s", path.c_str());
         return Fail(VFS_ERR_FAILED);
     }
     std::string base;
@@ -149,7 +136,9 @@ bool Locate(const char* given, Location& location) {
         LOG_ERROR("Failed to parse url %s", url.c_str());
         return Fail(VFS_ERR_HOST_UNREACHABLE);
     }
-    location = {base + rest, folder + "/" + host};
+    location.url = base + rest;
+    location.name = host;
+    location.file = path + "/" + host;
     return true;
 }
 
@@ -161,10 +150,24 @@ bool Download(const char* user, const char* password, const Location& location) 
     return true;
 }
 
+/** Whether something stands in the file's place that can say whom to trust: a file, or a link to
+ * the bundle. What else a FIFO or a link may be for, it is no certificate. */
+bool HasSavedFile(const Location& location) {
+    struct stat info {};
+    std::string target;
+    if (!location.folder.Stat(location.name, info)) {
+        return false;
+    }
+    if (S_ISLNK(info.st_mode)) {
+        return location.folder.ReadLink(location.name, target) && target == paths::kCaBundle;
+    }
+    return S_ISREG(info.st_mode) || S_ISDIR(info.st_mode);
+}
+
 /** What the user's own file says. One that no longer fits the server is removed: the certificate
  * was renewed, and what was trusted is gone. */
 Verdict AskSavedFile(const char* user, const char* password, const Location& location) {
-    if (!Exists(location.file)) {
+    if (!HasSavedFile(location)) {
         return Verdict::kUntrusted;
     }
     if (Utils::VerifyCert(user, password, location.url.c_str(), location.file.c_str())) {
@@ -174,19 +177,19 @@ Verdict AskSavedFile(const char* user, const char* password, const Location& loc
         LOG_ERROR("Failed to verify cert %s by %s", location.url.c_str(), location.file.c_str());
         return Verdict::kFailed;
     }
-    if (unlink(location.file.c_str()) != 0) {
+    if (!location.folder.Remove(location.name)) {
         LOG_ERROR("Failed to unlink %s, %m", location.file.c_str());
     }
     return Verdict::kUntrusted;
 }
 
-bool LinkToBundle(const std::string& file) {
-    if (Exists(file)) {
+bool LinkToBundle(const Location& location) {
+    if (HasSavedFile(location)) {
         return true;
     }
-    unlink(file.c_str());  // a link that leads nowhere
-    if (symlink(paths::kCaBundle, file.c_str()) != 0) {
-        LOG_ERROR("Failed to create symlink to %s, %m", file.c_str());
+    location.folder.Remove(location.name);  // what is no certificate
+    if (!location.folder.MakeLink(location.name, paths::kCaBundle)) {
+        LOG_ERROR("Failed to create symlink to %s, %m", location.file.c_str());
         return Fail(VFS_ERR_FAILED);
     }
     return true;
@@ -205,7 +208,7 @@ bool VerifyPeer(const char* user, const char* password, const char* url, bool fo
         return verdict == Verdict::kTrusted;
     }
     return Utils::VerifyCert(user, password, location.url.c_str(), paths::kCaBundle) &&
-           LinkToBundle(location.file);
+           LinkToBundle(location);
 }
 
 }  // namespace
@@ -225,7 +228,9 @@ bool Utils::DownloadCert(const char* user, const char* password, const char* url
             !SetCurlTarget(curl.get(), user, password, url) || !PerformCurl(curl.get(), url)) {
             return false;
         }
-        if (save_failed || !Exists(certPath)) {
+        const EntryPath place = SplitPath(certPath);
+        struct stat info {};
+        if (save_failed || !OwnedFolder::Open(place.folder, GetActorUID()).Stat(place.name, info)) {
             LOG_ERROR("Failed to save cert %s", certPath);
             return Fail(VFS_ERR_FAILED);
         }

@@ -9,19 +9,20 @@
 #include <openssl/x509.h>
 #include <openssl/x509_vfy.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
-#include <algorithm>
 #include <atomic>
 #include <cerrno>
-#include <climits>
 #include <cstdlib>
 #include <cstring>
 
+#include "core/entry_name.h"
+#include "core/fd_io.h"
 #include "core/no_throw.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
 #include "mount/cert_info.h"
 #include "mount/curl.h"
+#include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 
 namespace ZYROVFS {
@@ -37,8 +38,7 @@ using UniqueBio = std::unique_ptr<BIO, FreeWith<BIO_free_all>>;
 std::atomic<bool> check_chain{false};
 
 /** Far above any bundle. The folder belongs to the user, who may put anything there. */
-constexpr off_t kCertFileLimit = 16 * 1024 * 1024;
-constexpr size_t kReadPiece = 1024;
+constexpr size_t kCertFileLimit = 16 * 1024 * 1024;
 
 struct Digest {
     unsigned char bytes[EVP_MAX_MD_SIZE];
@@ -139,23 +139,6 @@ void LoadRoots(SSL_CTX* ssl) {
     }
 }
 
-/** Fills `data` up to `size` bytes or the end of the file. */
-bool ReadPieces(int fd, char* data, size_t size) {
-    size_t done = 0;
-    while (done < size) {
-        const ssize_t n = read(fd, data + done, std::min(kReadPiece, size - done));
-        if (n == 0) {
-            return true;
-        }
-        if (n > 0) {
-            done += static_cast<size_t>(n);
-        } else if (errno != EINTR) {
-            return false;
-        }
-    }
-    return true;
-}
-
 bool SetTrust(CURL* curl, const char* cert_path, char* saved) {
     return SetCurlVerification(curl, Utils::isTrustRootCA(cert_path)) &&
            SetCurlOption(curl, CURLOPT_SSL_CTX_FUNCTION, &Utils::VerifyCertCtxFn) &&
@@ -166,17 +149,21 @@ bool SetTrust(CURL* curl, const char* cert_path, char* saved) {
 }  // namespace
 
 bool Utils::isTrustRootCA(const char* path) {
+    if (path == nullptr) {
+        return false;
+    }
+    const EntryPath place = SplitPath(path);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, GetActorUID());
     struct stat info {};
-    if (path == nullptr || lstat(path, &info) != 0) {
+    if (!folder.Stat(place.name, info)) {
         return false;
     }
     if (S_ISREG(info.st_mode)) {
         return strcmp(path, paths::kCaBundle) == 0;
     }
-    char target[PATH_MAX];
-    const ssize_t length = S_ISLNK(info.st_mode) ? readlink(path, target, sizeof target) : -1;
-    return length == static_cast<ssize_t>(strlen(paths::kCaBundle)) &&
-           memcmp(target, paths::kCaBundle, static_cast<size_t>(length)) == 0;
+    std::string target;
+    return S_ISLNK(info.st_mode) && folder.ReadLink(place.name, target) &&
+           target == paths::kCaBundle;
 }
 
 char* Utils::GetCertData(const char* path) {
@@ -185,25 +172,23 @@ char* Utils::GetCertData(const char* path) {
         LOG_ERROR("Failed to open [%s], %m", "");
         return nullptr;
     }
-    // Not blocking: a FIFO in the file's place would be waited for without end.
-    const UniqueFd fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK));
-    if (!fd) {
+    // The one link that means something is read as what it means.
+    const EntryPath place = SplitPath(isTrustRootCA(path) ? paths::kCaBundle : path);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, GetActorUID());
+    const UniqueFd fd = folder.OpenFile(place.name, O_RDONLY);
+    if (!fd && errno != EISDIR) {
         LOG_ERROR("Failed to open [%s], %m", path);
         return nullptr;
     }
-    struct stat info {};
-    if (fstat(fd.Get(), &info) != 0) {
-        LOG_ERROR("Failed to fstat [%s], %m", path);
-        return nullptr;
-    }
-    const bool fits = info.st_size <= kCertFileLimit;
-    errno = fits ? 0 : EFBIG;
-    const size_t size = fits ? static_cast<size_t>(info.st_size) : 0;
-    UniqueCString data(fits ? static_cast<char*>(calloc(size + 1, 1)) : nullptr);
-    if (data == nullptr || !ReadPieces(fd.Get(), data.get(), size)) {
+    std::string text;
+    UniqueCString data(fd && ReadUpTo(fd.Get(), kCertFileLimit, text)
+                           ? static_cast<char*>(calloc(text.size() + 1, 1))
+                           : nullptr);
+    if (data == nullptr) {
         LOG_ERROR("Failed to read data, %m");
         return nullptr;
     }
+    text.copy(data.get(), text.size());
     return data.release();
 }
 

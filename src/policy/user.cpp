@@ -1,12 +1,17 @@
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
+
+#include <cerrno>
 
 #include <zosplatform/file.h>
 #include <zosplatform/user.h>
 
+#include "core/entry_name.h"
 #include "core/identity.h"
 #include "core/json.h"
 #include "core/no_throw.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
 #include "policy/user_settings.h"
 #include "zyrovfs/cfg.h"
@@ -24,6 +29,38 @@ bool Restore(const RootUntilRestored& root) {
     }
     LOG_ERROR("Failed to restore euid[%d], %m", static_cast<int>(root.Saved()));
     return false;
+}
+
+/** Whoever may write the policy decides about everybody's connections. */
+bool ReadOwnedByRoot(Json::Value& value, const std::string& path) {
+    value = Json::Value();
+    const EntryPath place = SplitPath(path);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, 0);
+    struct stat info {};
+    if (!folder || !folder.Stat(place.name, info)) {
+        return false;
+    }
+    if ((info.st_mode & (S_IWGRP | S_IWOTH)) != 0) {
+        errno = EPERM;
+        return false;
+    }
+    return json::fromFile(value, folder, place.name);
+}
+
+/** By the caller's identity, and by descriptor. */
+bool SetMode(mode_t mode) {
+    const EntryPath place = SplitPath(paths::kPolicyFile);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, 0);
+    const UniqueFd fd = folder.OpenFile(place.name, O_RDONLY);
+    return fd && fchmod(fd.Get(), mode) == 0;
+}
+
+/** Below /tmp everybody can make such a file: only root's tells of an update. */
+bool IsRoots(const char* path) {
+    const EntryPath place = SplitPath(path);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, 0);
+    struct stat info {};
+    return folder && folder.Stat(place.name, info);
 }
 
 }  // namespace
@@ -52,7 +89,7 @@ VFSEntityCfg::~VFSEntityCfg() {
     if (!JsonToFile(paths::kPolicyFile)) {
         LOG_ERROR("JsonToFile failed: %s", paths::kPolicyFile);
         SetErr(VFS_ERR_CONFIG_WRITE);
-    } else if (chmod(paths::kPolicyFile, kMode) != 0) {
+    } else if (!SetMode(kMode)) {
         LOG_ERROR("Failed to chmod 744 for %s", paths::kPolicyFile);
         SetErr(VFS_ERR_CONFIG_WRITE);
     }
@@ -60,7 +97,7 @@ VFSEntityCfg::~VFSEntityCfg() {
 
 bool VFSEntityCfg::JsonFromFile(Json::Value& value, const char* path) {
     const RootUntilRestored root;
-    return path != nullptr && json::fromFile(value, path) && Restore(root);
+    return path != nullptr && ReadOwnedByRoot(value, path) && Restore(root);
 }
 
 bool VFSEntityCfg::JsonToFile(const char* path) {
@@ -104,7 +141,8 @@ template ZYROVFS_API bool VFSEntityCfg::Get(unsigned long id, Json::Value& out) 
 bool VFSEntityCfg::ConvertStrToAuthType(AUTH_TYPE& type, const std::string& text) {
     if (text == "domain") {
         type = AUTH_TYPE_DOMAIN;
-        if (YLIBCReadPidFile(settings_.domainPid) > 0 || YLIBCFileExist(paths::kDomainUpdating)) {
+        if ((IsRoots(settings_.domainPid) && YLIBCReadPidFile(settings_.domainPid) > 0) ||
+            IsRoots(paths::kDomainUpdating)) {
             LOG_ERROR("Domain user updating");
             return Fail(VFS_ERR_BUSY);
         }

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "core/no_throw.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
 #include "policy/belonging.h"
 #include "policy/user_settings.h"
@@ -35,11 +36,13 @@ bool IsDirectory(int parent, const dirent& entry) {
 /** Everyone who has had a connection and is no administrator. */
 std::vector<unsigned int> NonAdminUids() {
     std::vector<unsigned int> uids;
-    const UniqueDir dir(opendir(paths::kConnectRoot));
+    UniqueFd fd = OwnedFolder::Open(paths::kConnectRoot, 0).OpenForReading();
+    const UniqueDir dir(fd ? fdopendir(fd.Get()) : nullptr);
     if (!dir) {
         LOG_ERROR("Failed to opendir, path=%s", paths::kConnectRoot);
         return uids;
     }
+    fd.Release();
     while (const dirent* entry = readdir(dir.get())) {
         unsigned int uid = 0;
         if (ToUid(entry->d_name, uid) && IsDirectory(dirfd(dir.get()), *entry) &&

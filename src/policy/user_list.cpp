@@ -1,3 +1,4 @@
+#include <fcntl.h>
 #include <strings.h>
 
 #include <zosplatform/file.h>
@@ -6,8 +7,10 @@
 
 #include <algorithm>
 
+#include "core/entry_name.h"
 #include "core/identity.h"
 #include "core/no_throw.h"
+#include "core/owned_folder.h"
 #include "policy/belonging.h"
 #include "policy/user_settings.h"
 #include "zyrovfs/cfg.h"
@@ -28,6 +31,16 @@ struct Context {
     const Json::Value& settings;
     Json::Value& entries;
 };
+
+/** It stands below /tmp: a stranger who made it first could lock it for ever. What fails here is
+ * told by the lock itself. */
+void ClaimLockFile(const std::string& path) {
+    const EntryPath place = SplitPath(path);
+    const OwnedFolder folder = OwnedFolder::Open(place.folder, 0);
+    if (folder.MoveStrangerAside(place.name)) {
+        folder.OpenOrMake(place.name, O_RDWR, 0600);
+    }
+}
 
 Json::Value StoredEntry(const Context& context, const char* name, const std::string& id,
                         const char* id_key) {
@@ -203,6 +216,7 @@ bool VFSEntityCfg::List(int start, int limit, std::string authType, std::string 
         if (!ConvertStrToAuthType(type, authType)) {
             return false;
         }
+        ClaimLockFile(settings_.lockFile);
         int fd = -1;
         if (!YLIBCFileLockTimeByFile(settings_.lockFile, 1, kLockSeconds, &fd)) {
             LOG_ERROR("Failed to lock file: %s " PLATFORM_ERROR_FORMAT ", reason=%m",

@@ -1,26 +1,27 @@
 #include <sys/stat.h>
-#include <zosplatform/file.h>
 
 #include "core/error_cell.h"
 #include "core/json.h"
 #include "core/log.h"
 #include "core/no_throw.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
 #include "mount/fork_as_user.h"
+#include "mount/mkdir.h"
 #include "server/config_document.h"
 #include "zyrovfs/server.h"
-#include "zyrovfs/utils.h"
 
 namespace ZYROVFS::Server {
 namespace {
 
 constexpr const char* kServers = "servers";
 constexpr Json::ArrayIndex kMostPerProtocol = 100;
-constexpr unsigned int kKeepOwner = static_cast<unsigned int>(-1);
 
 struct Place {
     std::string directory;
     const char* file;
+
+    std::string Path() const { return directory + "/" + file; }
 };
 
 /** Nowhere for a mode that does not exist: the step that needs the directory then fails. */
@@ -34,29 +35,37 @@ Place PlaceOf(unsigned int uid, VFS_CONFIG_MODE mode) {
     return {"", ""};
 }
 
-bool ReadDocument(const std::string& path, Json::Value& doc) {
+/** Every local user may enter it, and nobody but the user and root change what is the user's. */
+OwnedFolder OpenFolder(unsigned int uid, const Place& place, SourceLine at = SourceLine::Here()) {
+    OwnedFolder folder = Utils::CreateOwnedFolder(place.directory, uid);
+    if (!folder) {
+        LOG_ERROR_AT(at, "Error VFS server config directory, uid: %u", uid);
+        SetErr(VFS_ERR_FAILED, at);
+    }
+    return folder;
+}
+
+bool ReadDocument(const OwnedFolder& folder, const Place& place, Json::Value& doc) {
     struct stat info {};
-    if (stat(path.c_str(), &info) != 0 || info.st_size == 0) {
+    folder.Stat(place.file, info);  // a stranger's is moved aside, and so counts as missing
+    if (fstatat(folder.Get(), place.file, &info, 0) != 0 || info.st_size == 0) {
         if (!doc.isObject()) {
             doc = Json::Value();
         }
         doc[kServers] = Json::Value(Json::objectValue);
         return true;
     }
-    if (!json::fromFile(doc, path)) {
-        LOG_ERROR("Json::Value::fromFile failed: %s", path.c_str());
+    if (!json::fromFile(doc, folder, place.file)) {
+        LOG_ERROR("Json::Value::fromFile failed: %s", place.Path().c_str());
         return false;
     }
     return true;
 }
 
-/**
- * The directory is open to every local user, so the owner is never set by name, which would follow
- * a link put in the file's place: the new file is handed over before it is renamed.
- */
-bool WriteDocument(const std::string& path, unsigned int uid, const Json::Value& doc) {
-    if (!json::toFile(doc, path, 0600, {uid, kUsersGid})) {
-        LOG_ERROR("Json::Value::toFile failed: %s", path.c_str());
+bool WriteDocument(const OwnedFolder& folder, const Place& place, unsigned int uid,
+                   const Json::Value& doc) {
+    if (!json::toFile(doc, folder, place.file, 0600, {uid, kUsersGid})) {
+        LOG_ERROR("Json::Value::toFile failed: %s", place.Path().c_str());
         return false;
     }
     return true;
@@ -124,15 +133,8 @@ bool MoveEntry(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& from,
 }  // namespace
 
 bool CfgCheckPath(unsigned int uid, VFS_CONFIG_MODE mode) {
-    return NoThrow(VFS_ERR_FAILED, [&] {
-        const std::string directory = PlaceOf(uid, mode).directory;
-        if (YLIBCFileCheckDir(directory.c_str()) ||
-            Utils::CreateFolder(directory.c_str(), nullptr, true, kKeepOwner, kKeepOwner, 0777)) {
-            return true;
-        }
-        LOG_ERROR("Error VFS server config directory, uid: %u", uid);
-        return Fail(VFS_ERR_FAILED);
-    });
+    return NoThrow(VFS_ERR_FAILED,
+                   [&] { return static_cast<bool>(OpenFolder(uid, PlaceOf(uid, mode))); });
 }
 
 bool CfgGetPath(unsigned int uid, VFS_CONFIG_MODE mode, std::string& path) {
@@ -140,23 +142,23 @@ bool CfgGetPath(unsigned int uid, VFS_CONFIG_MODE mode, std::string& path) {
         if (!CfgCheckPath(uid, mode)) {
             return false;
         }
-        const Place place = PlaceOf(uid, mode);
-        path = place.directory + "/" + place.file;
+        path = PlaceOf(uid, mode).Path();
         return true;
     });
 }
 
 bool CfgAccess(unsigned int uid, VFS_CONFIG_MODE mode, VFS_CONFIG_ACTION action, Json::Value& doc) {
     return NoThrow(VFS_ERR_FAILED, [&] {
-        std::string path;
-        if (!CfgGetPath(uid, mode, path)) {
+        const Place place = PlaceOf(uid, mode);
+        const OwnedFolder folder = OpenFolder(uid, place);
+        if (!folder) {
             return false;
         }
         switch (action) {
             case VFS_CONFIG_READ:
-                return ReadDocument(path, doc);
+                return ReadDocument(folder, place, doc);
             case VFS_CONFIG_WRITE:
-                return WriteDocument(path, uid, doc);
+                return WriteDocument(folder, place, uid, doc);
         }
         return true;
     });

@@ -1,5 +1,3 @@
-#include <unistd.h>
-#include <zosplatform/file.h>
 #include <zosplatform/process.h>
 
 #include <cerrno>
@@ -8,7 +6,9 @@
 #include "core/handle.h"
 #include "core/identity.h"
 #include "core/log.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
+#include "mount/known_hosts.h"
 #include "server/server_account.h"
 #include "server/server_vfs.h"
 #include "zyrovfs/global.h"
@@ -24,7 +24,7 @@ void ForgetHostKey(unsigned int uid, const std::string& id) {
     const std::string known_hosts = paths::KnownHosts(uid);
     IF_RUN_AS(uid, 0) {
         std::string host;
-        if (YLIBCFileExist(known_hosts.c_str()) && GetSFTPHost(id.c_str(), host) &&
+        if (HasKnownHosts(uid) && GetSFTPHost(id.c_str(), host) &&
             YLIBCExec(paths::kSshKeygen, "-R", host.c_str(), "-f", known_hosts.c_str(),
                       static_cast<char*>(nullptr)) < 0) {
             LOG_ERROR("Failed to remove ssh key %s, errno=%X, %m", host.c_str(), errno);
@@ -47,7 +47,8 @@ void ForgetCertificate(unsigned int uid, const std::string& id) {
         LOG_ERROR("Failed to unlink %s, %m", certificate.c_str());
         return;
     }
-    if (YLIBCFileExist(certificate.c_str()) && unlink(certificate.c_str()) != 0) {
+    const OwnedFolder folder = OwnedFolder::Open(paths::SslDir(uid), uid);
+    if (folder && !folder.Remove(host) && errno != ENOENT) {
         LOG_ERROR("Failed to unlink %s, %m", certificate.c_str());
     }
 }

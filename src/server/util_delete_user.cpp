@@ -6,9 +6,12 @@
 #include <cstdlib>
 #include <memory>
 
+#include "core/entry_name.h"
 #include "core/handle.h"
+#include "core/identity.h"
 #include "core/log.h"
 #include "core/no_throw.h"
+#include "core/owned_folder.h"
 #include "core/paths.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
@@ -44,24 +47,31 @@ void UnmountAll(unsigned int uid) {
     }
 }
 
-void RemoveTree(const std::string& path) {
+/** What leads to the tree is looked at first: rm goes by the path, through any link above it. */
+void RemoveTree(const std::string& path, unsigned int uid) {
     const char* const argv[] = {paths::kRm, "-rf", path.c_str(), nullptr};
-    if (YLIBCExecv(paths::kRm, argv) != 0) {
+    // The folders above are sticky: only root takes root's folders out of them.
+    const EffectiveUid as_root(0);
+    const OwnedFolder above = OwnedFolder::Open(SplitPath(path).folder, uid);
+    if ((!above && errno != ENOENT) || YLIBCExecv(paths::kRm, argv) != 0) {
         LOG_ERROR("Failed to rm -rf %s, errno=%X", path.c_str(), errno);
     }
 }
 
 /** Looks through what the fuse tree shows. Nothing found there keeps the directory: a tree without
  * daemons holds no remote files. */
-void ScanFuseTree(const std::string& path) {
+void ScanFuseTree(unsigned int uid) {
+    const std::string path = paths::FuseTree(uid);
     if (!YLIBCFileExist(path.c_str())) {
         return;
     }
-    const UniqueDir dir(opendir(path.c_str()));
+    UniqueFd fd = OwnedFolder::Open(path, uid).OpenForReading();
+    const UniqueDir dir(fd ? fdopendir(fd.Get()) : nullptr);
     if (!dir) {
         LOG_ERROR("Failed to opendir, path=%s", path.c_str());
         return;
     }
+    fd.Release();
     while (readdir(dir.get()) != nullptr) {
     }
 }
@@ -73,12 +83,12 @@ void RemoveFiles(unsigned int uid, bool removeProfiles, bool removeRuntime) {
     }
     const ScopeExit unlock([] { Utils::UnLockMnt(); });
     if (removeProfiles) {
-        RemoveTree(paths::UserConfigDir(uid));
+        RemoveTree(paths::UserConfigDir(uid), uid);
     }
-    RemoveTree(paths::UserConnectDir(uid));
+    RemoveTree(paths::UserConnectDir(uid), uid);
     if (removeRuntime && AreAllDaemonsDead()) {
-        ScanFuseTree(paths::FuseTree(uid));
-        RemoveTree(paths::RuntimeDir(uid));
+        ScanFuseTree(uid);
+        RemoveTree(paths::RuntimeDir(uid), uid);
     }
 }
 

@@ -46,6 +46,12 @@ bool IsEmpty(const char* text) {
     return text == nullptr || *text == '\0';
 }
 
+/** A type names a folder and files in it: another name would lead root out of the registry. */
+bool NamesNoType(const char* name) {
+    return IsEmpty(name) || strchr(name, '/') != nullptr || strcmp(name, ".") == 0 ||
+           strcmp(name, "..") == 0;
+}
+
 /** Nothing leaves an operation by exception; `fault` is its answer when memory runs out. */
 template <typename Result, typename Body>
 Result OrOnFault(Result fault, Body body, SourceLine at = SourceLine::Here()) noexcept {
@@ -59,25 +65,31 @@ Result OrOnFault(Result fault, Body body, SourceLine at = SourceLine::Here()) no
 
 // --- adding -----------------------------------------------------------------------------------
 
-bool MakeFolder(const std::string& folder) {
+bool MakeFolder(const QueueFiles& files) {
     constexpr unsigned kLeaveAlone = static_cast<unsigned>(-1);
     constexpr unsigned kOpenToAll = 0777;
-    if (YLIBCFileCheckDir(folder.c_str()) != 0 ||
-        Utils::MkdirP(folder.c_str(), nullptr, 1, kLeaveAlone, kLeaveAlone, kOpenToAll) == 0) {
+    if (files.Open()) {
         return true;
     }
-    LOG_ERROR("Failed to mkdir %s" PLATFORM_ERROR_FORMAT ", %m", folder.c_str(), ZYROERR_ARGS);
+    const char* const path = files.folder.c_str();
+    if (Utils::MkdirP(path, nullptr, 1, kLeaveAlone, kLeaveAlone, kOpenToAll) == 0) {
+        if (files.Open()) {
+            return true;
+        }
+        SetPlatformErr(ZOS_ERR_NO_PERMISSION);
+    }
+    LOG_ERROR("Failed to mkdir %s" PLATFORM_ERROR_FORMAT ", %m", path, ZYROERR_ARGS);
     return false;
 }
 
-UniqueFd OpenWithin10Seconds(const std::string& path) {
+UniqueFd OpenWithin10Seconds(const QueueFiles& files) {
     constexpr int kAttempts = 10;
     for (int attempt = 0; attempt < kAttempts; ++attempt) {
-        UniqueFd fd = task::OpenForAppend(path);
+        UniqueFd fd = task::OpenForAppend(files);
         if (fd) {
             return fd;
         }
-        LOG_ERROR("Failed to open %s (%s).", path.c_str(), strerror(errno));
+        LOG_ERROR("Failed to open %s (%s).", files.queue.c_str(), strerror(errno));
         sleep(1);
     }
     LOG_ERROR("Failed to wiret data");
@@ -105,7 +117,7 @@ bool AddLine(const QueueFiles& files, const char* id, pid_t pid) {
         LOG_ERROR("A task id with a tab or a newline in it");
         return false;
     }
-    if (!MakeFolder(files.folder)) {
+    if (!MakeFolder(files)) {
         return false;
     }
     const QueueLock lock(files, true);
@@ -114,7 +126,7 @@ bool AddLine(const QueueFiles& files, const char* id, pid_t pid) {
                   ZYROERR_ARGS);
         return false;
     }
-    const UniqueFd fd = OpenWithin10Seconds(files.queue);
+    const UniqueFd fd = OpenWithin10Seconds(files);
     const std::string process = std::to_string(static_cast<unsigned>(pid));
     return fd && Append(fd.Get(), std::string(id) + "\t" + process + "\n", files.queue);
 }
@@ -151,7 +163,7 @@ std::optional<int64_t> FindPlace(QueueReader& reader, const Job& job, const std:
 }
 
 int64_t AskForTurn(const QueueFiles& files, const Job& job, uint64_t limit) {
-    if (YLIBCFileExist(files.queue.c_str()) == 0 && !AddLine(files, job.id, job.pid)) {
+    if (!task::HasQueue(files) && !AddLine(files, job.id, job.pid)) {
         return 0;
     }
     QueueLock lock(files, false);
@@ -161,7 +173,7 @@ int64_t AskForTurn(const QueueFiles& files, const Job& job, uint64_t limit) {
         return 0;
     }
     QueueReader reader;
-    if (!reader.Open(files.queue)) {
+    if (!reader.Open(files.Open(), files.name)) {
         LOG_ERROR("Failed to open %s, %m", files.queue.c_str());
         return 0;
     }
@@ -198,7 +210,7 @@ bool HasRoom(QueueReader& reader, pid_t pid, uint64_t limit) {
 }
 
 bool AskForRoom(const QueueFiles& files, pid_t pid, uint64_t limit) {
-    if (YLIBCFileExist(files.queue.c_str()) == 0) {
+    if (!task::HasQueue(files)) {
         return true;
     }
     // Before the lock is taken: a process without memory keeps nobody waiting.
@@ -213,7 +225,7 @@ bool AskForRoom(const QueueFiles& files, pid_t pid, uint64_t limit) {
         LOG_ERROR("Failed to lock %s, %m" PLATFORM_ERROR_FORMAT, files.lock.c_str(), ZYROERR_ARGS);
         return true;
     }
-    if (!reader->Open(files.queue)) {
+    if (!reader->Open(files.Open(), files.name)) {
         LOG_ERROR("Failed to open %s, %m", files.queue.c_str());
         return true;
     }
@@ -248,14 +260,14 @@ bool CopyStaying(QueueReader& reader, FILE* fresh, const QueueFiles& files, cons
     return true;
 }
 
-bool Rewrite(const QueueFiles& files, const Job& job) {
-    UniqueFile fresh = task::CreateFresh(files.fresh);
+bool Rewrite(const OwnedFolder& folder, const QueueFiles& files, const Job& job) {
+    UniqueFile fresh = task::CreateFresh(folder, files.FreshName());
     if (fresh == nullptr) {
         SetPlatformErr(ZOS_ERR_OPEN_FAILED);
         return false;
     }
     QueueReader reader;
-    if (!reader.Open(files.queue)) {
+    if (!reader.Open(folder, files.name)) {
         LOG_ERROR("Failed to open %s, %m", files.queue.c_str());
         return false;
     }
@@ -266,7 +278,7 @@ bool Rewrite(const QueueFiles& files, const Job& job) {
         LOG_ERROR("Failed to close %s, %m", files.fresh.c_str());
         return false;
     }
-    if (rename(files.fresh.c_str(), files.queue.c_str()) != 0) {
+    if (!folder.Rename(files.FreshName(), files.name)) {
         LOG_ERROR("Failed to rename %s, %m", files.fresh.c_str());
         return false;
     }
@@ -280,14 +292,15 @@ bool CleanNow(const QueueFiles& files, const Job& job) {
                   ZYROERR_ARGS);
         return false;
     }
-    if (task::JustCleaned(files.stamp)) {
+    if (task::JustCleaned(files)) {
         return true;
     }
     // Jobs that are about to end do so in the meantime, and go with this clean-up.
     sleep(3);
     // Gone before the lock is: without it, the file could be another clean-up's.
-    const ScopeExit remove_fresh([&files] { unlink(files.fresh.c_str()); });
-    if (!Rewrite(files, job)) {
+    const OwnedFolder folder = files.Open();
+    const ScopeExit remove_fresh([&] { folder.Remove(files.FreshName()); });
+    if (!Rewrite(folder, files, job)) {
         return false;
     }
     YLIBCFileTouch(files.stamp.c_str());
@@ -295,7 +308,7 @@ bool CleanNow(const QueueFiles& files, const Job& job) {
 }
 
 bool CleanOrHandOver(const QueueFiles& files, const Job& job, bool background) {
-    if (YLIBCFileExist(files.queue.c_str()) == 0 || task::JustCleaned(files.stamp)) {
+    if (!task::HasQueue(files) || task::JustCleaned(files)) {
         return true;
     }
     const pid_t child = background ? YLIBCProcFork() : -1;
@@ -328,14 +341,14 @@ void TaskMgr::SetMaxTask(unsigned int n) {
 }
 
 bool TaskMgr::GetTaskPath(const char* name, std::string& path) {
-    return !IsEmpty(name) && OrOnFault(false, [&] {
+    return !NamesNoType(name) && OrOnFault(false, [&] {
         path = task::FilesOf(name).folder;
         return true;
     });
 }
 
 bool TaskMgr::Add(const char* name, const char* taskID, int pid) {
-    return !IsEmpty(name) && !IsEmpty(taskID) && OrOnFault(false, [&] {
+    return !NamesNoType(name) && !IsEmpty(taskID) && OrOnFault(false, [&] {
         const QueueFiles files = task::FilesOf(name);
         const RootUid as_root;
         return AddLine(files, taskID, pid);
@@ -344,7 +357,7 @@ bool TaskMgr::Add(const char* name, const char* taskID, int pid) {
 
 int64_t TaskMgr::IsRunnable(const char* name, const char* taskID, int pid, Check check,
                             void* data) {
-    if (IsEmpty(name) || IsEmpty(taskID)) {
+    if (NamesNoType(name) || IsEmpty(taskID)) {
         return 0;
     }
     return OrOnFault(int64_t{0}, [&] {
@@ -355,7 +368,7 @@ int64_t TaskMgr::IsRunnable(const char* name, const char* taskID, int pid, Check
 }
 
 bool TaskMgr::IsAddable(const char* name, int pid) {
-    return IsEmpty(name) || OrOnFault(true, [&] {
+    return NamesNoType(name) || OrOnFault(true, [&] {
                const QueueFiles files = task::FilesOf(name);
                const RootUid as_root;
                return AskForRoom(files, pid, LimitOf(private_));
@@ -364,7 +377,7 @@ bool TaskMgr::IsAddable(const char* name, int pid) {
 
 bool TaskMgr::Clean(const char* name, const char* taskID, int pid, Check check, void* data,
                     bool background) {
-    return !IsEmpty(name) && OrOnFault(false, [&] {
+    return !NamesNoType(name) && OrOnFault(false, [&] {
         const QueueFiles files = task::FilesOf(name);
         const RootUid as_root;
         return CleanOrHandOver(files, {name, taskID, pid, check, data}, background);

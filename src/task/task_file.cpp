@@ -2,7 +2,6 @@
 
 #include <fcntl.h>
 #include <sys/stat.h>
-#include <unistd.h>
 #include <zosplatform/file.h>
 #include <zosplatform/text.h>
 
@@ -20,30 +19,8 @@ namespace ZYROVFS::task {
 namespace {
 
 constexpr int kLockSeconds = 600;
-constexpr int kNoTrap = O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
-
-bool IsRegular(int fd) {
-    struct stat info {};
-    if (fstat(fd, &info) != 0) {
-        return false;
-    }
-    if (!S_ISREG(info.st_mode)) {
-        errno = S_ISDIR(info.st_mode) ? EISDIR : ENXIO;
-        return false;
-    }
-    return true;
-}
-
-/** An open regular file, or none with errno. */
-UniqueFd OpenRegular(const std::string& path, int flags, mode_t mode = 0) {
-    UniqueFd fd(open(path.c_str(), flags | kNoTrap, mode));
-    if (fd && !IsRegular(fd.Get())) {
-        const int error = errno;
-        fd.Reset();
-        errno = error;
-    }
-    return fd;
-}
+/** Far beyond any queue, far below what would exhaust the memory of the box by its longest line. */
+constexpr off_t kLargestQueue = 64 << 20;
 
 UniqueFile Stream(UniqueFd fd, const char* mode) {
     UniqueFile file(fd ? fdopen(fd.Get(), mode) : nullptr);
@@ -63,8 +40,10 @@ pid_t ProcessId(const char* text) {
 }  // namespace
 
 QueueFiles FilesOf(const char* name) {
-    QueueFiles files;
-    files.folder = paths::TaskRoot(GetActorUID()) + "/" + name;
+    QueueFiles files{};
+    files.user = GetActorUID();
+    files.name = name;
+    files.folder = paths::TaskRoot(files.user) + "/" + name;
     files.queue = files.folder + "/" + name;
     files.lock = files.queue + ".lock";
     files.stamp = files.queue + ".clean.stamp";
@@ -72,7 +51,19 @@ QueueFiles FilesOf(const char* name) {
     return files;
 }
 
+bool HasQueue(const QueueFiles& files) {
+    const OwnedFolder folder = files.Open();
+    struct stat info {};
+    return folder && folder.Stat(files.name, info);
+}
+
+/** The file is made here, and a stranger's moved aside: who has it can lock it for ever. What fails
+ * here is told by the lock itself. */
 QueueLock::QueueLock(const QueueFiles& files, bool exclusive) {
+    const OwnedFolder folder = files.Open();
+    if (folder) {
+        folder.OpenOrMake(files.LockName(), O_RDWR, 0600);
+    }
     if (YLIBCFileLockTimeByFile(files.lock.c_str(), exclusive ? 1 : 0, kLockSeconds, &fd_) == 0) {
         fd_ = -1;
     }
@@ -84,8 +75,14 @@ void QueueLock::Release() {
     }
 }
 
-bool QueueReader::Open(const std::string& path) {
-    file_ = Stream(OpenRegular(path, O_RDONLY), "r");
+bool QueueReader::Open(const OwnedFolder& folder, const std::string& name) {
+    UniqueFd fd = folder.OpenFile(name, O_RDONLY);
+    struct stat info {};
+    if (fd && (fstat(fd.Get(), &info) != 0 || info.st_size > kLargestQueue)) {
+        errno = EFBIG;
+        return false;
+    }
+    file_ = Stream(std::move(fd), "r");
     return file_ != nullptr;
 }
 
@@ -112,18 +109,20 @@ bool QueueReader::AtEnd() const {
     return feof(file_.get()) != 0;
 }
 
-UniqueFd OpenForAppend(const std::string& path) {
-    return OpenRegular(path, O_RDWR | O_CREAT | O_APPEND, kQueueMode);
+UniqueFd OpenForAppend(const QueueFiles& files) {
+    const OwnedFolder folder = files.Open();
+    return folder ? folder.OpenOrMake(files.name, O_RDWR | O_APPEND, kQueueMode) : UniqueFd();
 }
 
-UniqueFile CreateFresh(const std::string& path) {
-    unlink(path.c_str());  // what a killed clean-up left; nobody else has it while we hold the lock
-    return Stream(OpenRegular(path, O_WRONLY | O_CREAT | O_EXCL, kQueueMode), "w");
+UniqueFile CreateFresh(const OwnedFolder& folder, const std::string& name) {
+    folder.Remove(name);  // what a killed clean-up left; nobody else has it while we hold the lock
+    return Stream(folder.MakeFile(name, O_WRONLY, kQueueMode), "w");
 }
 
-bool JustCleaned(const std::string& stamp) {
+bool JustCleaned(const QueueFiles& files) {
+    const OwnedFolder folder = files.Open();
     struct stat info {};
-    if (stat(stamp.c_str(), &info) != 0 || !S_ISREG(info.st_mode)) {
+    if (!folder || !folder.Stat(files.StampName(), info) || !S_ISREG(info.st_mode)) {
         return false;
     }
     // Unsigned, so that one comparison bounds both sides: a clock that was set back must not keep

@@ -7,22 +7,34 @@
 #include <string>
 
 #include "core/handle.h"
+#include "core/owned_folder.h"
 
 namespace ZYROVFS::task {
 
 /** Under which nobody is kept from the queue; the umask in force takes from it. */
 inline constexpr mode_t kQueueMode = 0777;
 
+/** Paths for the log and for platform calls; the files are reached by Open and the names. */
 struct QueueFiles {
+    uid_t user;
+    std::string name;  ///< of the type, and of the queue in its folder
     std::string folder;
     std::string queue;  ///< a line per job, in order of arrival: id, tab, process id
     std::string lock;
     std::string stamp;  ///< its modification time tells of the last clean-up
     std::string fresh;  ///< the queue to be, while it is cleaned
+
+    OwnedFolder Open() const { return OwnedFolder::Open(folder, user); }
+    std::string LockName() const { return name + ".lock"; }
+    std::string StampName() const { return name + ".clean.stamp"; }
+    std::string FreshName() const { return name + ".tmp"; }
 };
 
 /** Of the acting user: to be asked before the effective uid changes. */
 QueueFiles FilesOf(const char* name);
+
+/** Whether there is a queue, which is a file of the registry's own. */
+bool HasQueue(const QueueFiles& files);
 
 /** The lock of a queue for as long as the object lives; false when it could not be had. */
 class QueueLock {
@@ -51,7 +63,7 @@ struct Entry {
 class QueueReader {
   public:
     /** False, with errno, also for what is no regular file: users can write to the folder. */
-    bool Open(const std::string& path);
+    bool Open(const OwnedFolder& folder, const std::string& name);
     /** The next line that has two words. False at the end, or when reading fails. */
     bool Next(Entry& entry);
     /** Whether Next has come to the end of the file, as opposed to a failure that errno tells. */
@@ -64,14 +76,14 @@ class QueueReader {
     size_t capacity_ = 0;
 };
 
-/** Opens what lies in a folder that users can write to: no link is followed. Invalid with errno. */
-UniqueFd OpenForAppend(const std::string& path);
+/** Opens the queue for adding to it, made if it is missing. Invalid with errno. */
+UniqueFd OpenForAppend(const QueueFiles& files);
 
 /** A new and empty file in place of one that somebody left; null with errno. */
-UniqueFile CreateFresh(const std::string& path);
+UniqueFile CreateFresh(const OwnedFolder& folder, const std::string& name);
 
 /** Whether the stamp says that somebody has cleaned within the last two seconds. */
-bool JustCleaned(const std::string& stamp);
+bool JustCleaned(const QueueFiles& files);
 
 }  // namespace ZYROVFS::task
 

@@ -167,7 +167,7 @@ TEST_F(JsonFile, OwnerIsGivenBeforeTheFileTakesItsPlace) {
 }
 
 TEST_F(JsonFile, CallerWhoMayNotGiveFilesAwayKeepsThem) {
-    ASSERT_EQ(chmod(kTop.c_str(), 0777), 0);
+    ASSERT_EQ(chmod(kTop.c_str(), 01777), 0);
     const int status = support::ExitOf([] {
         if (setresgid(100, 100, 100) != 0 || setresuid(1001, 1001, 1001) != 0) {
             return 10;

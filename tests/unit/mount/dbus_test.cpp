@@ -6,6 +6,7 @@
 
 #include "support/fake_daemons.h"
 #include "support/seams.h"
+#include "support/stranger.h"
 #include "zyrovfs/error.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"
@@ -181,6 +182,26 @@ TEST_F(Bus, EmptyAddressFileOfALivingBusIsADBusAddressFailure) {
     ResetError();
     EXPECT_FALSE(DBUS::Init());
     EXPECT_EQ(GetError(), VFS_ERR_DBUS_ADDRESS);
+}
+
+TEST_F(Bus, AddressThatAStrangerPlantedIsNotTheUsersBus) {
+    BusLives();
+    ASSERT_TRUE(stranger::File(paths::DbusAddress(kUser), "unix:path=/tmp/trap\n"));
+    ResetError();
+    EXPECT_FALSE(DBUS::Init()) << "who listens there would be given the user's passwords";
+    EXPECT_EQ(GetError(), VFS_ERR_DBUS_ADDRESS);
+    EXPECT_EQ(EnvAddress(), "");
+}
+
+TEST_F(Bus, PidThatAStrangerPlantedStartsABusOfTheUsersOwn) {
+    const LiveProcess bus("dbus-daemon", kUser);
+    Write(paths::RuntimeDir(kUser) + "/dbus/keep", "");
+    ASSERT_TRUE(stranger::File(paths::DbusPid(kUser), std::to_string(bus.pid()) + "\n"));
+    ASSERT_TRUE(stranger::File(paths::DbusAddress(kUser), "unix:path=/tmp/trap\n"));
+    EXPECT_TRUE(DBUS::CheckDaemonDied());
+    EXPECT_TRUE(DBUS::Init()) << seams::LogDump();
+    EXPECT_EQ(EnvAddress(), kAddress);
+    EXPECT_EQ(Read(paths::DbusAddress(kUser)), std::string(kAddress) + "\n");
 }
 
 TEST_F(Bus, InitTakesOneLevelFromTheLockOfItsCaller) {

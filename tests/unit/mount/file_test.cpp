@@ -123,7 +123,7 @@ TEST_F(CreateFileTest, WritesOneLineAndMakesTheFolders) {
     ASSERT_EQ(stat(kFile.c_str(), &info), 0);
     EXPECT_EQ(info.st_mode & 07777, 0600U);
     ASSERT_EQ(stat((kTop + "/a").c_str(), &info), 0);
-    EXPECT_EQ(info.st_mode & 07777, 0777U);
+    EXPECT_EQ(info.st_mode & 07777, 01777U);
 }
 
 TEST_F(CreateFileTest, LongerOldTextIsGone) {

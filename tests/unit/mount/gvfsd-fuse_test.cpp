@@ -5,6 +5,7 @@
 
 #include "support/fake_daemons.h"
 #include "support/seams.h"
+#include "support/stranger.h"
 #include "zyrovfs/error.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"
@@ -174,6 +175,35 @@ TEST_F(Fuse, PathThatTheUserCannotMakeIsNoMountPoint) {
     EXPECT_FALSE(GVFSD_FUSE::Init());
     EXPECT_TRUE(seams::LoggedPart("Failed to mkdir " + kTree + ", ")) << seams::LogDump();
     EXPECT_TRUE(seams::Logged("Failed to run gvfsd-fuse, uid=4001, 2"));
+}
+
+/** Links that lead root's umount to a file system that is none of the user's business. */
+class FuseTreeThatIsALink : public Fuse {
+  protected:
+    void SetUp() override {
+        Fuse::SetUp();
+        std::filesystem::create_directories(kElsewhere);
+        ASSERT_EQ(mount("tmpfs", kElsewhere, "tmpfs", 0, nullptr), 0);
+    }
+    void TearDown() override {
+        EXPECT_EQ(umount(kElsewhere), 0) << "root has unmounted it already";
+        Fuse::TearDown();
+    }
+    static constexpr const char* kElsewhere = "/mnt";
+};
+
+TEST_F(FuseTreeThatIsALink, OfAStrangersIsMovedAsideAndNotFollowed) {
+    ASSERT_TRUE(stranger::Link(kElsewhere, kTree));
+    EXPECT_TRUE(GVFSD_FUSE::Init()) << seams::LogDump();
+    EXPECT_TRUE(std::filesystem::is_directory(std::filesystem::symlink_status(kTree)));
+}
+
+TEST_F(FuseTreeThatIsALink, OfTheUsersOwnIsNotFollowedEither) {
+    ASSERT_TRUE(MakeStaleMount("/tmp/stale"));
+    ASSERT_TRUE(stranger::As(kUser, [] { return symlink("/tmp/stale", kTree.c_str()) == 0; }));
+    EXPECT_TRUE(GVFSD_FUSE::Init()) << seams::LogDump();
+    EXPECT_EQ(umount2("/tmp/stale", MNT_DETACH), 0) << "root has unmounted it already";
+    EXPECT_TRUE(std::filesystem::is_directory(std::filesystem::symlink_status(kTree)));
 }
 
 TEST_F(Fuse, StaleMountPointIsRepairedUnderAServiceThatIgnoresItsChildren) {

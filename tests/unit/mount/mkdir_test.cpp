@@ -18,30 +18,30 @@
 
 namespace {
 
-/** What mkdir of the code under test does in place of the system call, if set. */
+/** What mkdirat of the code under test does in place of the system call, if set. */
 std::function<int(const char*)> instead_of_mkdir;
-/** The same for chown: its errno. */
+/** The same for fchownat: its errno. */
 int chown_fails_with = 0;
 
 }  // namespace
 
-extern "C" int mkdir(const char* path, mode_t mode) noexcept {
+extern "C" int mkdirat(int folder, const char* path, mode_t mode) noexcept {
     if (instead_of_mkdir) {
         return instead_of_mkdir(path);
     }
-    using Real = int (*)(const char*, mode_t);
-    static const auto real = reinterpret_cast<Real>(dlsym(RTLD_NEXT, "mkdir"));
-    return real(path, mode);
+    using Real = int (*)(int, const char*, mode_t);
+    static const auto real = reinterpret_cast<Real>(dlsym(RTLD_NEXT, "mkdirat"));
+    return real(folder, path, mode);
 }
 
-extern "C" int chown(const char* path, uid_t uid, gid_t gid) noexcept {
+extern "C" int fchownat(int folder, const char* path, uid_t uid, gid_t gid, int flags) noexcept {
     if (chown_fails_with != 0) {
         errno = chown_fails_with;
         return -1;
     }
-    using Real = int (*)(const char*, uid_t, gid_t);
-    static const auto real = reinterpret_cast<Real>(dlsym(RTLD_NEXT, "chown"));
-    return real(path, uid, gid);
+    using Real = int (*)(int, const char*, uid_t, gid_t, int);
+    static const auto real = reinterpret_cast<Real>(dlsym(RTLD_NEXT, "fchownat"));
+    return real(folder, path, uid, gid, flags);
 }
 
 namespace ZYROVFS::Utils {
@@ -220,6 +220,32 @@ TEST_F(MkdirPTest, LinkToAFolderIsAFolder) {
     EXPECT_TRUE(fs::is_symlink(kTop + "/link"));
 }
 
+TEST_F(MkdirPTest, LinkThatAUserPlantedIsNoFolder) {
+    fs::create_directories(kTop + "/real");
+    ASSERT_EQ(chmod(kTop.c_str(), 01777), 0);
+    fs::create_directory_symlink(kTop + "/real", kTop + "/link");
+    ASSERT_EQ(lchown((kTop + "/link").c_str(), 1001, 100), 0);
+    EXPECT_EQ(MkdirP((kTop + "/link/a").c_str(), nullptr, 0, kNone, kNone, 0777), -1);
+    EXPECT_EQ(YLIBCErrGet(), 0xa100U);
+    EXPECT_EQ(MkdirP((kTop + "/link/a").c_str(), nullptr, 1, kNone, kNone, 0777), 0);
+    EXPECT_TRUE(fs::is_directory(fs::symlink_status(kTop + "/link"))) << "replaced, not followed";
+    EXPECT_TRUE(fs::is_empty(kTop + "/real"));
+}
+
+TEST_F(MkdirPTest, WhatAllUsersShareOfTheConfigurationIsRootsToChange) {
+    fs::remove_all("/usr/zyro");
+    const mode_t saved = umask(0);
+    for (const unsigned mode : {0777U, kNone}) {
+        EXPECT_EQ(MkdirP("/usr/zyro/etc/zyrovfs/1001", nullptr, 1, kNone, kNone, mode), 0);
+        for (const char* shared : {"/usr/zyro", "/usr/zyro/etc", "/usr/zyro/etc/zyrovfs"}) {
+            EXPECT_EQ(StatOf(shared).st_mode & 07777, 0755U) << shared;
+        }
+        EXPECT_EQ(StatOf("/usr/zyro/etc/zyrovfs/1001").st_mode & 07777, 01777U);
+        fs::remove_all("/usr/zyro");
+    }
+    umask(saved);
+}
+
 TEST_F(MkdirPTest, FailedRemovalIsLoggedAndTheWalkGoesOn) {
     MakeFile(kTop + "/pinned");
     ASSERT_EQ(mount("/etc/passwd", (kTop + "/pinned").c_str(), nullptr, MS_BIND, nullptr), 0);
@@ -291,7 +317,7 @@ TEST_F(CreateFolderTest, RootMakesItForACallerWhoIsAUser) {
     EXPECT_EQ(after, 1001U);
     EXPECT_THAT(calls, testing::ElementsAre("seteuid(0)", "seteuid(1001)"));
     EXPECT_EQ(StatOf(kTop + "/a/b").st_uid, 0U);
-    EXPECT_EQ(StatOf(kTop + "/a/b").st_mode & 07777, 0777U);
+    EXPECT_EQ(StatOf(kTop + "/a/b").st_mode & 07777, 01777U) << "nobody takes what is another's";
 }
 
 TEST_F(CreateFolderTest, FailureTellsThePlatformErrorAndErrno) {
@@ -355,17 +381,17 @@ TEST_F(CreateFolderTest, CallerWithoutRootIdentityDoesWhatItMay) {
 }
 
 TEST_F(CreateParentFolderTest, IsTheFolderThatAFileStandsIn) {
-    EXPECT_TRUE(CreateParentFolder(kTop + "/a/b/file"));
+    EXPECT_TRUE(CreateParentFolder(kTop + "/a/b/file", 0));
     EXPECT_TRUE(fs::is_directory(kTop + "/a/b"));
     EXPECT_FALSE(fs::exists(kTop + "/a/b/file"));
-    EXPECT_TRUE(CreateParentFolder("/file"));
-    EXPECT_TRUE(CreateParentFolder("file"));
-    EXPECT_TRUE(CreateParentFolder(""));
+    EXPECT_TRUE(CreateParentFolder("/file", 0));
+    EXPECT_TRUE(CreateParentFolder("file", 0));
+    EXPECT_TRUE(CreateParentFolder("", 0));
 }
 
 TEST_F(CreateParentFolderTest, FailureIsLoggedInTheNameOfTheCaller) {
     ASSERT_EQ(mount("none", kTop.c_str(), "tmpfs", MS_RDONLY, nullptr), 0);
-    EXPECT_FALSE(CreateParentFolder(kTop + "/a/file", {"caller.cpp", 7}));
+    EXPECT_FALSE(CreateParentFolder(kTop + "/a/file", 0, {"caller.cpp", 7}));
     ASSERT_EQ(umount(kTop.c_str()), 0);
     EXPECT_TRUE(
         seams::LoggedPart("caller.cpp:7 Failed to mkdir " + kTop + "/a, Read-only file system"))

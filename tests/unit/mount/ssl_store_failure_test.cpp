@@ -7,6 +7,7 @@
 #include "core/error_cell.h"
 #include "core/handle.h"
 #include "support/seams.h"
+#include "support/stranger.h"
 #include "unit/mount/ssl_fixture.h"
 
 namespace ZYROVFS {
@@ -142,7 +143,7 @@ TEST_F(SslPeer, AUserWithoutAnyFolderGetsBothOnTheFirstQuestion) {
     struct stat info {};
     ASSERT_EQ(stat(parent_.c_str(), &above), 0);
     ASSERT_EQ(stat(folder_.c_str(), &info), 0);
-    EXPECT_EQ(above.st_mode & 07777, 0777U);
+    EXPECT_EQ(above.st_mode & 07777, 01777U);
     EXPECT_EQ(info.st_mode & 07777, 0700U);
     EXPECT_EQ(info.st_uid, kAmy);
     EXPECT_EQ(info.st_gid, 0U);
@@ -195,6 +196,26 @@ TEST_F(SslPeer, AStrangersLinkOrFileInTheFoldersPlaceIsRefused) {
     fs::remove(folder_);
     std::ofstream{folder_};
     EXPECT_EQ(Force(Davs(server)).code, VFS_ERR_FAILED);
+}
+
+TEST_F(SslPeer, StrangersFolderDoesNotSayWhomTheUserTrusts) {
+    const tls::TlsServer server(own_);
+    ASSERT_TRUE(stranger::Folder(folder_));
+    ASSERT_TRUE(stranger::File(File(server), own_.certificate));
+    const Answer answer = Ask(Davs(server));
+    EXPECT_EQ(answer.code, VFS_ERR_CERT_UNTRUSTED) << answer;
+    EXPECT_EQ(stranger::OwnerOf(folder_), kAmy);
+    EXPECT_THAT(Names(), testing::IsEmpty());
+}
+
+TEST_F(SslPeer, StrangersFileInTheUsersFolderDoesNotSayWhomTheUserTrusts) {
+    const tls::TlsServer server(own_);
+    Save(server, own_.certificate);
+    ASSERT_EQ(chown(folder_.c_str(), kAmy, 0), 0);
+    EXPECT_TRUE(Ask(Davs(server)).ok);
+    ASSERT_EQ(chown(File(server).c_str(), stranger::kMallory, 100), 0);
+    EXPECT_EQ(Ask(Davs(server)).code, VFS_ERR_CERT_UNTRUSTED);
+    EXPECT_TRUE(Force(Davs(server)).ok) << "but the user may still decide";
 }
 
 // --- addresses --------------------------------------------------------------------------------

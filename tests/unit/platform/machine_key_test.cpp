@@ -105,6 +105,31 @@ TEST_F(MachineKey, FoldersThatStandAreKeptAsTheyAre) {
     ExpectOwnerAndMode(kKeyDir, 0, 0700);
 }
 
+TEST_F(MachineKey, FoldersAboveThatOthersMayWriteToAreClosed) {
+    fs::create_directories(kKeyDir);
+    for (const char* folder : {"/usr/zyro", "/usr/zyro/etc"}) {
+        ASSERT_EQ(chmod(folder, 0777), 0);
+    }
+    EXPECT_NE(Encrypt(), "");
+    ExpectOwnerAndMode("/usr/zyro", 0, 0755);
+    ExpectOwnerAndMode("/usr/zyro/etc", 0, 0755);
+}
+
+TEST_F(MachineKey, FolderAboveThatIsAnotherUsersBecomesRoots) {
+    fs::create_directories(kKeyDir);
+    ASSERT_EQ(chown("/usr/zyro/etc", 1234, 100), 0);
+    EXPECT_NE(Encrypt(), "");
+    ExpectOwnerAndMode("/usr/zyro/etc", 0, 0755);
+}
+
+TEST_F(MachineKey, LinkAboveItIsNotFollowed) {
+    fs::create_directories("/usr/zyro");
+    fs::create_directories("/etc/elsewhere/private");
+    fs::create_directory_symlink("/etc/elsewhere", "/usr/zyro/etc");
+    EXPECT_EQ(Encrypt(), "");
+    EXPECT_TRUE(fs::is_empty("/etc/elsewhere/private"));
+}
+
 /** Two processes let loose at once; each notes its cipher text. */
 TEST_F(MachineKey, TwoFirstUsersAgree) {
     constexpr int kRounds = 50;

@@ -173,20 +173,29 @@ TEST_F(Tasks, OnlyRootCanNameAProcessForRootToEnd) {
     EXPECT_EQ(amy_.getTask("open"), nullptr);
 }
 
-TEST_F(Tasks, StoreThatSomebodyElseMadeIsNotUsed) {
+TEST_F(Tasks, StoreThatSomebodyElseMadeBecomesRoots) {
     const std::string folders[] = {"/var/tmp/zos", kStore, kAmy};
     for (const std::string& folder : folders) {
         fs::remove_all("/var/tmp/zos");
         fs::create_directories(kAmy);
         ASSERT_EQ(chown(folder.c_str(), 1234, 100), 0);
-        EXPECT_EQ(amy_.createTask(Transfer(1)), nullptr) << folder;
-        EXPECT_EQ(YLIBCErrGet(), ZOS_ERR_NO_PERMISSION);
-        EXPECT_STREQ(YLIBCErrorGetFile(), "task.cpp");
-        EXPECT_EQ(amy_.getAllTaskId(), Ids{});
+        const auto task = amy_.createTask(Transfer(1));
+        ASSERT_NE(task, nullptr) << folder;
+        EXPECT_EQ(amy_.getAllTaskId(), Ids{task->id()});
+        struct stat info {};
+        ASSERT_EQ(stat(folder.c_str(), &info), 0);
+        EXPECT_EQ(info.st_uid, 0U) << folder;
+        EXPECT_EQ(info.st_mode & 07777, folder == kAmy ? 0700U : 0755U) << folder;
     }
-    fs::remove_all("/var/tmp/zos");
+}
+
+TEST_F(Tasks, LinkInPlaceOfTheStoreIsNotFollowed) {
     fs::create_directory_symlink("/etc", "/var/tmp/zos");
     EXPECT_EQ(amy_.createTask(Transfer(1)), nullptr);
+    EXPECT_STREQ(YLIBCErrorGetFile(), "task.cpp");
+    EXPECT_FALSE(fs::exists("/etc/task"));
+    ASSERT_EQ(lchown("/var/tmp/zos", 1234, 100), 0);
+    EXPECT_NE(amy_.createTask(Transfer(1)), nullptr) << "a user's gives way";
     EXPECT_FALSE(fs::exists("/etc/task"));
 }
 

@@ -81,7 +81,7 @@ TEST_F(Config, FirstUseMakesTheDirectoryAndReadsNoServers) {
         EXPECT_EQ(doc["servers"], Json::Value(Json::objectValue));
         EXPECT_EQ(doc.size(), 1U);
         const struct stat info = Stat(Directory(mode));
-        EXPECT_EQ(info.st_mode & 07777, 0777U) << "every local user can enter it";
+        EXPECT_EQ(info.st_mode & 07777, 01777U) << "every local user can enter it";
         EXPECT_EQ(info.st_uid, 0U);
         EXPECT_NE(access(File(mode).c_str(), F_OK), 0) << "reading makes no file";
     }

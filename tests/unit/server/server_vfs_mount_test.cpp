@@ -1,4 +1,5 @@
 #include <gtest/gtest.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 #include <zosplatform/process.h>
@@ -10,9 +11,11 @@
 #include "core/paths.h"
 #include "server/server_vfs.h"
 #include "support/fake_location.h"
+#include "support/other_process.h"
 #include "support/profiles.h"
 #include "support/seams.h"
 #include "support/soup_seam.h"
+#include "support/stranger.h"
 #include "zyrovfs/utils.h"
 
 namespace {
@@ -318,6 +321,35 @@ TEST_F(VfsServerMount, HostNameDoesNotLeadOutOfTheFolderOfCertificates) {
     EXPECT_TRUE(Delete(VFS_CONFIG_CONNECT));
     EXPECT_TRUE(seams::LoggedPart("Failed to unlink ")) << seams::LogDump();
     EXPECT_EQ(profiles::Text(paths::UserConfigDir(kUser) + "/precious:2222"), "keep me");
+}
+
+/** The folder of the user's profiles as all may write to it, and another user of the machine. */
+class StrangerAtTrust : public VfsServerMount {
+  protected:
+    void SetUp() override {
+        VfsServerMount::SetUp();
+        stranger::MakeOpenToAll(paths::UserConfigDir(kUser));
+    }
+    const stranger::Patience patience_;
+};
+
+TEST_F(StrangerAtTrust, LinkInPlaceOfTheCertificatesLetsNothingBeUnlinked) {
+    std::filesystem::create_directories("/etc/elsewhere");
+    profiles::PutText("/etc/elsewhere/nas.example:2222", "keep me");
+    ASSERT_TRUE(stranger::Link("/etc/elsewhere", paths::SslDir(kUser)));
+    Load();
+    EXPECT_TRUE(Delete(VFS_CONFIG_CONNECT));
+    EXPECT_EQ(profiles::Text("/etc/elsewhere/nas.example:2222"), "keep me");
+}
+
+TEST_F(StrangerAtTrust, FifoInPlaceOfTheHostKeysHangsNobody) {
+    const std::string folder = std::filesystem::path(kKnownHosts).parent_path();
+    ASSERT_TRUE(stranger::Folder(folder));
+    ASSERT_TRUE(stranger::Fifo(kKnownHosts));
+    Load();
+    EXPECT_TRUE(Delete(VFS_CONFIG_CONNECT));
+    EXPECT_TRUE(executions.empty()) << "ssh-keygen would wait for a writer";
+    EXPECT_TRUE(support::OthersCanLock(paths::MountLock(kUser).c_str(), LOCK_EX));
 }
 
 TEST_F(VfsServerMount, WithoutAnIdNothingIsForgotten) {

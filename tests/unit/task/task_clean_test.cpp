@@ -50,16 +50,17 @@ int fclose(FILE* file) {
     return result;
 }
 
-int rename(const char* from, const char* to) noexcept {
+int renameat(int from_folder, const char* from, int to_folder, const char* to) noexcept {
     Call(before_rename);
-    return Real<int(const char*, const char*)>("rename")(from, to);
+    return Real<int(int, const char*, int, const char*)>("renameat")(from_folder, from, to_folder,
+                                                                     to);
 }
 
-int unlink(const char* path) noexcept {
+int unlinkat(int folder, const char* name, int flags) noexcept {
     if (before_unlink) {
-        before_unlink(path);
+        before_unlink(name);
     }
-    return Real<int(const char*)>("unlink")(path);
+    return Real<int(int, const char*, int)>("unlinkat")(folder, name, flags);
 }
 
 int YLIBCFileTouch(const char* path) {
@@ -436,8 +437,8 @@ TEST_F(TaskClean, ANewFileIsRemovedBeforeTheLockIsGivenBack) {
     no_close = true;
     bool was_there = false;
     bool was_held = false;
-    before_unlink = [&](const std::string& path) {
-        was_there = path == kFresh && fs::exists(kFresh);
+    before_unlink = [&](const std::string& name) {
+        was_there = name == "copy.tmp" && fs::exists(kFresh);
         was_held = !support::OthersCanLock(kLock.c_str(), LOCK_SH);
     };
     EXPECT_FALSE(Clean());

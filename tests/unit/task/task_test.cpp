@@ -95,7 +95,7 @@ TEST_F(TaskTest, AddAppendsIdAndProcessInFoldersOpenToAll) {
     EXPECT_EQ(Queue(), "first\t11\nsecond\t12\n");
     struct stat info {};
     ASSERT_EQ(stat(kFolder.c_str(), &info), 0);
-    EXPECT_EQ(info.st_mode & 07777, 0777U);
+    EXPECT_EQ(info.st_mode & 07777, 01777U) << "and nobody takes what is another's";
     EXPECT_TRUE(fs::exists(kLock));
     EXPECT_THAT(seams::LogLines(), IsEmpty()) << seams::LogDump();
 }
@@ -643,7 +643,7 @@ TEST_F(TaskTest, RootSwitchesNothing) {
 
 TEST_F(TaskTest, AFailedSwitchIsLoggedAndTheOperationGoesOn) {
     PutQueue("job\t11\n");
-    fs::permissions(kFolder, fs::perms::all);
+    fs::permissions(kFolder, fs::perms::all | fs::perms::sticky_bit);
     AsSavedRoot(1001, [&] {
         seams::FailIdentity("seteuid(0)", EPERM);
         EXPECT_EQ(Runnable(tasks_, "job", 11), 1);
