@@ -256,18 +256,27 @@ TEST(Web, FilesComeDownWholeAndInParts) {
     fs::remove(kRemote + "film.bin");
 }
 
-TEST(Web, FoldersAreMadeRenamedAndDeleted) {
+TEST(Web, FoldersAreMadeAndDeleted) {
     EXPECT_EQ(Change("mkdir", "/new").status, 200);
     EXPECT_TRUE(fs::is_directory("/srv/remote/new"));
     EXPECT_EQ(Change("mkdir", "/new").status, 409);
-    const Answer renamed = Change("rename", "/new", ",\"name\":\"newer\"");
+    EXPECT_EQ(Change("delete", "/new").status, 200);
+    EXPECT_FALSE(fs::exists("/srv/remote/new"));
+    EXPECT_EQ(Change("delete", "/new").status, 404);
+}
+
+TEST(Web, FilesAreRenamedAndTakeNobodysPlace) {
+    // lighttpd moves no folder whose address has no slash at its end.
+    ASSERT_EQ(Upload("/old.txt", "renamed", "7").status, 200);
+    const Answer renamed = Change("rename", "/old.txt", ",\"name\":\"young.txt\"");
     EXPECT_EQ(renamed.status, 200) << renamed.body;
-    EXPECT_TRUE(fs::is_directory("/srv/remote/newer"));
-    EXPECT_EQ(Change("rename", "/newer", ",\"name\":\"docs\"").status, 409);
-    EXPECT_TRUE(fs::is_directory("/srv/remote/newer"));
-    EXPECT_EQ(Change("delete", "/newer").status, 200);
-    EXPECT_FALSE(fs::exists("/srv/remote/newer"));
-    EXPECT_EQ(Change("delete", "/newer").status, 404);
+    EXPECT_EQ(machine::Read("/srv/remote/young.txt"), "renamed");
+    EXPECT_FALSE(fs::exists("/srv/remote/old.txt"));
+    EXPECT_EQ(Change("rename", "/young.txt", ",\"name\":\"hello.txt\"").status, 409);
+    EXPECT_EQ(machine::Read("/srv/remote/hello.txt"), "hello from the remote side\n");
+    EXPECT_EQ(Change("rename", "/none.txt", ",\"name\":\"x\"").status, 404);
+    EXPECT_EQ(Change("delete", "/young.txt").status, 200);
+    EXPECT_FALSE(fs::exists("/srv/remote/young.txt"));
 }
 
 TEST(Web, AFullFolderIsDeletedOnlyWhenThatIsMeant) {
