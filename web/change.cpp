@@ -47,7 +47,7 @@ bool RenameTo(int folder, const std::string& from, const std::string& to) {
     if (renameat2(folder, from.c_str(), folder, to.c_str(), RENAME_NOREPLACE) == 0) {
         return true;
     }
-    if (errno != EINVAL && errno != ENOSYS) {
+    if (errno != EINVAL && errno != ENOSYS && errno != EOPNOTSUPP) {
         return false;
     }
     struct stat there {};

@@ -69,6 +69,7 @@ void StartClean() {
     }
     std::vector<std::string> environment = CleanEnvironment();
     std::vector<char*> pointers;
+    pointers.reserve(environment.size() + 1);
     for (std::string& variable : environment) {
         pointers.push_back(variable.data());
     }
@@ -93,7 +94,7 @@ User BecomeUser() {
         found->pw_uid < kFirstUser) {
         throw Failure(403, "There is no such user.");
     }
-    const User user{found->pw_name, found->pw_uid};
+    User user{found->pw_name, found->pw_uid};
     if (initgroups(user.name.c_str(), kUsers) != 0 || setresgid(-1, kUsers, -1) != 0 ||
         setresuid(-1, user.uid, -1) != 0) {
         throw Failure(500, "The program cannot become the user.");

@@ -71,8 +71,8 @@ class Dropbox : public DriverOf<DropboxErrorHandler> {
     bool DirectUpload(XferData* xfer, const Json::Value& meta);
     bool ChunkedUpload(XferData* xfer, const Json::Value& meta);
     bool StartChunkUploadSession(std::string& out);
-    /** Sends up to `size` bytes as those from `*offset` on, which moves on by what was sent, also
-     * for a place that the service refuses (VFS_ERR_RANGE_FAILED): then by all. */
+    /** Sends `size` bytes as those from `*offset` on, which moves on, also for a place that the
+     * service refuses (VFS_ERR_RANGE_FAILED). */
     bool StartChunkUpload(XferData* xfer, const std::string& session, unsigned long long* offset,
                           unsigned long long size);
     bool CommitChunkUpload(const std::string& session, const std::string& path,
@@ -82,10 +82,11 @@ class Dropbox : public DriverOf<DropboxErrorHandler> {
   private:
     bool ReplaceTarget(const std::string& from, const std::string& to, const std::string& action,
                        const std::string& copy_ref);
+    /** With `sent` the offset moves on by what the source had. */
     bool SendChunk(XferData* xfer, const std::string& session, const std::string& path,
-                   unsigned long long* offset, unsigned long long size, SentBytes& sent);
+                   unsigned long long* offset, unsigned long long size, SentBytes* sent);
     bool SendAt(XferData* xfer, const std::string& session, unsigned long long* offset,
-                unsigned long long size, SentBytes& sent);
+                unsigned long long size, SentBytes* sent);
     bool SendToEnd(XferData* xfer, const std::string& session, const std::string& path);
     bool PrepareDownload(XferData* xfer, const Json::Value& meta, const std::string& path);
 };

@@ -94,9 +94,8 @@ bool Dropbox::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
             return SendToEnd(xfer, session, path);
         }
         unsigned long long offset = 0;
-        SentBytes sent;
         const auto send = [&](unsigned long long length) {
-            return SendChunk(xfer, session, path, &offset, length, sent);
+            return SendChunk(xfer, session, path, &offset, length, nullptr);
         };
         const auto finish = [&] {
             if (offset != total) {
@@ -117,7 +116,7 @@ bool Dropbox::SendToEnd(XferData* xfer, const std::string& session, const std::s
     unsigned long long offset = 0;
     SentBytes sent;
     while (!sent.ended) {
-        if (!SendChunk(xfer, session, path, &offset, kLargestDirect, sent)) {
+        if (!SendChunk(xfer, session, path, &offset, kLargestDirect, &sent)) {
             return false;
         }
     }
@@ -145,7 +144,7 @@ bool Dropbox::StartChunkUploadSession(std::string& out) {
 }
 
 bool Dropbox::SendChunk(XferData* xfer, const std::string& session, const std::string& path,
-                        unsigned long long* offset, unsigned long long size, SentBytes& sent) {
+                        unsigned long long* offset, unsigned long long size, SentBytes* sent) {
     const XferContext& context = *xfer->context;
     AttemptPlan plan;
     plan.send = [&] { return SendAt(xfer, session, offset, size, sent); };
@@ -166,12 +165,11 @@ bool Dropbox::SendChunk(XferData* xfer, const std::string& session, const std::s
 
 bool Dropbox::StartChunkUpload(XferData* xfer, const std::string& session,
                                unsigned long long* offset, unsigned long long size) {
-    SentBytes sent;
-    return SendAt(xfer, session, offset, size, sent);
+    return SendAt(xfer, session, offset, size, nullptr);
 }
 
 bool Dropbox::SendAt(XferData* xfer, const std::string& session, unsigned long long* offset,
-                     unsigned long long size, SentBytes& sent) {
+                     unsigned long long size, SentBytes* sent) {
     return Guard(*this, [&] {
         if (!HasSource(xfer) || offset == nullptr) {
             SetError(VFS_ERR_CLOUD_FAILED, "");
@@ -184,8 +182,8 @@ bool Dropbox::SendAt(XferData* xfer, const std::string& session, unsigned long l
         if (!PrepareUpload(*this, request, xfer)) {
             return false;
         }
-        if (SendUpload(*this, *xfer, kSizeNotKnown, &sent)) {
-            *offset += sent.count;
+        if (SendUpload(*this, *xfer, kSizeNotKnown, sent)) {
+            *offset += sent == nullptr ? size : sent->count;
             return true;
         }
         SetError(api->GetError());

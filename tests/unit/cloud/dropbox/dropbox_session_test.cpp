@@ -114,16 +114,6 @@ TEST_F(DropboxSession, OfAStreamOfUnknownSizeThatFailsIsNeitherRepeatedNorFinish
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_RATE_LIMITED);
 }
 
-TEST_F(DropboxSession, OfAFileThatIsShorterThanItsSizeIsNotFinished) {
-    Give({kStarted, kTaken});
-    Bytes bytes(1, "four");
-    EXPECT_FALSE(
-        drive->ChunkedUpload(&bytes.xfer, Object(R"({"server_path":"/a.txt","total_bytes":5})")));
-    EXPECT_THAT(Requests(), ElementsAre(kStart, kAppend));
-    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_TRANSFER_ABORTED);
-    EXPECT_TRUE(seams::Logged("upload size is not match")) << seams::LogDump();
-}
-
 TEST_F(DropboxSession, RefusedSaysAtWhichStep) {
     Give({Answer(400)});
     EXPECT_FALSE(UploadLittle());
