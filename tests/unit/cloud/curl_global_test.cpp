@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "cloud/handler.h"
+#include "http/handle_pool.h"
 #include "support/bare_driver.h"
 #include "support/scratch.h"
 #include "support/wire_server.h"
@@ -83,6 +84,20 @@ bool Fetch(const std::string& url) {
     APIHandler* const api = cloud.GetAPIHandler();
     return cloud.Init() && api->Init() && api->SetURL(url, false) && api->Process(0) &&
            api->GetResponse() == "hello";
+}
+
+TEST(CurlGlobal, CleanupClosesTheHandlesThatWait) {
+    EXPECT_EQ(0, scratch::InChild([] {
+                  Cloud::InitCurlGlobal();
+                  HandlePool& pool = HandlePool::Instance();
+                  { const bare::PlainDriver cloud; }
+                  const bool kept = pool.Idle() == 1;
+                  {
+                      const bare::PlainDriver lent;
+                      Cloud::CleanupCurlGlobal();
+                  }
+                  return FirstWrong({kept, pool.Idle() == 0});
+              }));
 }
 
 // For the sanitizers: without locks the common store breaks here.

@@ -205,6 +205,69 @@ TEST_F(Slot, ALimitedReaderLeavesTheNextRequestsBytesInTheSlot) {
     EXPECT_EQ(Taken(4), "ghij");
 }
 
+// What libcurl hands over at a time, when the source is fast.
+constexpr size_t kWhole = CURL_MAX_WRITE_SIZE;
+
+TEST_F(Slot, WholeChunksGatherWhileNothingHasBeenTaken) {
+    const std::string bytes = Pattern(8 * kWhole);
+    transfer.bytes_left = transfer.bytes_total = 10 * kWhole;
+    for (size_t at = 0; at < bytes.size(); at += kWhole) {
+        EXPECT_EQ(Write(bytes.substr(at, kWhole)), kWhole) << at;
+        EXPECT_EQ(State(), kSlotFull);
+    }
+    EXPECT_THAT(waits.deadlines, IsEmpty());
+    EXPECT_EQ(Write(std::string(kWhole, 'x')), 23U) << "128 KiB, and no more";
+    EXPECT_THAT(waits.deadlines, ElementsAre(1090));
+    transfer.slot_state = kSlotFull;
+    EXPECT_EQ(Read(sizeof room_), bytes.size());
+    EXPECT_TRUE(Taken(bytes.size()) == bytes);
+    EXPECT_EQ(State(), kSlotEmpty);
+    EXPECT_EQ(transfer.bytes_left, 2 * kWhole);
+}
+
+TEST_F(Slot, BehindWhatHasBeenBegunNothingIsAppended) {
+    transfer.bytes_left = transfer.bytes_total = 10 * kWhole;
+    EXPECT_EQ(Write(std::string(kWhole, 'a')), kWhole);
+    EXPECT_EQ(Read(1), 1U);
+    waits.wait = [&] {
+        waits.wait = [] { return ETIMEDOUT; };
+        EXPECT_EQ(transfer.slot_length, kWhole) << "the writer waits";
+        transfer.slot_state = kSlotEmpty;
+        return 0;
+    };
+    EXPECT_EQ(Write(std::string(kWhole, 'b')), kWhole);
+    EXPECT_EQ(waits.deadlines.size(), 1U);
+    EXPECT_EQ(Read(kWhole), kWhole);
+    EXPECT_EQ(Taken(kWhole), std::string(kWhole, 'b'));
+}
+
+TEST_F(Slot, AReaderWhoBeginsWhileTheWriterAsksForTheSpeedIsWaitedFor) {
+    transfer.bytes_left = transfer.bytes_total = 10 * kWhole;
+    EXPECT_EQ(Write(std::string(kWhole, 'a')), kWhole);
+    transfer.speed_cb = [](unsigned long long, unsigned long long) -> long long {
+        transfer.slot_offset = 1;  // between the look at the slot and the copy into it
+        return 0;
+    };
+    waits.wait = [] {
+        transfer.slot_state = kSlotEmpty;
+        return 0;
+    };
+    EXPECT_EQ(Write(std::string(kWhole, 'b')), kWhole);
+    EXPECT_THAT(waits.deadlines, ElementsAre(1090));
+    EXPECT_EQ(Read(sizeof room_), kWhole);
+    EXPECT_EQ(Taken(kWhole), std::string(kWhole, 'b'));
+}
+
+TEST_F(Slot, AChunkOfTwentyThreeBytesEndsTheCopyAlsoBehindOthers) {
+    EXPECT_EQ(Write(std::string(kWhole, 'a')), kWhole);
+    waits.wait = [] {
+        transfer.slot_state = kSlotEmpty;
+        return 0;
+    };
+    EXPECT_EQ(Write(std::string(23, 'x')), 23U);
+    EXPECT_EQ(State(), kSlotAborted);
+}
+
 int cancel_after = 0;
 int CancelLater() {
     return --cancel_after < 0 ? 1 : 0;
