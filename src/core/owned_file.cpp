@@ -76,7 +76,7 @@ bool OwnedFolder::Stat(const std::string& name, struct stat& info) const {
     if (fstatat(fd_.Get(), name.c_str(), &info, AT_SYMLINK_NOFOLLOW) != 0) {
         return false;
     }
-    if (Believes(info)) {
+    if (Trusts(info)) {
         return true;
     }
     struct stat own {};
@@ -91,7 +91,7 @@ bool OwnedFolder::MoveStrangerAside(const std::string& name) const {
     if (!fd_ || fstatat(fd_.Get(), name.c_str(), &info, AT_SYMLINK_NOFOLLOW) != 0) {
         return fd_ && errno == ENOENT;
     }
-    return Believes(info) || MoveAside(name);
+    return Trusts(info) || MoveAside(name);
 }
 
 UniqueFd OwnedFolder::OpenFile(const std::string& name, int flags) const {
@@ -102,7 +102,7 @@ UniqueFd OwnedFolder::OpenFile(const std::string& name, int flags) const {
     UniqueFd fd(openat(fd_.Get(), name.c_str(), flags | kNoTrap));
     if (fd && fstat(fd.Get(), &info) == 0) {
         // Once more, of what was opened: it may have been exchanged since.
-        if (!Believes(info)) {
+        if (!Trusts(info)) {
             errno = EPERM;
         } else if (IsPlainFile(info, (flags & O_ACCMODE) != O_RDONLY)) {
             return fd;

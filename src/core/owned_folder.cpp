@@ -119,7 +119,7 @@ mode_t SafeFolderMode(const std::string& path, mode_t mode) {
     return (mode & S_IWOTH) != 0 ? mode | S_ISVTX : mode;
 }
 
-bool OwnedFolder::Believes(const struct stat& info) const {
+bool OwnedFolder::Trusts(const struct stat& info) const {
     return info.st_uid == 0 || info.st_uid == user_;
 }
 
@@ -142,7 +142,7 @@ bool OwnedFolder::Enter(const std::string& name, const std::string& path) {
     if (!next || fstat(next.Get(), &info) != 0) {
         return false;
     }
-    if (Believes(info)) {
+    if (Trusts(info)) {
         if (IsLoose(path, info) && !Tighten(next.Get(), path, info)) {
             return false;
         }

@@ -90,7 +90,7 @@ class OwnedFolder {
     OwnedFolder(UniqueFd fd, uid_t user, bool ours)
         : fd_(std::move(fd)), user_(user), ours_(ours) {}
     bool Enter(const std::string& name, const std::string& path);
-    bool Believes(const struct stat& info) const;
+    bool Trusts(const struct stat& info) const;
     bool MoveAside(const std::string& name) const;
 
     UniqueFd fd_;
