@@ -92,7 +92,7 @@ bool Tighten(int fd, const std::string& path, const struct stat& info) {
     const EffectiveUid as_root(0);
     const UniqueFd folder = Reopen(fd);
     return (folder && fchmod(folder.Get(), Tightened(path, info.st_mode)) == 0) || errno == EROFS ||
-           (errno == EPERM || errno == EACCES);
+           errno == EPERM || errno == EACCES;
 }
 
 /** What is in it stays with those whose it is: users may have live mounts below. */
