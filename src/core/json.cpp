@@ -10,6 +10,7 @@
 #include <charconv>
 #include <cmath>
 #include <memory>
+#include <sstream>
 
 #include "core/fd_io.h"
 #include "core/handle.h"
@@ -139,7 +140,12 @@ bool fromString(Json::Value& value, const std::string& text) {
 }
 
 std::string toString(const Json::Value& value) {
-    return Json::writeString(WriterRules(), value);
+    // Making a writer costs more than most texts do.
+    static thread_local const std::unique_ptr<Json::StreamWriter> writer(
+        WriterRules().newStreamWriter());
+    std::ostringstream text;
+    writer->write(value, &text);
+    return text.str();
 }
 
 std::string toAscii(const Json::Value& value) {
