@@ -4,7 +4,8 @@
  * Conventions of this face:
  *
  * 1. Results. Unless told otherwise a function answers 1 for success or "yes" and 0 for failure or
- *    "no"; bytes are counted in `long long`. Each failure is told by a line in the system log.
+ *    "no"; bytes are counted in `long long`. A line in the system log tells of each operation on a
+ *    service that failed.
  * 2. `err`. An operation that failed at the service stores a value of GIOErrorEnum in `*err`. It is
  *    left alone by success, and by failures that no service was asked about: a wrong argument, no
  *    profile, no driver, an answer that makes no sense. So a caller stores what it wants to see
@@ -15,10 +16,10 @@
  *    Paths in the cache begin with a slash and have none at the end.
  * 5. Ownership. Records that are handed in stay the caller's: the library keeps copies. What it
  *    hands out stays its own unless told otherwise, above all the record of Entry_Get.
- * 6. Threads. A cache may be used by several threads, and from within a callback. A handle belongs
- *    to one reader; a second thread may fill its buffer meanwhile, as told there. All other
- *    operations make a driver of their own for each call and may run side by side, but that the
- *    downloads of a process take place one after another.
+ * 6. Threads. A cache may be used by several threads, and from within a callback. A handle has
+ *    one reader; another thread may refill its buffer. All other operations make a driver of their
+ *    own for each call and may run side by side, but that the downloads of a process take place one
+ *    after another.
  * 7. Identity. Connections are those of the effective user, or of `ZYROVFS_UID` for root.
  * 8. ZYROCloud_Cloud_InitCurlGlobal comes before the first thread of the process that uses this,
  *    ZYROCloud_Cloud_CleanupCurlGlobal after the last.
@@ -27,8 +28,9 @@
 #define ZYROVFS_ZYROCLOUD_H
 
 #include <gio/gio.h>
-#include <stdbool.h>
-#include <time.h>
+// C has no other names for these.
+#include <stdbool.h>  // NOLINT(modernize-deprecated-headers)
+#include <time.h>     // NOLINT(modernize-deprecated-headers)
 
 #include "zyrovfs/export.h"
 
@@ -50,8 +52,8 @@ typedef struct ZYROCloud_RootAtime {
 
 /**
  * Told of each item of a listing, in the service's order, on the thread that lists. `info` is valid
- * during the call; who keeps it takes a reference. The cache may be locked meanwhile: the callback
- * may use it, and must not wait for another thread that does.
+ * during the call; who keeps it takes a reference. The cache is locked meanwhile: the callback may
+ * use it, and must not wait for another thread that does.
  */
 typedef void (*ZYROCloud_ListCallback)(GFileInfo* info, void* user_data);
 
@@ -102,8 +104,7 @@ ZYROVFS_API int ZYROCloud_Cache_Entry_SetMTime(ZYROCloud_Cache* cache, const cha
  * Stores a copy of `info` under `dir` and the record's name; a record that is already there is
  * overwritten in place. A mark of absence goes. All arguments are required, and so is a name.
  */
-ZYROVFS_API int ZYROCloud_Cache_Entry_Add(ZYROCloud_Cache* cache, const char* dir,
-                                          GFileInfo* info);
+ZYROVFS_API int ZYROCloud_Cache_Entry_Add(ZYROCloud_Cache* cache, const char* dir, GFileInfo* info);
 
 /**
  * Removes a path, its listing and all that its listing names, and marks it absent or takes such a
@@ -213,7 +214,7 @@ ZYROVFS_API void ZYROCloud_Cloud_InitCurlGlobal(void);
 /** Undoes it; no driver and no handle may be left. */
 ZYROVFS_API void ZYROCloud_Cloud_CleanupCurlGlobal(void);
 
-/* --- access time of a mount's root. Any thread, between Init and Destroy. ----------------------- */
+/* --- access time of a mount's root. Any thread, between Init and Destroy ---------------------- */
 
 /** Makes the record ready and stamps it with now. */
 ZYROVFS_API void InitRootAtime(ZYROCloud_RootAtime* rec);
@@ -235,13 +236,14 @@ ZYROVFS_API void DestroyRootAtime(ZYROCloud_RootAtime* rec);
  * CheckAccount: whether the service accepts the credentials in the JSON text `json`, laid over the
  * stored connection. For the service's account of a mount that is about to be made.
  *
- * Download: reads up to `size` bytes from where the last read of the handle ended into `*dest`,
- * which has room for `size` + 1, and gives their number; 0 at the end of the file, -1 for a
- * failure. `handle`, its record, `dest` with what it points to, `p2` and `p3` are required; nothing
- * is done with the latter two.
+ * Download: reads up to `size` bytes from where the last read of the handle ended into `*dest`, and
+ * gives their number; 0 at the end of the file, -1 for a failure. Services are asked for one byte
+ * more, and it may come: `*dest` has room for `size` + 1, and the result counts it. Into the
+ * handle's own buffer never more is read than fits. `handle`, its record, `dest` with what it
+ * points to, `p2` and `p3` are required; nothing is done with the latter two.
  */
 
-/* --- Google Drive, shown as two folders "My Drive" and "Starred" -------------------------------- */
+/* --- Google Drive, shown as two folders "My Drive" and "Starred" ------------------------------ */
 
 /**
  * What a path stands for, slashes at its beginning left out: 1 the root, 2 "My Drive", 3 "Starred",
@@ -266,8 +268,7 @@ ZYROVFS_API int ZYROCloud_Cloud_Google_List(const char* server_id, ZYROCloud_Cac
 ZYROVFS_API int ZYROCloud_Cloud_Google_CheckAccount(const char* server_id, const char* json,
                                                     int* err);
 
-/** Moves the item of id `to` from the folder of id `from` to that of id `to_parent`, as the driver
- * takes the three ids. */
+/** Moves the item of id `to` out of the folder of id `from` into that of id `to_parent`. */
 ZYROVFS_API int ZYROCloud_Cloud_Google_Move(const char* server_id, ZYROCloud_Cache* cache,
                                             const char* from, const char* to, const char* to_parent,
                                             int* err);
@@ -285,7 +286,7 @@ ZYROVFS_API long long ZYROCloud_Cloud_Google_Download(ZYROCloud_Handle* handle, 
                                                       const void* p3, char** dest, long long size,
                                                       int* err);
 
-/* --- Box ---------------------------------------------------------------------------------------- */
+/* --- Box -------------------------------------------------------------------------------------- */
 
 /**
  * Lists a folder. `server_id`, `cache` and `path` are required; without `account_id` nothing
@@ -301,8 +302,8 @@ ZYROVFS_API int ZYROCloud_Cloud_Box_List(const char* account_id, const char* ser
 ZYROVFS_API int ZYROCloud_Cloud_Box_CheckAccount(const char* server_id, const char* json,
                                                  char** account_id, int* err);
 
-/** Moves the item `from` as the driver's Move takes its arguments. A file in the way, at the server
- * path `to_path`, is overwritten; a folder gives G_IO_ERROR_IS_DIRECTORY. */
+/** Moves the item of id `from` into the folder of id `to`. A file in the way, at the server path
+ * `to_path`, is overwritten; a folder there gives G_IO_ERROR_IS_DIRECTORY. */
 ZYROVFS_API int ZYROCloud_Cloud_Box_Move(const char* server_id, ZYROCloud_Cache* cache,
                                          const char* from, const char* to, const char* to_path,
                                          int* err);
@@ -312,7 +313,7 @@ ZYROVFS_API long long ZYROCloud_Cloud_Box_Download(ZYROCloud_Handle* handle, con
                                                    const void* p3, char** dest, long long size,
                                                    int* err);
 
-/* --- Dropbox, where an item's path is its id ---------------------------------------------------- */
+/* --- Dropbox, where an item's path is its id -------------------------------------------------- */
 
 /** Lists a folder. `cache` and `path` are required. Hidden names are left out. */
 ZYROVFS_API int ZYROCloud_Cloud_Dropbox_List(const char* server_id, ZYROCloud_Cache* cache,
@@ -333,7 +334,7 @@ ZYROVFS_API long long ZYROCloud_Cloud_Dropbox_Download(ZYROCloud_Handle* handle,
                                                        const void* p3, char** dest, long long size,
                                                        int* err);
 
-/* --- OneDrive ----------------------------------------------------------------------------------- */
+/* --- OneDrive --------------------------------------------------------------------------------- */
 
 /** Stores the record of the account's root under "/" and tells `callback` of it. */
 ZYROVFS_API int ZYROCloud_Cloud_OneDrive_GetRoot(const char* server_id, ZYROCloud_Cache* cache,

@@ -3,7 +3,6 @@
 #include <glib.h>
 #include <zosplatform/text.h>
 
-#include <algorithm>
 #include <atomic>
 #include <functional>
 #include <memory>
@@ -18,19 +17,23 @@ using UniqueGText = std::unique_ptr<char, ZYROVFS::FreeWith<g_free>>;
 
 std::atomic<bool> caseless_keys{false};
 
-bool IsAscii(const std::string& text) {
-    return std::all_of(text.begin(), text.end(), [](char c) { return (c & 0x80) == 0; });
+/** A call per letter of a path would cost more than the look into the map. */
+constexpr char ToLower(char c) {
+    return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c;
 }
 
 std::string Fold(const std::string& text) {
-    if (IsAscii(text)) {
-        std::string folded(text);
-        std::transform(folded.begin(), folded.end(), folded.begin(), g_ascii_tolower);
+    std::string folded(text);
+    unsigned char all = 0;
+    for (char& c : folded) {
+        all |= static_cast<unsigned char>(c);
+        c = ToLower(c);
+    }
+    if (all < 0x80) {
         return folded;
     }
     const UniqueGText valid(g_utf8_make_valid(text.c_str(), -1));
-    const UniqueGText folded(g_utf8_casefold(valid.get(), -1));
-    return folded.get();
+    return UniqueGText(g_utf8_casefold(valid.get(), -1)).get();
 }
 
 }  // namespace
@@ -48,8 +51,8 @@ size_t KeyHash::operator()(const ZYROCloud_CacheKey& key) const {
 }
 
 bool KeyEqual::operator()(const ZYROCloud_CacheKey& a, const ZYROCloud_CacheKey& b) const {
-    return caseless ? YLIBCUnicodeUTF8StrCaseCmp(a.text.c_str(), b.text.c_str()) == 0
-                    : a.text == b.text;
+    return a.text == b.text ||
+           (caseless && YLIBCUnicodeUTF8StrCaseCmp(a.text.c_str(), b.text.c_str()) == 0);
 }
 
 }  // namespace ZYROCloud

@@ -2,6 +2,7 @@
 
 #include <json/value.h>
 
+#include <algorithm>
 #include <mutex>
 
 #include "bridge/handle.h"
@@ -24,6 +25,14 @@ bool IsBehindEnd(const Cloud& cloud) {
     return status.isInt() && status.asInt() == kRangeNotSatisfiable;
 }
 
+/** What to ask for: a backend may have set a size for which its handle's buffer has no room. */
+long long SizeFor(const ReadCall& call) {
+    ZYROCloud_Handle& handle = *call.handle;
+    const std::lock_guard<std::mutex> lock(handle.mutex);
+    return *call.dest == handle.buffer.get() ? std::min(call.size, ZYROCloud_Handle::kBufferBytes)
+                                             : call.size;
+}
+
 bool Fetch(const ReadCall& call, long long& got) {
     // What moves contents has its state in the process and not in the driver.
     static std::mutex transfers;
@@ -33,7 +42,7 @@ bool Fetch(const ReadCall& call, long long& got) {
     // taken for that of this one: its status for the end of the file, its cancel for this one's.
     handle.cloud->SetError(Json::Value(Json::objectValue));
     return Cloud::DownloadFileToBuffer(handle.cloud.get(), handle.url, *call.dest, handle.position,
-                                       call.size, &got, nullptr, nullptr, nullptr);
+                                       SizeFor(call), &got, nullptr, nullptr, nullptr);
 }
 
 long long Read(const ReadCall& call, SourceLine at) {

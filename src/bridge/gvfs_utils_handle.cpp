@@ -40,7 +40,7 @@ std::unique_ptr<ZYROCloud_Handle> MakeHandle(const char* server_id, const char* 
 
 /** How many bytes of the buffer are still to be read, whatever a backend said of it. */
 long long BytesLeft(const ZYROCloud_Handle& handle) {
-    const long long filled = std::min(handle.buffer_filled, ZYROCloud_Handle::kBufferBytes);
+    const long long filled = std::min(handle.buffer_filled, ZYROCloud_Handle::kBufferRoom);
     return handle.buffer == nullptr ? 0 : std::max(0LL, filled - handle.buffer_position);
 }
 
@@ -72,8 +72,7 @@ int ZYROCloud_FileHandle_Buf_Init(ZYROCloud_Handle* handle) {
     }
     const Guard guard(handle->mutex);
     if (handle->buffer == nullptr) {
-        handle->buffer.reset(
-            static_cast<char*>(std::calloc(1, ZYROCloud_Handle::kBufferBytes + 1)));
+        handle->buffer.reset(static_cast<char*>(std::calloc(1, ZYROCloud_Handle::kBufferRoom)));
     }
     if (handle->buffer == nullptr) {
         LOG_ERROR("Failed to allocate memory");

@@ -12,8 +12,11 @@
 #include "zyrovfs/zyrocloud.h"
 
 struct ZYROCloud_Handle {
-    /** 16 MiB: what the buffer holds, whatever `buffer_size` says. */
+    /** 16 MiB: what a backend downloads at once, unless it says otherwise. */
     static constexpr long long kBufferBytes = 0x1000000;
+    /** What the buffer holds, whatever anybody says: services are asked for one byte more than is
+     * wanted, and that byte is part of what came. */
+    static constexpr long long kBufferRoom = kBufferBytes + 1;
 
     ZYROCloud::UniqueCloud cloud;  ///< null for a connection that cannot be used
     std::string path;              ///< or the item's id
@@ -21,7 +24,7 @@ struct ZYROCloud_Handle {
     ZYROCloud::UniqueFileInfo info;
     long long position = 0;  ///< in the remote file, of the next download
 
-    ZYROVFS::UniqueCString buffer;  ///< one byte more than kBufferBytes: see DownloadFileToBuffer
+    ZYROVFS::UniqueCString buffer;  ///< of kBufferRoom bytes, or none
     long long buffer_position = 0;
     long long buffer_filled = 0;
     std::atomic<long long> buffer_size{kBufferBytes};  ///< what a backend downloads at once

@@ -57,6 +57,33 @@ TEST_P(FlowRead, GivesTheOneByteMoreThatServicesAreAskedForAndMovesByWhatCame) {
     EXPECT_EQ(Ranges().back(), "bytes=5-9");
 }
 
+/** As a backend reads: from the handle's buffer, which downloads refill. */
+TEST_P(FlowRead, ThroughTheBufferOfItsHandleLosesNoByteAndKeepsInsideOfIt) {
+    amy.AddPattern(amy.Root(), "large", 2 * ZYROCloud_Handle::kBufferBytes + 100, 7);
+    const UniqueHandle handle = Open("large");
+    const std::string expected = amy.Bytes(amy.Find("/large"));
+    ASSERT_EQ(ZYROCloud_FileHandle_Buf_Init(handle.get()), 1);
+    ZYROCloud_FileHandle_Buf_SetBufSize(handle.get(), 4 * ZYROCloud_Handle::kBufferBytes);
+    std::string all;
+    for (;;) {
+        char* buffer = ZYROCloud_FileHandle_Buf_Get(handle.get());
+        const long long got = rig->Read(handle.get(), &buffer,
+                                        ZYROCloud_FileHandle_Buf_GetBufSize(handle.get()), &err);
+        ASSERT_LE(got, ZYROCloud_Handle::kBufferRoom);
+        if (got <= 0) {
+            break;
+        }
+        ZYROCloud_FileHandle_Buf_Reset(handle.get(), got);
+        std::string piece(1000001, '#');
+        char* dest = piece.data();
+        for (long long filled = 1; filled > 0;) {
+            filled = ZYROCloud_FileHandle_Buf_Fill(handle.get(), &dest, 1000001);
+            all.append(piece, 0, static_cast<size_t>(filled));
+        }
+    }
+    EXPECT_TRUE(all == expected) << all.size() << seams::LogDump();
+}
+
 TEST_P(FlowRead, AtTheSizeOfTheRecordIsTheEndWithoutARequest) {
     const UniqueHandle handle = Open("a.txt");
     EXPECT_EQ(ReadAll(handle, 100), kLetters);
