@@ -2,6 +2,8 @@
 // of the same pages. A cache of its own for each listing, as a mount begins with one.
 #include <benchmark/benchmark.h>
 
+#include <cstring>
+
 #include "gvfs_services.h"
 
 namespace {
@@ -53,11 +55,14 @@ void List_bare(benchmark::State& state, const Service& service) {
 
 void Register(const std::string& name, void (*call)(benchmark::State&, const Service&),
               const Service& service) {
-    benchmark::RegisterBenchmark(name.c_str(), call, service)
-        ->Arg(1000)
-        ->Arg(10000)
-        ->Arg(100000)
-        ->Unit(benchmark::kMillisecond);
+    auto* const registered = benchmark::RegisterBenchmark(name.c_str(), call, service)
+                                 ->Arg(1000)
+                                 ->Arg(10000)
+                                 ->Unit(benchmark::kMillisecond);
+    // A backend gets Google's items in pages of 100: the simulation takes long to record 1,000.
+    if (strcmp(service.name, "google") != 0) {
+        registered->Arg(100000);
+    }
 }
 
 }  // namespace

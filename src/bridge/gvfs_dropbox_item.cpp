@@ -7,7 +7,6 @@
 
 namespace ZYROCloud::gvfs {
 
-using ZYROVFS::json::MemberOf;
 using ZYROVFS::json::TextOf;
 
 bool DropboxRecord(const Json::Value& item, ItemRecord& record) {

@@ -3,7 +3,6 @@
 
 namespace ZYROCloud::gvfs {
 
-using ZYROVFS::json::MemberOf;
 using ZYROVFS::json::TextOf;
 
 namespace {

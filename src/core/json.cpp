@@ -9,6 +9,7 @@
 #include <charconv>
 #include <cmath>
 #include <memory>
+#include <sstream>
 
 #include "core/entry_name.h"
 #include "core/owned_folder.h"
@@ -141,7 +142,12 @@ bool fromString(Json::Value& value, const std::string& text) {
 }
 
 std::string toString(const Json::Value& value) {
-    return Json::writeString(WriterRules(), value);
+    // Making a writer costs more than most texts do.
+    static thread_local const std::unique_ptr<Json::StreamWriter> writer(
+        WriterRules().newStreamWriter());
+    std::ostringstream text;
+    writer->write(value, &text);
+    return text.str();
 }
 
 std::string toAscii(const Json::Value& value) {
