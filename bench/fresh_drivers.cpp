@@ -17,6 +17,7 @@
 
 #include "tls_box.h"
 #include "zyrovfs/cloud_utils.h"
+#include "zyrovfs/error.h"
 #include "zyrovfs/server.h"
 
 namespace {
@@ -37,9 +38,14 @@ struct Target {
 /** One way to make the three changes; false ends the program. */
 using Change = std::function<bool(const Target&)>;
 
+[[noreturn]] void Fail(const std::string& text) {
+    std::fprintf(stderr, "%s, code %d\n", text.c_str(), ZYROVFS::GetError());
+    std::exit(1);
+}
+
 /** The connection as it stands in the user's file. */
 void StoreProfile(const std::string& token) {
-    const auto enciphered = [](const std::string& text) {
+    const auto enciphered = [](const std::string& text) -> std::string {
         char buffer[4096] = "";
         return Server::SzEncrypt(text.c_str(), buffer, sizeof buffer) != 0 ? buffer : "";
     };
@@ -49,18 +55,24 @@ void StoreProfile(const std::string& token) {
     profile["alias"] = "box";
     profile["client_id"] = "client";
     profile["account_info"] = "{\"id\":\"1\"}";
+    profile["path"] = "/tmp";  // of its mount, which is not looked up then
     profile["expire_time"] = "";
-    profile["access_token"] = std::string(enciphered(token));
-    profile["refresh_token"] = std::string(enciphered("refresh"));
+    profile["access_token"] = enciphered(token);
+    profile["refresh_token"] = enciphered("refresh");
     Json::Value document;
     document["servers"][TlsBox::kServerId] = profile;
-    Server::CfgAccess(kUid, Server::VFS_CONFIG_CONNECT, Server::VFS_CONFIG_WRITE, document);
+    if (!Server::CfgAccess(kUid, Server::VFS_CONFIG_CONNECT, Server::VFS_CONFIG_WRITE, document)) {
+        Fail("the profile cannot be stored");
+    }
 }
 
 bool WithDriver(const std::function<bool(Cloud&)>& call) {
     const std::unique_ptr<Cloud> driver(ZYROCloud::Utils::CreateCloudByServerID(
         kUid, TlsBox::kServerId, Server::VFS_CONFIG_CONNECT));
-    return driver != nullptr && call(*driver);
+    if (driver == nullptr) {
+        Fail("no driver");
+    }
+    return call(*driver);
 }
 
 bool ByFreshDrivers(const Target& target) {
@@ -165,8 +177,7 @@ Cost Measure(TlsBox& box, size_t calls, const Change& change) {
     const double cpu = ThreadCpu();
     for (const Target& target : targets) {
         if (!change(target)) {
-            std::fprintf(stderr, "a change failed\n");
-            std::exit(1);
+            Fail("a change failed");
         }
     }
     const std::chrono::duration<double> wall = std::chrono::steady_clock::now() - begin;
