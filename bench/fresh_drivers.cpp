@@ -1,5 +1,6 @@
-// 1,000 changes over TLS by a driver that is made for each, as backends do, against one libcurl
-// handle that is reused for the same requests; and a few with the pool emptied behind each call:
+// 1,000 changes over TLS by a driver that is made for each from the stored profile, as backends do,
+// against one libcurl handle that is reused for the same requests; the same with the profile in
+// memory, which leaves out the files; and a few with no connection kept:
 //   bench_fresh_drivers [ROUNDS [CALLS]]
 // CPU is that of the calling thread; the simulated service has threads of its own.
 #include <curl/curl.h>
@@ -66,26 +67,42 @@ void StoreProfile(const std::string& token) {
     }
 }
 
-bool WithDriver(const std::function<bool(Cloud&)>& call) {
-    const std::unique_ptr<Cloud> driver(ZYROCloud::Utils::CreateCloudByServerID(
-        kUid, TlsBox::kServerId, Server::VFS_CONFIG_CONNECT));
+using Make = std::function<Cloud*()>;
+
+Cloud* FromFile() {
+    return ZYROCloud::Utils::CreateCloudByServerID(kUid, TlsBox::kServerId,
+                                                   Server::VFS_CONFIG_CONNECT);
+}
+
+Make FromMemory(const std::string& token) {
+    Json::Value profile;
+    profile["access_token"] = token;
+    profile["server_id"] = TlsBox::kServerId;
+    return [profile] {
+        return ZYROCloud::Utils::CreateCloudByConfig(ZYROCloud::CLOUD_TYPE_BOX, kUid, profile);
+    };
+}
+
+bool WithDriver(const Make& make, const std::function<bool(Cloud&)>& call) {
+    const std::unique_ptr<Cloud> driver(make());
     if (driver == nullptr) {
         Fail("no driver");
     }
     return call(*driver);
 }
 
-bool ByFreshDrivers(const Target& target) {
-    return WithDriver([&](Cloud& driver) {
-               return driver.CreateFolder("folders/0", target.folder, Json::objectValue);
-           }) &&
-           WithDriver(
-               [&](Cloud& driver) { return driver.Rename("files/" + target.file, target.name); }) &&
-           WithDriver([&](Cloud& driver) { return driver.Delete("files/" + target.file); });
+bool ByFreshDrivers(const Make& make, const Target& target) {
+    const std::string file = "files/" + target.file;
+    const auto create = [&](Cloud& driver) {
+        return driver.CreateFolder("folders/0", target.folder, Json::objectValue);
+    };
+    const auto rename = [&](Cloud& driver) { return driver.Rename(file, target.name); };
+    const auto remove = [&](Cloud& driver) { return driver.Delete(file); };
+    return WithDriver(make, create) && WithDriver(make, rename) && WithDriver(make, remove);
 }
 
-bool ByFreshDriversWithoutThePool(const Target& target) {
-    const bool done = ByFreshDrivers(target);
+bool WithoutKeptConnections(const Target& target) {
+    const bool done = ByFreshDrivers(FromFile, target);
     Cloud::CleanupCurlGlobal();
     Cloud::InitCurlGlobal();
     return done;
@@ -202,32 +219,40 @@ void Print(const char* name, const std::vector<Cost>& costs, size_t calls) {
                 Median(cpu), Median(wall), connections);
 }
 
+double Ratio(const std::vector<Cost>& ours, const std::vector<Cost>& theirs) {
+    std::vector<double> ratios;
+    for (size_t i = 0; i < ours.size(); ++i) {
+        ratios.push_back(ours[i].cpu / theirs[i].cpu);
+    }
+    return Median(ratios);
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
+    constexpr size_t kUnkept = 30;
     const int rounds = argc > 1 ? std::atoi(argv[1]) : 9;
     const size_t calls = argc > 2 ? std::strtoul(argv[2], nullptr, 10) : 999;
     TlsBox box;
     StoreProfile(box.Token());
     Cloud::InitCurlGlobal();
-    std::vector<Cost> fresh;
-    std::vector<Cost> bare;
-    std::vector<Cost> unpooled;
-    std::vector<double> cpu;
-    std::vector<double> wall;
+    const Make from_memory = FromMemory(box.Token());
+    std::vector<Cost> file, memory, bare, unkept;
     for (int i = 0; i < rounds; ++i) {
-        fresh.push_back(Measure(box, calls, ByFreshDrivers));
         Bare handle(box);
+        file.push_back(
+            Measure(box, calls, [](const Target& t) { return ByFreshDrivers(FromFile, t); }));
         bare.push_back(Measure(box, calls, [&](const Target& t) { return handle.Make(t); }));
-        unpooled.push_back(Measure(box, 30, ByFreshDriversWithoutThePool));
-        cpu.push_back(fresh.back().cpu / bare.back().cpu);
-        wall.push_back(fresh.back().wall / bare.back().wall);
+        memory.push_back(
+            Measure(box, calls, [&](const Target& t) { return ByFreshDrivers(from_memory, t); }));
+        unkept.push_back(Measure(box, kUnkept, WithoutKeptConnections));
     }
-    Print("a fresh driver each", fresh, calls);
+    Print("profile from its file", file, calls);
+    Print("profile in memory", memory, calls);
     Print("one reused handle", bare, calls);
-    Print("no pool, three calls a driver", unpooled, 30);
-    std::printf("  a fresh driver each against one reused handle: cpu %.2f  wall %.2f\n",
-                Median(cpu), Median(wall));
+    Print("no connection kept", unkept, kUnkept);
+    std::printf("  fresh drivers against one reused handle: cpu %.2f, profile in memory %.2f\n",
+                Ratio(file, bare), Ratio(memory, bare));
     Cloud::CleanupCurlGlobal();
     return 0;
 }
