@@ -1,5 +1,6 @@
-// 1,000 changes over TLS by a driver that is made for each, as backends do, against one libcurl
-// handle that is reused for the same requests; and a few with the pool emptied behind each call:
+// 1,000 changes over TLS by a driver that is made for each from the stored profile, as backends do,
+// against one libcurl handle that is reused for the same requests; the same with the profile in
+// memory, which leaves out the files; and a few with no connection kept:
 //   bench_fresh_drivers [ROUNDS [CALLS]]
 // CPU is that of the calling thread; the simulated service has threads of its own.
 #include <curl/curl.h>
@@ -17,6 +18,7 @@
 
 #include "tls_box.h"
 #include "zyrovfs/cloud_utils.h"
+#include "zyrovfs/error.h"
 #include "zyrovfs/server.h"
 
 namespace {
@@ -37,9 +39,14 @@ struct Target {
 /** One way to make the three changes; false ends the program. */
 using Change = std::function<bool(const Target&)>;
 
+[[noreturn]] void Fail(const std::string& text) {
+    std::fprintf(stderr, "%s, code %d\n", text.c_str(), ZYROVFS::GetError());
+    std::exit(1);
+}
+
 /** The connection as it stands in the user's file. */
 void StoreProfile(const std::string& token) {
-    const auto enciphered = [](const std::string& text) {
+    const auto enciphered = [](const std::string& text) -> std::string {
         char buffer[4096] = "";
         return Server::SzEncrypt(text.c_str(), buffer, sizeof buffer) != 0 ? buffer : "";
     };
@@ -49,31 +56,53 @@ void StoreProfile(const std::string& token) {
     profile["alias"] = "box";
     profile["client_id"] = "client";
     profile["account_info"] = "{\"id\":\"1\"}";
+    profile["path"] = "/tmp";  // of its mount, which is not looked up then
     profile["expire_time"] = "";
-    profile["access_token"] = std::string(enciphered(token));
-    profile["refresh_token"] = std::string(enciphered("refresh"));
+    profile["access_token"] = enciphered(token);
+    profile["refresh_token"] = enciphered("refresh");
     Json::Value document;
     document["servers"][TlsBox::kServerId] = profile;
-    Server::CfgAccess(kUid, Server::VFS_CONFIG_CONNECT, Server::VFS_CONFIG_WRITE, document);
+    if (!Server::CfgAccess(kUid, Server::VFS_CONFIG_CONNECT, Server::VFS_CONFIG_WRITE, document)) {
+        Fail("the profile cannot be stored");
+    }
 }
 
-bool WithDriver(const std::function<bool(Cloud&)>& call) {
-    const std::unique_ptr<Cloud> driver(ZYROCloud::Utils::CreateCloudByServerID(
-        kUid, TlsBox::kServerId, Server::VFS_CONFIG_CONNECT));
-    return driver != nullptr && call(*driver);
+using Make = std::function<Cloud*()>;
+
+Cloud* FromFile() {
+    return ZYROCloud::Utils::CreateCloudByServerID(kUid, TlsBox::kServerId,
+                                                   Server::VFS_CONFIG_CONNECT);
 }
 
-bool ByFreshDrivers(const Target& target) {
-    return WithDriver([&](Cloud& driver) {
-               return driver.CreateFolder("folders/0", target.folder, Json::objectValue);
-           }) &&
-           WithDriver(
-               [&](Cloud& driver) { return driver.Rename("files/" + target.file, target.name); }) &&
-           WithDriver([&](Cloud& driver) { return driver.Delete("files/" + target.file); });
+Make FromMemory(const std::string& token) {
+    Json::Value profile;
+    profile["access_token"] = token;
+    profile["server_id"] = TlsBox::kServerId;
+    return [profile] {
+        return ZYROCloud::Utils::CreateCloudByConfig(ZYROCloud::CLOUD_TYPE_BOX, kUid, profile);
+    };
 }
 
-bool ByFreshDriversWithoutThePool(const Target& target) {
-    const bool done = ByFreshDrivers(target);
+bool WithDriver(const Make& make, const std::function<bool(Cloud&)>& call) {
+    const std::unique_ptr<Cloud> driver(make());
+    if (driver == nullptr) {
+        Fail("no driver");
+    }
+    return call(*driver);
+}
+
+bool ByFreshDrivers(const Make& make, const Target& target) {
+    const std::string file = "files/" + target.file;
+    const auto create = [&](Cloud& driver) {
+        return driver.CreateFolder("folders/0", target.folder, Json::objectValue);
+    };
+    const auto rename = [&](Cloud& driver) { return driver.Rename(file, target.name); };
+    const auto remove = [&](Cloud& driver) { return driver.Delete(file); };
+    return WithDriver(make, create) && WithDriver(make, rename) && WithDriver(make, remove);
+}
+
+bool WithoutKeptConnections(const Target& target) {
+    const bool done = ByFreshDrivers(FromFile, target);
     Cloud::CleanupCurlGlobal();
     Cloud::InitCurlGlobal();
     return done;
@@ -165,8 +194,7 @@ Cost Measure(TlsBox& box, size_t calls, const Change& change) {
     const double cpu = ThreadCpu();
     for (const Target& target : targets) {
         if (!change(target)) {
-            std::fprintf(stderr, "a change failed\n");
-            std::exit(1);
+            Fail("a change failed");
         }
     }
     const std::chrono::duration<double> wall = std::chrono::steady_clock::now() - begin;
@@ -191,32 +219,40 @@ void Print(const char* name, const std::vector<Cost>& costs, size_t calls) {
                 Median(cpu), Median(wall), connections);
 }
 
+double Ratio(const std::vector<Cost>& ours, const std::vector<Cost>& theirs) {
+    std::vector<double> ratios;
+    for (size_t i = 0; i < ours.size(); ++i) {
+        ratios.push_back(ours[i].cpu / theirs[i].cpu);
+    }
+    return Median(ratios);
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
+    constexpr size_t kUnkept = 30;
     const int rounds = argc > 1 ? std::atoi(argv[1]) : 9;
     const size_t calls = argc > 2 ? std::strtoul(argv[2], nullptr, 10) : 999;
     TlsBox box;
     StoreProfile(box.Token());
     Cloud::InitCurlGlobal();
-    std::vector<Cost> fresh;
-    std::vector<Cost> bare;
-    std::vector<Cost> unpooled;
-    std::vector<double> cpu;
-    std::vector<double> wall;
+    const Make from_memory = FromMemory(box.Token());
+    std::vector<Cost> file, memory, bare, unkept;
     for (int i = 0; i < rounds; ++i) {
-        fresh.push_back(Measure(box, calls, ByFreshDrivers));
         Bare handle(box);
+        file.push_back(
+            Measure(box, calls, [](const Target& t) { return ByFreshDrivers(FromFile, t); }));
         bare.push_back(Measure(box, calls, [&](const Target& t) { return handle.Make(t); }));
-        unpooled.push_back(Measure(box, 30, ByFreshDriversWithoutThePool));
-        cpu.push_back(fresh.back().cpu / bare.back().cpu);
-        wall.push_back(fresh.back().wall / bare.back().wall);
+        memory.push_back(
+            Measure(box, calls, [&](const Target& t) { return ByFreshDrivers(from_memory, t); }));
+        unkept.push_back(Measure(box, kUnkept, WithoutKeptConnections));
     }
-    Print("a fresh driver each", fresh, calls);
+    Print("profile from its file", file, calls);
+    Print("profile in memory", memory, calls);
     Print("one reused handle", bare, calls);
-    Print("no pool, three calls a driver", unpooled, 30);
-    std::printf("  a fresh driver each against one reused handle: cpu %.2f  wall %.2f\n",
-                Median(cpu), Median(wall));
+    Print("no connection kept", unkept, kUnkept);
+    std::printf("  fresh drivers against one reused handle: cpu %.2f, profile in memory %.2f\n",
+                Ratio(file, bare), Ratio(memory, bare));
     Cloud::CleanupCurlGlobal();
     return 0;
 }

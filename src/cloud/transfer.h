@@ -18,9 +18,10 @@
 
 namespace ZYROCloud {
 
-/** The hand-over from the download thread to the upload thread of a copy: one chunk at a time. */
+/** The hand-over from the download thread to the upload thread of a copy: one chunk at a time, or
+ * those that came before the upload took the first. */
 enum SlotState : int {
-    kSlotFull = 0,      ///< a chunk waits in the slot
+    kSlotFull = 0,      ///< something waits in the slot
     kSlotEmpty = 1,     ///< at the start, and when the upload side has taken the chunk
     kSlotAborted = 2,   ///< every wait ends
     kUploadDone = 3,    ///< upload finished

@@ -40,7 +40,7 @@ APIHandler::APIHandler(CURLSH* share)
       request_(Json::objectValue),
       response_header_(Json::objectValue),
       share_(share) {
-    Lend(ServiceKey());
+    TakeHandle(ServiceKey());
 }
 
 APIHandler::~APIHandler() {
@@ -53,7 +53,7 @@ HandleKey APIHandler::ServiceKey() const {
     return handle_key::ForServices(loan_.own_sessions ? nullptr : share_);
 }
 
-void APIHandler::Lend(HandleKey key) {
+void APIHandler::TakeHandle(HandleKey key) {
     HandlePool& pool = HandlePool::Instance();
     wanted_ = key;
     curl_ = nullptr;
@@ -65,14 +65,14 @@ void APIHandler::Lend(HandleKey key) {
 
 CURL* APIHandler::GetCurlHandler() {
     if (curl_ != nullptr && HandlePool::Instance().IsInherited(loan_)) {
-        Lend(handle_key::ForServices(share_));
+        TakeHandle(handle_key::ForServices(share_));
     }
     return curl_;
 }
 
 bool APIHandler::Init() {
     if (GetCurlHandler() == nullptr) {
-        Lend(ServiceKey());
+        TakeHandle(ServiceKey());
     }
     wanted_ = ServiceKey();
     Reset();

@@ -177,7 +177,7 @@ class APIHandler {
 
   private:
     HandleKey ServiceKey() const;
-    void Lend(HandleKey key);
+    void TakeHandle(HandleKey key);
     bool ChooseConnections();
     bool SetBasicOpt();
     /** Whether libcurl took an option; a refusal is logged in the name of `at`. */

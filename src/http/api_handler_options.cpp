@@ -256,7 +256,7 @@ bool APIHandler::SetShareCurlHandler(void* share) {
     }
     share_ = share;
     if (loan_.own_sessions) {
-        Lend(handle_key::ForServices(share_));
+        TakeHandle(handle_key::ForServices(share_));
     }
     return true;
 }

@@ -174,7 +174,7 @@ void APIHandler::ExpectVFSURL(const std::string& url, const std::string& user,
     SetRoute(url, key);
     key.credentials = handle_key::Credentials(user, password);
     if (loan_.mixed || loan_.key != key) {
-        Lend(std::move(key));
+        TakeHandle(std::move(key));
     }
 }
 
