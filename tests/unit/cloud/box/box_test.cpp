@@ -169,8 +169,7 @@ TEST_F(BoxListing, OnePageMovesTheOffsetOnAndNeverBack) {
 
 TEST_F(BoxListing, ValuesOfTheWrongTypeAreAFailureOfTheCloud) {
     for (const char* body :
-         {R"({"entries":{"a":{"name":"x"}}})", R"({"entries":"text"})", R"({"entries":[7]})",
-          R"({"entries":[{"name":{"x":1}}]})", R"({"entries":[{"name":["x"]}]})",
+         {R"({"entries":{"a":{"name":"x"}}})", R"({"entries":"text"})",
           R"({"entries":[],"total_count":"many"})", R"({"entries":[],"total_count":-1})",
           R"({"entries":[],"total_count":1e300})", R"({"entries":[],"total_count":[]})", "[]",
           R"("text")", "7"}) {
@@ -181,6 +180,18 @@ TEST_F(BoxListing, ValuesOfTheWrongTypeAreAFailureOfTheCloud) {
         EXPECT_FALSE(box->ListFolder("", Json::Value(), out)) << body;
         EXPECT_EQ(box->GetErrorCode(), VFS_ERR_CLOUD_FAILED) << body;
         EXPECT_NE(seams::LogDump(), "") << body;
+    }
+}
+
+TEST_F(BoxListing, AnItemOfTheWrongTypeDoesNotHideTheOthers) {
+    for (const char* item : {"7", R"({"name":{"x":1}})", R"({"name":["x"]})"}) {
+        service.AddFault(
+            Fault::On("GET", "/2.0/folders/0/items")
+                .Body(std::string(R"({"entries":[)") + item + R"(,{"name":"good"}]})"));
+        Json::Value out;
+        EXPECT_TRUE(box->ListFolder("", Json::Value(), out)) << item;
+        ASSERT_EQ(out.size(), 2U) << item;
+        EXPECT_EQ(out[1]["name"], "good") << item;
     }
 }
 

@@ -168,12 +168,9 @@ TEST_F(GDriveListing, NamesThatAreNoUtf8StayOrFailTheListing) {
 }
 
 TEST_F(GDriveListing, ValuesOfTheWrongTypeAreAFailureOfTheCloud) {
-    for (const char* body :
-         {R"({"items":{"a":{"title":"x"}}})", R"({"items":"text"})", R"({"items":7})",
-          R"({"items":[7]})", R"({"items":["text"]})", R"({"items":[[]]})",
-          R"({"items":[{"title":{"x":1}}]})", R"({"items":[{"title":["x"]}]})",
-          R"({"items":[],"nextPageToken":{"x":1}})", R"({"items":[],"nextPageToken":["x"]})", "[]",
-          R"("text")", "7"}) {
+    for (const char* body : {R"({"items":{"a":{"title":"x"}}})", R"({"items":"text"})",
+                             R"({"items":7})", R"({"items":[],"nextPageToken":{"x":1}})",
+                             R"({"items":[],"nextPageToken":["x"]})", "[]", R"("text")", "7"}) {
         service.AddFault(Page(body));
         drive->SetError(VFS_ERR_NONE, "");
         seams::Reset();
@@ -181,6 +178,16 @@ TEST_F(GDriveListing, ValuesOfTheWrongTypeAreAFailureOfTheCloud) {
         EXPECT_FALSE(drive->ListFolder("root", Json::Value(), out)) << body;
         EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CLOUD_FAILED) << body;
         EXPECT_NE(seams::LogDump(), "") << body;
+    }
+}
+
+TEST_F(GDriveListing, AnItemOfTheWrongTypeDoesNotHideTheOthers) {
+    for (const char* item : {"7", "\"text\"", "[]", R"({"title":{"x":1}})", R"({"title":["x"]})"}) {
+        service.AddFault(Page(std::string(R"({"items":[)") + item + R"(,{"title":"good"}]})"));
+        Json::Value out;
+        EXPECT_TRUE(drive->ListFolder("root", Json::Value(), out)) << item;
+        ASSERT_EQ(out.size(), 2U) << item;
+        EXPECT_EQ(out[1]["title"], "good") << item;
     }
 }
 
