@@ -52,18 +52,30 @@ std::vector<gid_t> GroupsOf(const ZYROUSER& user) {
     }
 }
 
-bool IsAdministrator(uid_t uid) {
+/** The answer to what was not found: a no only when everybody who might know was asked. */
+int NoOrUnknown(const char* user, gid_t group) {
+    if (zos::HaveServicesAnswered(user, group)) {
+        return 0;
+    }
+    SET_PLATFORM_ERROR(ZOS_ERR_SYSTEM);
+    return kFailed;
+}
+
+int IsAdministrator(uid_t uid) {
     PZYROUSER found = nullptr;
     if (ZYROUserGetByUID(uid, &found) < 0) {
-        return false;
+        return YLIBCErrGet() == ZOS_ERR_NO_SUCH_USER ? NoOrUnknown("root", 0) : kFailed;
     }
     const UniqueUser user(found);
     zos::AdminGroup administrators;
     if (!zos::FindAdminGroup(administrators)) {
-        return false;
+        return YLIBCErrGet() == ZOS_ERR_NO_SUCH_GROUP ? NoOrUnknown(user->name, user->gid)
+                                                      : kFailed;
     }
     const std::vector<gid_t> groups = GroupsOf(*user);
-    return std::find(groups.begin(), groups.end(), administrators.gid) != groups.end();
+    return std::find(groups.begin(), groups.end(), administrators.gid) != groups.end()
+               ? 1
+               : NoOrUnknown(user->name, user->gid);
 }
 
 PYLIBCSZLIST ListGroups(const char* name) {
@@ -115,7 +127,7 @@ PYLIBCSZLIST YLIBGroupInfoListGet(const char* user, int) {
 }
 
 int YLIBGroupIsAdminGroupMemByUid(uid_t uid, int) {
-    return zos::OrOutOfMemory(0, [uid] { return IsAdministrator(uid) ? 1 : 0; });
+    return zos::OrOutOfMemory(kFailed, [uid] { return IsAdministrator(uid); });
 }
 
 int ZYROGroupGetGID(const char* name, gid_t* gid) {

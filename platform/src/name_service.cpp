@@ -1,6 +1,10 @@
 #include "name_service.h"
 
+#include <dlfcn.h>
+#include <nss.h>
+
 #include <charconv>
+#include <cstdlib>
 #include <fstream>
 #include <sstream>
 
@@ -30,6 +34,52 @@ bool ToNumber(const std::string& text, unsigned int& number) {
     return true;
 }
 
+/** Hands the services that a database of nsswitch.conf draws on to `use`, as far as they are known.
+ */
+template <typename Use>
+void ForEachService(const char* database, Use use) {
+    std::ifstream file("/etc/nsswitch.conf");
+    for (std::string line; std::getline(file, line);) {
+        std::istringstream words(line.substr(0, line.find('#')));
+        std::string word;
+        if (!(words >> word) || word != std::string(database) + ":") {
+            continue;
+        }
+        while (words >> word) {
+            for (const Service& service : kServices) {
+                if (word == service.name) {
+                    use(service);
+                }
+            }
+        }
+    }
+}
+
+using GroupsOfUser = nss_status (*)(const char*, gid_t, long*, long*, gid_t**, long, int*);
+
+bool Answers(GroupsOfUser ask, const char* user, gid_t group) {
+    long start = 0;
+    long size = 64;
+    auto* groups = static_cast<gid_t*>(calloc(static_cast<size_t>(size), sizeof(gid_t)));
+    if (groups == nullptr) {
+        return false;
+    }
+    int error = 0;
+    const nss_status status = ask(user, group, &start, &size, &groups, -1, &error);
+    free(groups);
+    return status == NSS_STATUS_SUCCESS || status == NSS_STATUS_NOTFOUND;
+}
+
+/** A service that is not installed has nothing to say, as for the C library; one that cannot be
+ * asked for a user's groups is not asked. */
+bool HasAnswered(const std::string& service, const char* user, gid_t group) {
+    void* const library = dlopen(("libnss_" + service + ".so.2").c_str(), RTLD_NOW | RTLD_NODELETE);
+    void* const ask = library == nullptr
+                          ? nullptr
+                          : dlsym(library, ("_nss_" + service + "_initgroups_dyn").c_str());
+    return ask == nullptr || Answers(reinterpret_cast<GroupsOfUser>(ask), user, group);
+}
+
 }  // namespace
 
 IdRange PeopleOf(const char* first_key, const char* last_key) {
@@ -52,20 +102,18 @@ IdRange PeopleOf(const char* first_key, const char* last_key) {
 
 unsigned int KindsOf(const char* database) {
     unsigned int kinds = ZOS_AUTH_LOCAL;
-    std::ifstream file("/etc/nsswitch.conf");
-    for (std::string line; std::getline(file, line);) {
-        std::istringstream words(line.substr(0, line.find('#')));
-        std::string word;
-        if (!(words >> word) || word != std::string(database) + ":") {
-            continue;
-        }
-        while (words >> word) {
-            for (const Service& service : kServices) {
-                kinds |= word == service.name ? service.kind : 0;
-            }
-        }
-    }
+    ForEachService(database, [&](const Service& service) { kinds |= service.kind; });
     return kinds;
+}
+
+bool HaveServicesAnswered(const char* user, gid_t group) {
+    bool answered = true;
+    for (const char* database : {"initgroups", "group"}) {
+        ForEachService(database, [&](const Service& service) {
+            answered = answered && HasAnswered(service.name, user, group);
+        });
+    }
+    return answered;
 }
 
 }  // namespace zos

@@ -2,6 +2,8 @@
 #ifndef ZOSPLATFORM_SRC_NAME_SERVICE_H
 #define ZOSPLATFORM_SRC_NAME_SERVICE_H
 
+#include <sys/types.h>
+
 #include <vector>
 
 #include "support.h"
@@ -18,6 +20,13 @@ IdRange PeopleOf(const char* first_key, const char* last_key);
 
 /** Which kinds of ZOS_AUTH_... the database "passwd" or "group" of nsswitch.conf draws on. */
 unsigned int KindsOf(const char* database);
+
+/**
+ * Whether all directory services of this machine answer when they are asked for a user's groups.
+ * The C library does not tell: from getgrouplist the groups of a service that is out of reach are
+ * missing without a word. Any name does for finding out whether they are there.
+ */
+bool HaveServicesAnswered(const char* user, gid_t group);
 
 /** How a lookup in the name service ended. */
 enum class Lookup { kFound, kUnknown, kFailed };

@@ -8,7 +8,6 @@
 
 #include "bridge/gvfs_utils.h"
 #include "cloud/conflict.h"
-#include "core/json_member.h"
 #include "core/log.h"
 #include "core/source_line.h"
 
@@ -22,12 +21,8 @@ struct MoveCall {
     int* err;
 };
 
-/** Whether an item that a path led to has the name at its end: a path may mean items of another
- * name, too. Without regard to case, as services compare names. */
-bool HasNameOf(const Json::Value& item, const std::string& path);
-
 /** Makes way for `call.from`, and moves it again. A file that has its place gives way, a folder
- * does not, and no item for itself. */
+ * does not, nor an item of another name. */
 template <typename Driver, typename Find>
 bool ReplaceAtTarget(Driver& driver, const MoveCall& call, Find find, ZYROVFS::SourceLine at) {
     const auto find_logged = [&](Json::Value& item) {
@@ -38,10 +33,8 @@ bool ReplaceAtTarget(Driver& driver, const MoveCall& call, Find find, ZYROVFS::S
         return true;
     };
     const auto remove = [&](const Json::Value& item) {
-        const std::string rival = driver.GetFileID(item);
-        const bool is_rival = !ZYROVFS::json::TextOf(item, "id").empty() && rival != call.from &&
-                              HasNameOf(item, call.to_path);
-        if (!is_rival || !driver.Delete(rival)) {
+        if (!IsInTheWay(driver, item, call.from, NameAtEnd(call.to_path)) ||
+            !driver.Delete(driver.GetFileID(item))) {
             LOG_ERROR_AT(at, "Failed to delete path %s", call.to_path);
             return false;
         }

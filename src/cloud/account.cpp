@@ -15,9 +15,12 @@ bool AskAccount(_tag_cloud_type type, unsigned int uid, Json::Value& profile,
     if (cloud == nullptr) {
         return false;
     }
+    auto* const account = dynamic_cast<PublicCloud*>(cloud.get());
+    if (account != nullptr) {
+        account->TokenIsGiven();
+    }
     const bool answered = Guard(*cloud, [&] { return cloud->GetAccountInfo(params, out); });
     error = cloud->GetError();
-    const auto* account = dynamic_cast<const PublicCloud*>(cloud.get());
     if (account != nullptr && profile["access_token"] != account->Token().access_token) {
         profile["access_token"] = account->Token().access_token;
         profile["refresh_token"] = account->Token().refresh_token;

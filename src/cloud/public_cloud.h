@@ -5,6 +5,7 @@
 #include <json/value.h>
 
 #include <string>
+#include <vector>
 
 #include "core/source_line.h"
 #include "zyrovfs/cloud.h"
@@ -43,6 +44,9 @@ class PublicCloud : public Cloud {
     std::string Bearer() const { return "Bearer " + token_.access_token; }
     const std::string& ClientId() const { return client_id_; }
     const TokenInfo& Token() const { return token_; }
+    /** Tells that the token comes from a caller and is in no profile yet: what the profiles have is
+     * then the token before it, unless it ends later. */
+    void TokenIsGiven() { token_is_given_ = true; }
 
   protected:
     /** UpdateAccountInfo with the query of a service. */
@@ -55,8 +59,12 @@ class PublicCloud : public Cloud {
 
   private:
     void TakeTokenOfOthers();
+    bool IsNewer(const TokenInfo& stored, bool ours_is_stored) const;
     bool AskForToken();
     bool TakeToken(const std::string& text);
+
+    std::vector<std::string> replaced_;  ///< access tokens that this driver has renewed
+    bool token_is_given_ = false;
 };
 
 }  // namespace ZYROCloud

@@ -6,6 +6,7 @@
 #include <limits>
 #include <memory>
 #include <mutex>
+#include <vector>
 
 #include "cloud/guard.h"
 #include "cloud/handler.h"
@@ -117,21 +118,14 @@ bool Decipher(const Json::Value& profile, const char* key, std::string& out) {
     return ok;
 }
 
-/** The token of a stored profile, if it lives longer than `token`: a renewal of another process.
- */
-bool FindNewer(const Json::Value& profile, TokenInfo& token) {
+/** The token of a stored profile. False for one without, and for one that cannot be read. */
+bool ReadToken(const Json::Value& profile, TokenInfo& token) {
     if (!profile.isObject() || !profile["expire_time"].isString()) {
         return false;
     }
-    TokenInfo stored = token;
-    stored.expire_time = profile["expire_time"].asString();
-    if (Seconds(stored.expire_time) <= Seconds(token.expire_time) ||
-        !Decipher(profile, "access_token", stored.access_token) ||
-        !Decipher(profile, "refresh_token", stored.refresh_token)) {
-        return false;
-    }
-    token = stored;
-    return true;
+    token.expire_time = profile["expire_time"].asString();
+    return Decipher(profile, "access_token", token.access_token) &&
+           Decipher(profile, "refresh_token", token.refresh_token);
 }
 
 }  // namespace
@@ -168,18 +162,46 @@ bool PublicCloud::RefreshToken(bool force) {
  * before him got, or he would spend a token that is spent; memory alone does not tell.
  */
 void PublicCloud::TakeTokenOfOthers() {
+    struct Stored {
+        Json::Value profile;
+        TokenInfo token;
+    };
+    std::vector<Stored> found;
+    bool ours_is_stored = false;
     for (const Server::VFS_CONFIG_MODE mode :
          {Server::VFS_CONFIG_CONNECT, Server::VFS_CONFIG_SERVER}) {
-        Json::Value profile;
-        if (!Server::CfgGetByID(uid, mode, server_id.c_str(), profile) ||
-            !FindNewer(profile, token_)) {
-            continue;
-        }
-        // A new grant may have come with another client of the service.
-        if (profile["client_id"].isString()) {
-            client_id_ = profile["client_id"].asString();
+        Stored stored{Json::Value(), token_};
+        if (Server::CfgGetByID(uid, mode, server_id.c_str(), stored.profile) &&
+            ReadToken(stored.profile, stored.token)) {
+            ours_is_stored |= stored.token.access_token == token_.access_token;
+            found.push_back(stored);
         }
     }
+    for (const Stored& stored : found) {
+        if (!IsNewer(stored.token, ours_is_stored)) {
+            continue;
+        }
+        token_ = stored.token;
+        // A new grant may have come with another client of the service.
+        if (stored.profile["client_id"].isString()) {
+            client_id_ = stored.profile["client_id"].asString();
+        }
+    }
+}
+
+/**
+ * What ends later is newer. What ends earlier may be, too, since a service gives what life it
+ * likes: it is when all profiles have lost the token that this driver got from them. A file that
+ * could not be rewritten keeps a token that this driver had before.
+ */
+bool PublicCloud::IsNewer(const TokenInfo& stored, bool ours_is_stored) const {
+    if (Seconds(stored.expire_time) > Seconds(token_.expire_time)) {
+        return true;
+    }
+    const bool had =
+        stored.access_token == token_.access_token ||
+        std::find(replaced_.begin(), replaced_.end(), stored.access_token) != replaced_.end();
+    return !had && !ours_is_stored && !token_is_given_;
 }
 
 bool PublicCloud::AskForToken() {
@@ -222,10 +244,13 @@ bool PublicCloud::TakeToken(const std::string& text) {
     fresh.expire_time = ExpiryOf(LifeOf(answer));
     fields["access_token"] = fresh.access_token;
     fields["expire_time"] = fresh.expire_time;
-    if (answer.isMember("refresh_token")) {
-        fresh.refresh_token = answer["refresh_token"].asString();
-        fields["refresh_token"] = fresh.refresh_token;
+    // Null and "" are no new token: the old one stays good.
+    const std::string refresh_token = answer.get("refresh_token", "").asString();
+    if (!refresh_token.empty()) {
+        fresh.refresh_token = refresh_token;
+        fields["refresh_token"] = refresh_token;
     }
+    replaced_.push_back(token_.access_token);
     token_ = fresh;
     // This driver goes on with the new token, whether or not the profiles can be rewritten.
     UpdateProfileConfig(Server::VFS_CONFIG_CONNECT, fields);

@@ -47,24 +47,25 @@ bool FindCopyIds(Driver& driver, const std::string& from, const std::string& to,
 }
 
 /**
- * ReplaceFile by the driver's own operations. An item is never deleted to be replaced by itself:
- * when `find` comes upon `id`, the source of the copy, the error of the conflict stays.
+ * ReplaceFile by the driver's own operations. Only what is in the way of `id`, which a path shows
+ * as `shown`, is deleted; for any other item the error of the conflict stays.
  */
 template <typename Driver, typename Find, typename Again>
-bool ReplaceItem(Driver& driver, const std::string& id, Find find, Again again) {
+bool ReplaceItem(Driver& driver, const std::string& id, const std::string& shown, Find find,
+                 Again again) {
     return ReplaceFile(
         driver, find, [&](const Json::Value& item) { return driver.IsDir(item); },
         [&](const Json::Value& item) {
-            const std::string rival = driver.GetFileID(item);
-            return rival != id && driver.Delete(rival);
+            return IsInTheWay(driver, item, id, shown) && driver.Delete(driver.GetFileID(item));
         },
         again);
 }
 
 /**
- * Copies the item at `from` into the folder that `to` is in; `describe` makes the service's request
- * from the ids of both. With `overwrite` a file in the way, which `find` describes, gives way once:
- * the driver's DoCopy is then called without it. VFS_ERR_NOT_FOUND, VFS_ERR_IS_DIRECTORY.
+ * Copies the item at `from` into the folder that `to` is in, under the name that it has; `describe`
+ * makes the service's request from the ids of both. With `overwrite` a file in the way gives way
+ * once, if it is the one at `to`, which `find` describes: the driver's DoCopy is then called
+ * without it. VFS_ERR_NOT_FOUND, VFS_ERR_IS_DIRECTORY, VFS_ERR_CONFLICT.
  */
 template <typename Driver, typename Describe, typename Find>
 bool CopyByPath(Driver& driver, const std::string& from, const std::string& to, bool overwrite,
@@ -76,10 +77,20 @@ bool CopyByPath(Driver& driver, const std::string& from, const std::string& to, 
         return false;
     }
     Request request = describe(id, parent_id);
+    const auto find_named = [&](Json::Value& item) {
+        if (!find(item)) {
+            return false;
+        }
+        // Of an answer without a name this much is known: it is what that path led to.
+        if (item.isObject() && !item.isMember("name")) {
+            item["name"] = NameAtEnd(to);
+        }
+        return true;
+    };
     const auto again = [&] { return driver.DoCopy(from, to, false); };
     if (overwrite) {
         request.Unless(ZYROVFS::VFS_ERR_CONFLICT,
-                       [&] { return ReplaceItem(driver, id, find, again); });
+                       [&] { return ReplaceItem(driver, id, NameAtEnd(from), find_named, again); });
     }
     return request.Send();
 }

@@ -1,9 +1,11 @@
 #include "core/user_mount.h"
 
 #include <fcntl.h>
+#include <sys/mount.h>
 #include <sys/stat.h>
 
 #include <cerrno>
+#include <sstream>
 #include <string>
 
 #include "core/fd_io.h"
@@ -11,6 +13,12 @@
 
 namespace ZYROVFS {
 namespace {
+
+/** One line for each mount; false where the list cannot be read. */
+bool ReadMounts(std::string& text) {
+    const UniqueFd fd(open("/proc/self/mountinfo", O_RDONLY | O_CLOEXEC));
+    return fd && ReadAll(fd.Get(), text);
+}
 
 /** The type in a mount's line of mountinfo: what follows " - ". */
 bool IsFuse(const std::string& line) {
@@ -22,9 +30,8 @@ bool IsFuse(const std::string& line) {
 
 /** Unknown counts as fuse: where the list cannot be read, nothing says that it is none. */
 bool IsFuseMount(uint64_t id) {
-    const UniqueFd fd(open("/proc/self/mountinfo", O_RDONLY | O_CLOEXEC));
     std::string text;
-    if (!fd || !ReadAll(fd.Get(), text)) {
+    if (!ReadMounts(text)) {
         return true;
     }
     text.insert(0, "\n");
@@ -32,7 +39,44 @@ bool IsFuseMount(uint64_t id) {
     return at == std::string::npos || IsFuse(text.substr(at + 1, text.find('\n', at + 1) - at - 1));
 }
 
+/** Whether a mount's line is of one at `folder` or below: its fifth word is the mount point. */
+bool IsBelow(const std::string& line, const std::string& folder) {
+    std::istringstream words(line);
+    std::string point;
+    for (int i = 0; i < 5; ++i) {
+        words >> point;
+    }
+    return point == folder || point.compare(0, folder.size() + 1, folder + "/") == 0;
+}
+
 }  // namespace
+
+MountsBelow FindMountsBelow(const std::string& folder) {
+    std::string text;
+    if (!ReadMounts(text)) {
+        return MountsBelow::kOfTheSystem;
+    }
+    MountsBelow found = MountsBelow::kNone;
+    std::istringstream lines(text);
+    for (std::string line; std::getline(lines, line);) {
+        if (IsBelow(line, folder)) {
+            if (!IsFuse(line)) {
+                return MountsBelow::kOfTheSystem;
+            }
+            found = MountsBelow::kOfUsers;
+        }
+    }
+    return found;
+}
+
+bool DetachUsersMount(int folder, const char* name) {
+    if (!IsUsersMount(folder, name)) {
+        return true;
+    }
+    // By the open folder: no link above the mount point leads root to another file system.
+    const std::string point = "/proc/self/fd/" + std::to_string(folder) + "/" + name;
+    return umount2(point.c_str(), MNT_DETACH | UMOUNT_NOFOLLOW) == 0;
+}
 
 bool IsUsersMount(int folder, const char* name) {
     const int saved = errno;

@@ -44,7 +44,8 @@ PermissionDecision No(PERMISSION_RULE rule) {
 
 /** What decides before any policy; false when nothing does. */
 bool DecideByStanding(unsigned int uid, PermissionDecision& decision) {
-    if (YLIBGroupIsAdminGroupMemByUid(uid, 1) != 0) {
+    // Below 0 it cannot be told: that lets nobody in who would otherwise be refused.
+    if (YLIBGroupIsAdminGroupMemByUid(uid, 1) > 0) {
         decision = Yes(PERMISSION_ADMINISTRATOR);
         return true;
     }

@@ -33,6 +33,17 @@ bool IsDirectory(int parent, const dirent& entry) {
     return fstatat(parent, entry.d_name, &info, AT_SYMLINK_NOFOLLOW) == 0 && S_ISDIR(info.st_mode);
 }
 
+/** Whom the directory cannot tell about may be an administrator: profiles that are removed do not
+ * come back. */
+bool IsSurelyNoAdmin(unsigned int uid) {
+    const int admin = YLIBGroupIsAdminGroupMemByUid(uid, 1);
+    if (admin < 0) {
+        LOG_ERROR("Failed to find out whether user (%d) is an administrator, " ZYROERR_FORMAT,
+                  static_cast<int>(uid), ZYROERR_ARGS);
+    }
+    return admin == 0;
+}
+
 /** Everyone who has had a connection and is no administrator. */
 std::vector<unsigned int> NonAdminUids() {
     std::vector<unsigned int> uids;
@@ -46,7 +57,7 @@ std::vector<unsigned int> NonAdminUids() {
     while (const dirent* entry = readdir(dir.get())) {
         unsigned int uid = 0;
         if (ToUid(entry->d_name, uid) && IsDirectory(dirfd(dir.get()), *entry) &&
-            YLIBGroupIsAdminGroupMemByUid(uid, 1) == 0) {
+            IsSurelyNoAdmin(uid)) {
             uids.push_back(uid);
         }
     }

@@ -39,8 +39,10 @@ bool IsSetting(const Json::Value& element, const char* id) {
         return false;
     }
     const Json::Value& number = Member(element, id);
-    return !number.isNull() && number.isConvertibleTo(Json::stringValue) &&
-           Member(element, kEnabled).isConvertibleTo(Json::booleanValue);
+    const Json::Value& enabled = Member(element, kEnabled);
+    // Null converts to anything: a setting that was left out would count as a no, and shut out.
+    return !number.isNull() && number.isConvertibleTo(Json::stringValue) && !enabled.isNull() &&
+           enabled.isConvertibleTo(Json::booleanValue);
 }
 
 /** Takes over all elements, or none when one of them is no setting. */

@@ -13,6 +13,7 @@
 #include "core/no_throw.h"
 #include "core/owned_folder.h"
 #include "core/paths.h"
+#include "core/user_mount.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
@@ -47,14 +48,42 @@ void UnmountAll(unsigned int uid) {
     }
 }
 
+/** Removes a tree, but nothing that is mounted in it: that is not this user's to lose. */
+bool RunRm(const std::string& path) {
+    const char* const plain[] = {paths::kRm, "-rf", path.c_str(), nullptr};
+    // Only another device tells rm that it comes to a mount. Users have no other mounts.
+    const char* const around[] = {paths::kRm,   "-rf",  "--one-file-system", "--preserve-root=all",
+                                  path.c_str(), nullptr};
+    switch (FindMountsBelow(path)) {
+        case MountsBelow::kNone:
+            return YLIBCExecv(paths::kRm, plain) == 0;
+        case MountsBelow::kOfUsers:
+            return YLIBCExecv(paths::kRm, around) == 0;
+        case MountsBelow::kOfTheSystem:
+            break;
+    }
+    errno = EBUSY;
+    return false;
+}
+
 /** What leads to the tree is looked at first: rm goes by the path, through any link above it. */
 void RemoveTree(const std::string& path, unsigned int uid) {
-    const char* const argv[] = {paths::kRm, "-rf", path.c_str(), nullptr};
     // The folders above are sticky: only root takes root's folders out of them.
     const EffectiveUid as_root(0);
     const OwnedFolder above = OwnedFolder::Open(SplitPath(path).folder, uid);
-    if ((!above && errno != ENOENT) || YLIBCExecv(paths::kRm, argv) != 0) {
+    if ((!above && errno != ENOENT) || !RunRm(path)) {
         LOG_ERROR("Failed to rm -rf %s, errno=%X", path.c_str(), errno);
+    }
+}
+
+/** Daemons without pid files count as dead, but their tree still shows the servers. It goes, and
+ * nothing of what it shows. */
+void DetachFuseTree(unsigned int uid) {
+    const EntryPath place = SplitPath(paths::FuseTree(uid));
+    const EffectiveUid as_root(0);
+    const OwnedFolder above = OwnedFolder::Open(place.folder, uid);
+    if (above && !DetachUsersMount(above.Get(), place.name.c_str())) {
+        LOG_ERROR("Failed to umount %s, %m", paths::FuseTree(uid).c_str());
     }
 }
 
@@ -87,6 +116,7 @@ void RemoveFiles(unsigned int uid, bool removeProfiles, bool removeRuntime) {
     }
     RemoveTree(paths::UserConnectDir(uid), uid);
     if (removeRuntime && AreAllDaemonsDead()) {
+        DetachFuseTree(uid);
         ScanFuseTree(uid);
         RemoveTree(paths::RuntimeDir(uid), uid);
     }

@@ -6,6 +6,7 @@
 
 #include <cerrno>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 
 #define NAME_(service, call) _nss_##service##_##call
@@ -69,6 +70,27 @@ nss_status NAME(SERVICE, getgrent_r)(group* entry, char* texts, size_t size, int
     return groups == nullptr && NAME(SERVICE, setgrent)(0) != NSS_STATUS_SUCCESS
                ? NSS_STATUS_UNAVAIL
                : Answer(fgetgrent_r(groups, entry, texts, size, &found), error);
+}
+
+nss_status NAME(SERVICE, initgroups_dyn)(const char* user, gid_t, long* start, long* size,
+                                         gid_t** gids, long, int*) {
+    FILE* file = nullptr;
+    if (Open(file, "/etc/" TEXT(SERVICE) ".group") != NSS_STATUS_SUCCESS) {
+        return NSS_STATUS_UNAVAIL;
+    }
+    while (const group* entry = fgetgrent(file)) {
+        for (char** member = entry->gr_mem; *member != nullptr; ++member) {
+            if (strcmp(*member, user) != 0) {
+                continue;
+            }
+            if (*start == *size) {
+                *size *= 2;
+                *gids = static_cast<gid_t*>(realloc(*gids, sizeof(gid_t) * *size));
+            }
+            (*gids)[(*start)++] = entry->gr_gid;
+        }
+    }
+    return Close(file);
 }
 
 }  // extern "C"

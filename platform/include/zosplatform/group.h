@@ -31,8 +31,9 @@ int YLIBGroupInfoEnumBySubstr(unsigned int type, const char* substr, const char*
  */
 PYLIBCSZLIST YLIBGroupInfoListGet(const char* user, int flags);
 
-/** 1 for an administrator, else 0: also for a uid that nobody has, and when the directory fails.
- * `flags` is 1. */
+/** 1 for an administrator, 0 for somebody else and for a uid that nobody has. -1 when it cannot be
+ * told, since a directory service does not answer: then nobody may be taken for either. `flags` is
+ * 1. */
 int YLIBGroupIsAdminGroupMemByUid(uid_t uid, int flags);
 
 /** 0 with the gid, or -1 (platform error 0x1e00: no such group). */

@@ -7,6 +7,7 @@
 
 #include <json/value.h>
 
+#include <functional>
 #include <string>
 
 #include "cloud/driver_of.h"
@@ -80,8 +81,16 @@ class Dropbox : public DriverOf<DropboxErrorHandler> {
     bool DownloadProcess(XferData* xfer, const Json::Value& meta) override;
 
   private:
-    bool ReplaceTarget(const std::string& from, const std::string& to, const std::string& action,
-                       const std::string& copy_ref);
+    /** A move or copy, as MVCP takes it. */
+    struct Change {
+        std::string from, to, action, copy_ref;
+    };
+    /** Whether an item in the way is the very one that is moved or copied. */
+    using IsSource = std::function<bool(const Json::Value& item)>;
+    bool SendChange(const Change& what, bool overwrite, const IsSource& is_source);
+    bool ReplaceTarget(const Change& what, const IsSource& is_source);
+    bool AskCopyRef(const std::string& path, Json::Value& out);
+    bool MayShareAccount(const Dropbox& other) const;
     /** With `sent` the offset moves on by what the source had. */
     bool SendChunk(XferData* xfer, const std::string& session, const std::string& path,
                    unsigned long long* offset, unsigned long long size, SentBytes* sent);

@@ -43,13 +43,15 @@ class Target : public testing::Test {
   protected:
     void SetUp() override { seams::Reset(); }
 
-    bool Replace(const std::string& source, const std::string& rival, bool folder = false) {
+    bool Replace(const std::string& source, const std::string& rival, bool folder = false,
+                 const std::string& name = "a.txt") {
         const auto find = [&](Json::Value& item) {
             item["id"] = rival;
+            item["name"] = name;
             item["folder"] = folder;
             return true;
         };
-        return ReplaceItem(drive, source, find, [this] { return drive.Note("again"); });
+        return ReplaceItem(drive, source, "a.txt", find, [this] { return drive.Note("again"); });
     }
 
     IdDriver drive;
@@ -104,6 +106,18 @@ TEST_F(Target, ASourceIsNeverDeletedForItsOwnCopy) {
     EXPECT_FALSE(Replace("1", "1"));
     EXPECT_EQ(drive.GetErrorCode(), VFS_ERR_CONFLICT);
     EXPECT_THAT(drive.steps, IsEmpty());
+}
+
+TEST_F(Target, AnItemOfAnotherNameIsNotWhatTheCopyMet) {
+    for (const char* name : {"b.txt", ""}) {
+        drive.SetError(VFS_ERR_CONFLICT, "");
+        EXPECT_FALSE(Replace("1", "9", false, name));
+        EXPECT_EQ(drive.GetErrorCode(), VFS_ERR_CONFLICT);
+    }
+    EXPECT_FALSE(Replace("1", ""));
+    EXPECT_THAT(drive.steps, IsEmpty());
+    EXPECT_TRUE(Replace("1", "9", false, "A.TXT"));
+    EXPECT_THAT(drive.steps, ElementsAre("delete 9", "again"));
 }
 
 TEST_F(Target, AWalkWithoutAnIdIsNotFound) {

@@ -139,6 +139,23 @@ TEST_F(Group, WhoIsNotKnownIsNoAdministrator) {
     EXPECT_EQ(YLIBGroupIsAdminGroupMemByUid(1001, 1), 0);
 }
 
+TEST_F(Group, NobodyIsToldToBeNoAdministratorWhileADirectoryServiceDoesNotAnswer) {
+    AddGroup("administrators", 1700, "amy");
+    accounts::BindToServices("ldap");
+    std::filesystem::remove("/etc/ldap.group");
+    EXPECT_EQ(YLIBGroupIsAdminGroupMemByUid(1001, 1), 1) << "this machine knows";
+    EXPECT_EQ(YLIBGroupIsAdminGroupMemByUid(1002, 1), -1);
+    EXPECT_EQ(YLIBCErrGet(), ZOS_ERR_SYSTEM);
+    EXPECT_EQ(YLIBGroupIsAdminGroupMemByUid(4242, 1), -1);
+    std::ofstream("/etc/ldap.group") << "administrators:x:1700:ben\n";
+    EXPECT_EQ(YLIBGroupIsAdminGroupMemByUid(1002, 1), 1);
+    EXPECT_EQ(YLIBGroupIsAdminGroupMemByUid(4242, 1), 0);
+    std::ofstream("/etc/ldap.group") << "";
+    EXPECT_EQ(YLIBGroupIsAdminGroupMemByUid(1002, 1), 0);
+    accounts::BindToServices("sss");
+    EXPECT_EQ(YLIBGroupIsAdminGroupMemByUid(1002, 1), 0) << "a service that is not installed";
+}
+
 TEST_F(Group, AdministratorsGroupIsKnownByName) {
     EXPECT_EQ(ZYROGroupIsAdminGroup("SUDO"), 1);
     EXPECT_EQ(ZYROGroupIsAdminGroup("users"), 0);

@@ -53,6 +53,17 @@ TEST_F(Permission, AdministratorPassesUnderAdminAndUnderCustomWithNoEntry) {
     }
 }
 
+TEST_F(Permission, NobodyPassesAsAnAdministratorWhileADirectoryServiceDoesNotAnswer) {
+    Put(kUnderCustom);
+    accounts::BindToServices("ldap");
+    std::filesystem::remove("/etc/ldap.group");
+    EXPECT_TRUE(May(kRoot)) << "whom this machine knows";
+    EXPECT_EQ(Rule(kCleo), PERMISSION_USER_ENABLED);
+    EXPECT_EQ(Rule(kBen), PERMISSION_GROUP_ENABLED);
+    Put(kUnderAdmin);
+    EXPECT_FALSE(May(kCleo));
+}
+
 TEST_F(Permission, AdministratorCannotBeShutOutByTheOwnEntry) {
     Put(R"({"user_enabled_type":"custom","user_settings":{"4004":{"enabled":false}}})");
     EXPECT_TRUE(May(kRoot));

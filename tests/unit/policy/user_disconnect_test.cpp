@@ -102,6 +102,28 @@ TEST_F(DisConnDisabledConf, UserWhoseGroupsCannotBeListedStaysAndIsLogged) {
         << seams::LogDump();
 }
 
+TEST_F(DisConnDisabledConf, NobodyIsShutOutWhileADirectoryServiceDoesNotAnswer) {
+    // This machine knows the group, and the directory who is in it.
+    std::ofstream("/etc/group") << "users:x:100:\nadministrators:x:1600:\n";
+    accounts::BindToServices("ldap");
+    std::filesystem::remove("/etc/ldap.group");
+    EXPECT_TRUE(Run(R"({"group_settings":{"1601":{"enabled":true}}})"));
+    ExpectOut({});
+    EXPECT_TRUE(
+        seams::LoggedPart("Failed to find out whether user (4004) is an administrator, zyroerr=["))
+        << seams::LogDump();
+    std::ofstream("/etc/ldap.group") << "administrators:x:1600:chief\npainters:x:1601:amy\n";
+    EXPECT_TRUE(Run(R"({"group_settings":{"1601":{"enabled":true}}})"));
+    ExpectOut({kBen, kCleo});
+}
+
+TEST_F(FilterNonAdminEntities, KeepsTheConnectionsOfThoseNobodyCanTellAbout) {
+    accounts::BindToServices("ldap");
+    std::filesystem::remove("/etc/ldap.group");
+    EXPECT_TRUE(VFSUser().FilterNonAdminEntities());
+    ExpectOut({});
+}
+
 TEST_F(DisConnDisabledConf, DamagedEntryOfAUserLetsStay) {
     EXPECT_TRUE(Run(R"({"user_settings":{"4001":7,"4002":{"enabled":"no"},"4003":null}})"));
     ExpectOut({kCleo});

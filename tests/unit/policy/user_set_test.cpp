@@ -180,6 +180,24 @@ TEST_F(Set, InputOfOtherShapesIsRefusedWhole) {
     ExpectAllKeepAll();
 }
 
+TEST_F(Set, ASettingWithoutEnabledIsRefusedAndShutsNobodyOut) {
+    Put(R"({"user_enabled_type":"custom","user_settings":{"4001":{"enabled":true}}})");
+    for (const char* element :
+         {R"({"uid":4001})", R"({"uid":4001,"enabled":null})", R"({"uid":4001,"Enabled":true})"}) {
+        ResetError();
+        EXPECT_FALSE(policy::Set(Parsed("{\"user_settings\":[" + std::string(element) + "]}")))
+            << element;
+        EXPECT_EQ(GetError(), VFS_ERR_BAD_PARAM) << element;
+        ExpectAllKeepAll();
+    }
+    ResetError();
+    EXPECT_FALSE(policy::Set<VFSGroup>(Parsed(R"({"group_settings":[{"gid":1601}]})")));
+    EXPECT_EQ(GetError(), VFS_ERR_BAD_PARAM);
+    ExpectAllKeepAll();
+    EXPECT_EQ(Stored(), Parsed(R"({"user_enabled_type":"custom",)"
+                               R"("user_settings":{"4001":{"enabled":true}}})"));
+}
+
 TEST_F(Set, RefusedSettingsLeaveTheTypeAsItWas) {
     Put(R"({"user_enabled_type":"admin"})");
     VFSUser cfg;

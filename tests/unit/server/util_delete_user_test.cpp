@@ -1,6 +1,7 @@
 #include <dlfcn.h>
 #include <gtest/gtest.h>
 #include <sys/file.h>
+#include <sys/mount.h>
 #include <zosplatform/process.h>
 
 #include <filesystem>
@@ -10,6 +11,7 @@
 #include "support/fake_location.h"
 #include "support/profiles.h"
 #include "support/seams.h"
+#include "support/xattrtree/xattrtree.h"
 #include "zyrovfs/server.h"
 
 namespace {
@@ -139,6 +141,45 @@ TEST_F(DeleteUserTest, FuseTreeThatCannotBeOpenedIsLogged) {
     EXPECT_TRUE(seams::Logged("Failed to opendir, path=/var/tmp/user/4001/gvfs"))
         << seams::LogDump();
     EXPECT_FALSE(exists(paths::RuntimeDir(kUser)));
+}
+
+TEST_F(DeleteUserTest, LiveFuseTreeWhosePidFilesAreGoneIsTakenAwayAndKeepsItsFiles) {
+    std::filesystem::remove_all(paths::FuseTree(kUser));
+    XattrTree tree(paths::FuseTree(kUser));
+    tree.Add("/nas/film", 7);
+    EXPECT_TRUE(Delete(Users({kUser}), false, true));
+    EXPECT_FALSE(exists(paths::RuntimeDir(kUser))) << seams::LogDump();
+    EXPECT_EQ(executions.back(), "/bin/rm -rf /var/tmp/user/4001") << "the mount was gone before";
+}
+
+TEST_F(DeleteUserTest, WhatIsMountedInARemovedTreeKeepsItsFiles) {
+    const std::string point = paths::RuntimeDir(kUser) + "/disk";
+    const std::string kept = std::string("/var/tmp/kept");
+    for (const bool bind : {false, true}) {
+        std::filesystem::create_directories(point);
+        profiles::PutText(kept + "/film", "seen");
+        ASSERT_EQ(bind ? mount(kept.c_str(), point.c_str(), nullptr, MS_BIND, nullptr)
+                       : mount("tmpfs", point.c_str(), "tmpfs", 0, "size=1m"),
+                  0);
+        profiles::PutText(point + "/film", "seen");
+        EXPECT_TRUE(Delete(Users({kUser}), false, true));
+        const bool there = exists(point + "/film");
+        umount2(point.c_str(), MNT_DETACH);
+        EXPECT_TRUE(there) << bind;
+        EXPECT_TRUE(seams::Logged("Failed to rm -rf /var/tmp/user/4001, errno=10"))
+            << seams::LogDump();
+    }
+}
+
+TEST_F(DeleteUserTest, FileSystemOfTheUserElsewhereInTheTreeStaysAndTheRestGoes) {
+    const XattrTree tree(paths::UserConnectDir(kUser) + "/mine");
+    EXPECT_TRUE(Delete(Users({kUser}), false, false));
+    EXPECT_FALSE(exists(kConnect));
+    EXPECT_TRUE(exists(tree.Folder()));
+    EXPECT_EQ(executions,
+              Calls{"/bin/rm -rf --one-file-system --preserve-root=all /var/tmp/zyrovfs/4001"});
+    EXPECT_TRUE(seams::LoggedPart("Failed to rm -rf /var/tmp/zyrovfs/4001, errno="))
+        << seams::LogDump();
 }
 
 TEST_F(DeleteUserTest, DeadDaemonsAreNotWokenToUnmount) {

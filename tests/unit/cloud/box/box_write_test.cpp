@@ -116,6 +116,29 @@ TEST_F(BoxCopy, ASecondConflictFails) {
     EXPECT_TRUE(seams::LoggedPart("Failed to process curl")) << seams::LogDump();
 }
 
+TEST_F(BoxCopy, ThatMeetsItsOwnNameLeavesTheFileItWasToReplace) {
+    const std::string met = amy.AddFile(target_, "a.txt", "met");
+    const std::string named = amy.AddFile(target_, "b.txt", "named");
+    EXPECT_FALSE(box->Copy("/docs/a.txt", "/target/b.txt"));
+    EXPECT_EQ(box->GetErrorCode(), VFS_ERR_CONFLICT);
+    EXPECT_EQ(amy.Bytes(met), "met");
+    EXPECT_EQ(amy.Bytes(named), "named");
+    EXPECT_EQ(service.Journal().Count("DELETE", "/"), 0U);
+}
+
+TEST_F(BoxCopy, OfANameThatEndsInAnOwnerLeavesTheFileOfTheShorterName) {
+    amy.AddPath("/docs/report - Amy Doe", "new");
+    Show("/docs/report - Amy Doe");
+    const std::string other = amy.AddFile(target_, "report", "kept");
+    amy.AddFile(target_, "report - Amy Doe", "old");
+    EXPECT_FALSE(box->Copy("/docs/report - Amy Doe", "/target/report - Amy Doe"));
+    EXPECT_EQ(box->GetErrorCode(), VFS_ERR_CONFLICT);
+    EXPECT_EQ(amy.Bytes(other), "kept");
+    EXPECT_TRUE(box->Delete("files/" + other));
+    EXPECT_TRUE(box->Copy("/docs/report - Amy Doe", "/target/report - Amy Doe"));
+    EXPECT_EQ(amy.Bytes(amy.Find("/target/report - Amy Doe")), "new");
+}
+
 TEST_F(BoxCopy, OntoAnExistingFolderIsRefused) {
     amy.AddFolder(target_, "a.txt");
     EXPECT_FALSE(box->Copy("/docs/a.txt", "/target/a.txt"));

@@ -220,5 +220,17 @@ TEST_F(DropboxService, ACursorThatTheServiceForgotEndsTheListing) {
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_BAD_REQUEST);
 }
 
+TEST_F(DropboxService, ACopyToWhereItComesFromInTheSameAccountKeepsTheFile) {
+    amy.AddPath("/a.txt", "only");
+    Json::Value profile;
+    profile["access_token"] = drive->Token().access_token;
+    Dropbox twin(profiles::kUser, profile);
+    for (const char* to : {"/a.txt", "/A.TXT"}) {
+        EXPECT_FALSE(drive->CopyFromRef("/a.txt", to, &twin)) << to;
+        EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CONFLICT);
+        EXPECT_EQ(Stored("/a.txt"), "only");
+    }
+}
+
 }  // namespace
 }  // namespace ZYROCloud

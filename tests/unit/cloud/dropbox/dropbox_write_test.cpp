@@ -140,6 +140,9 @@ TEST_F(DropboxMvcp, WhatIsInTheWayIsKeptWhenItCannotBeLookedAt) {
                 {Answer(401), VFS_ERR_UNAUTHORIZED},
                 {Answer(200, R"({"is_deleted":true})"), VFS_ERR_NOT_FOUND},
                 {Answer(200, R"({"is_dir":"what"})"), VFS_ERR_CLOUD_FAILED},
+                {Answer(200, R"({"is_dir":null})"), VFS_ERR_CLOUD_FAILED},
+                {Answer(200, "{}"), VFS_ERR_CLOUD_FAILED},
+                {Answer(200, "null"), VFS_ERR_CLOUD_FAILED},
                 {Answer(200, "[]"), VFS_ERR_CLOUD_FAILED}};
     for (const auto& row : rows) {
         Give({kConflict, row.answer});
@@ -176,6 +179,13 @@ TEST_F(DropboxMvcp, AnItemIsNotDeletedToMakeRoomForItself) {
     EXPECT_FALSE(drive->Move("/B.txt", "/b.txt"));
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CONFLICT);
     EXPECT_THAT(Requests(), ElementsAre(kMove, kLook));
+}
+
+TEST_F(DropboxMvcp, TwoSpellingsOfOneNameAreOneItem) {
+    Give({kConflict, kFile});
+    EXPECT_FALSE(drive->Move("/caf\xc3\xa9", "/CAFE\xcc\x81"));
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CONFLICT);
+    EXPECT_THAT(Requests(), SizeIs(2));
 }
 
 TEST_F(DropboxMvcp, OtherRefusalsAreTheResult) {
@@ -251,7 +261,11 @@ TEST_F(DropboxMvcp, ACopyBetweenAccountsReplacesAFileOfTheSamePath) {
     Give({Answer(200, R"({"copy_reference":"ref"})"),
           Refusal(R"({".tag":"path","path":{".tag":"conflict"}})"), kFile, Answer(200),
           Answer(200)});
-    EXPECT_TRUE(drive->CopyFromRef("/b.txt", "/b.txt", drive.get())) << seams::LogDump();
+    Json::Value profile;
+    profile["access_token"] = "canary-of-bob";
+    profile["server_id"] = "dropbox://bob@example.com";
+    Dropbox bob(profiles::kUser, profile);
+    EXPECT_TRUE(drive->CopyFromRef("/b.txt", "/b.txt", &bob)) << seams::LogDump();
     EXPECT_THAT(Requests(), ElementsAre(kGetRef, kSave, kLook, kDelete, kSave));
     EXPECT_EQ(Body(4), Body(1));
 }

@@ -78,6 +78,18 @@ TEST_F(OneDriveService, ReplacesAFileThatIsInTheWayOfACopyAndNoFolder) {
     EXPECT_EQ(Stored("/a.txt"), "new");
 }
 
+TEST_F(OneDriveService, LeavesAFileOfAnotherNameThanTheCopyHas) {
+    amy.AddPath("/a.txt", "new");
+    amy.AddPath("/docs/a.txt", "met");
+    amy.AddPath("/docs/b.txt", "named");
+    Known("/a.txt");
+    Known("/docs");
+    EXPECT_FALSE(drive->Copy("/a.txt", "/docs/b.txt"));
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CONFLICT);
+    EXPECT_EQ(Stored("/docs/a.txt"), "met");
+    EXPECT_EQ(Stored("/docs/b.txt"), "named");
+}
+
 TEST_F(OneDriveService, GivesBackWhatItWasGiven) {
     amy.AddFolder(amy.Root(), "docs");
     Known("/docs");
