@@ -91,8 +91,7 @@ void* UploadThread(void* argument) {
 
 void* DownloadThread(void* argument) {
     Side& side = *static_cast<Side*>(argument);
-    side.done =
-        Guard(*side.cloud, [&side] { return side.cloud->Download(&side.xfer, side.meta); });
+    side.done = Guard(*side.cloud, [&side] { return side.cloud->Download(&side.xfer, side.meta); });
     SlotLock lock;
     if (side.done) {
         Succeed(side);

@@ -94,12 +94,16 @@ bool Dropbox::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
             return SendToEnd(xfer, session, path);
         }
         unsigned long long offset = 0;
+        unsigned long long arrived = 0;
         SentBytes sent;
         const auto send = [&](unsigned long long length) {
-            return SendChunk(xfer, session, path, &offset, length, sent);
+            const bool done = SendChunk(xfer, session, path, &offset, length, sent);
+            arrived += sent.count;
+            return done;
         };
         const auto finish = [&] {
-            if (offset != total) {
+            // A piece that was left out for its wrong place has moved the offset alone.
+            if (offset != total || arrived != total) {
                 LOG_ERROR("upload size is not match");
                 if (GetErrorCode() == VFS_ERR_NONE) {
                     SetError(VFS_ERR_TRANSFER_ABORTED, "");
@@ -152,8 +156,8 @@ bool Dropbox::SendChunk(XferData* xfer, const std::string& session, const std::s
     plan.judge = [&](__tag_vfs_err_ code) {
         return JudgeUpload(*this, context, code == VFS_ERR_RANGE_FAILED);
     };
-    plan.rewind = [&] {
-        return SeekSource(context.fd, static_cast<off64_t>(*offset),
+    plan.rewind = [&, begin = SourceBegin(context, *offset)] {
+        return SeekSource(context.fd, begin, static_cast<off64_t>(*offset),
                           "Failed to seek file to back to last position, %m");
     };
     plan.copy = CopyError::kNever;  // StartChunkUpload has left the driver's record as it must be

@@ -306,7 +306,8 @@ TEST_F(Copies, AFirstChunkWithMoreThanTheSizeLeavesTheTargetAlone) {
         EXPECT_EQ(dst_.GetErrorCode(), VFS_ERR_TRANSFER_ABORTED);
         EXPECT_THAT(dst_.metas, IsEmpty());
     }
-    EXPECT_TRUE(seams::LoggedPart("The source has more than its size, 1 bytes")) << seams::LogDump();
+    EXPECT_TRUE(seams::LoggedPart("The source has more than its size, 1 bytes"))
+        << seams::LogDump();
 }
 
 TEST_F(Copies, BytesBehindTheSizeThatNobodyTakesAreNoSuccess) {
