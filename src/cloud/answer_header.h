@@ -8,9 +8,10 @@
 
 namespace ZYROCloud {
 
-/** Text of a header of the last answer, "" when it has none. The case of the name does not matter:
- * what stands between here and the service may change it. */
-std::string AnswerHeader(const APIHandler& api, const char* name);
+/** Text of a header of the last answer, "" when it has none; what a redirection before it said does
+ * not count. The case of the name does not matter: what stands between here and the service may
+ * change it. */
+std::string AnswerHeader(APIHandler& api, const char* name);
 
 /** HTTP status of the last request, 0 for none. */
 int AnswerStatus(const APIHandler& api);

@@ -114,8 +114,13 @@ AttemptPlan DownloadPlan(Cloud& cloud, const XferData& xfer, const std::string& 
     return plan;
 }
 
-bool SeekSource(int fd, off64_t offset, const char* text, SourceLine at) {
-    if (lseek64(fd, offset, SEEK_SET) >= 0) {
+off64_t SourceBegin(const XferContext& context, unsigned long long sent) {
+    const off64_t position = context.fd == -1 ? -1 : lseek64(context.fd, 0, SEEK_CUR);
+    return std::max<off64_t>(0, position - static_cast<off64_t>(sent));
+}
+
+bool SeekSource(int fd, off64_t begin, off64_t offset, const char* text, SourceLine at) {
+    if (lseek64(fd, begin + offset, SEEK_SET) >= 0) {
         return true;
     }
     LOG_ERROR_AT(at, text, static_cast<unsigned long long>(offset));

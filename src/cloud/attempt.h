@@ -99,8 +99,13 @@ NextStep JudgeDownload(Cloud& cloud, const XferContext& context);
  */
 AttemptPlan DownloadPlan(Cloud& cloud, const XferData& xfer, const std::string& url);
 
-/** lseek64 to `offset`; a failure logs `text`, a format that may end in "%m". */
-bool SeekSource(int fd, off64_t offset, const char* text,
+/** Where an upload of which `sent` bytes have gone out began in its source: what callers hand in
+ * may stand anywhere. 0 for what has no position. */
+off64_t SourceBegin(const XferContext& context, unsigned long long sent = 0);
+
+/** lseek64 to `offset`, that of an upload which began at `begin`; a failure logs `text`, a format
+ * that may end in "%m". */
+bool SeekSource(int fd, off64_t begin, off64_t offset, const char* text,
                 ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
 
 /**

@@ -20,7 +20,19 @@ struct Side {
     XferData xfer;
     Json::Value meta;
     pthread_t thread;
+    bool done = false;  ///< what the driver answered; its code may be one of nothing or of before
 };
+
+/** The slot's bytes that the upload has not taken. */
+size_t LeftInSlot() {
+    return transfer.slot_length - transfer.slot_offset;
+}
+
+bool RefuseLeftover(Cloud& target, size_t left) {
+    LOG_ERROR("The source has more than its size, %zu bytes were left over", left);
+    target.SetError(VFS_ERR_TRANSFER_ABORTED, "");
+    return false;
+}
 
 /** Upload: the content length must be known, so it starts when the first data is there. */
 bool WaitForData(Side& side) {
@@ -35,6 +47,10 @@ bool WaitForData(Side& side) {
         // An upload without data would replace what stands at the target by an empty file.
         side.cloud->SetError(VFS_ERR_TRANSFER_ABORTED, "");
         return false;
+    }
+    // Announced too short, the file would be cut there. It is known before anything is replaced.
+    if (LeftInSlot() > transfer.bytes_left) {
+        return RefuseLeftover(*side.cloud, LeftInSlot() - transfer.bytes_left);
     }
     // The source knows its size better than the caller.
     side.meta["total_bytes"] = static_cast<Json::UInt64>(transfer.bytes_left);
@@ -63,25 +79,24 @@ void Succeed(Side& side) {
 
 void* UploadThread(void* argument) {
     Side& side = *static_cast<Side*>(argument);
-    const bool done = Guard(*side.cloud, [&side] { return UploadAll(side); });
+    side.done = Guard(*side.cloud, [&side] { return UploadAll(side); });
     SlotLock lock;
-    if (done) {
+    if (side.done) {
         Succeed(side);
     }
-    transfer.slot_state = done ? kUploadDone : kSlotAborted;
+    transfer.slot_state = side.done ? kUploadDone : kSlotAborted;
     lock.Signal(transfer.slot_free_cond);
     return nullptr;
 }
 
 void* DownloadThread(void* argument) {
     Side& side = *static_cast<Side*>(argument);
-    const bool done =
-        Guard(*side.cloud, [&side] { return side.cloud->Download(&side.xfer, side.meta); });
+    side.done = Guard(*side.cloud, [&side] { return side.cloud->Download(&side.xfer, side.meta); });
     SlotLock lock;
-    if (done) {
+    if (side.done) {
         Succeed(side);
     }
-    if (!done) {
+    if (!side.done) {
         transfer.slot_state = kSlotAborted;
     } else if (transfer.slot_state != kSlotAborted) {  // what has failed stays so
         transfer.slot_state = kDownloadDone;
@@ -121,14 +136,24 @@ bool RunBoth(Side& source, Side& target) {
     return started;
 }
 
-/** False, reported, when the driver has an error code. */
-bool Report(const Cloud& cloud, const char* text, SourceLine at = SourceLine::Here()) {
-    const __tag_vfs_err_ code = cloud.GetErrorCode();
-    if (code == VFS_ERR_NONE) {
+/** What came in went out. With both sides at their end: until then more may come. */
+bool IsAllTaken(const Side& source, Side& target) {
+    if (source.done && target.done && LeftInSlot() != 0) {
+        target.done = RefuseLeftover(*target.cloud, LeftInSlot());
+    }
+    return source.done && target.done;
+}
+
+/** False, reported, when the side has failed. */
+bool Report(Side& side, const char* text, SourceLine at = SourceLine::Here()) {
+    if (side.done) {
         return true;
     }
-    SetPlatformErrorFromCode(code);
-    LOG_ERROR_AT(at, text, json::toString(cloud.GetError()).c_str(), YLIBCErrGet());
+    if (side.cloud->GetErrorCode() == VFS_ERR_NONE) {
+        side.cloud->SetError(VFS_ERR_CLOUD_FAILED, "");  // failed before there was a request
+    }
+    SetPlatformErrorFromCode(side.cloud->GetErrorCode());
+    LOG_ERROR_AT(at, text, json::toString(side.cloud->GetError()).c_str(), YLIBCErrGet());
     return false;
 }
 
@@ -143,8 +168,11 @@ bool CopyBoth(Cloud& src, Cloud& dst, const std::string& src_uri, const std::str
     target.meta["filesize"] = static_cast<Json::Int64>(size);
     src.GetMetaDataByURI(src_uri, source.meta, "Download");
     const SlotInUse slot;
-    return RunBoth(source, target) && Report(src, "Download Failed, err:%s, zyroerr=%x") &&
-           Report(dst, "Upload Failed, err:%s, zyroerr=%x");
+    if (!RunBoth(source, target)) {
+        return false;
+    }
+    return IsAllTaken(source, target) || (Report(source, "Download Failed, err:%s, zyroerr=%x") &&
+                                          Report(target, "Upload Failed, err:%s, zyroerr=%x"));
 }
 
 }  // namespace

@@ -129,9 +129,9 @@ AttemptPlan WholeUploadPlan(Cloud& cloud, const XferData& xfer, const std::strin
     AttemptPlan plan;
     plan.send = [&cloud, &xfer] { return SendUpload(cloud, xfer); };
     plan.judge = [&cloud, &xfer](__tag_vfs_err_) { return JudgeUpload(cloud, *xfer.context); };
-    plan.rewind = [&xfer, at] {
-        return SeekSource(xfer.context->fd, 0, "Failed to seek file to back to zero position, %m",
-                          at);
+    plan.rewind = [&xfer, at, begin = SourceBegin(*xfer.context)] {
+        return SeekSource(xfer.context->fd, begin, 0,
+                          "Failed to seek file to back to zero position, %m", at);
     };
     plan.retry = "Retry directly upload";
     plan.exhausted = kNoAttemptLeft;

@@ -76,7 +76,8 @@ bool SendUpload(Cloud& cloud, const XferData& xfer, uint64_t announced = kSizeNo
 bool IsAtEnd(const XferData& xfer);
 
 /**
- * The plan of an upload that is one request, and begins again at the source's first byte. What a
+ * The plan of an upload that is one request, and begins again where the source stands
+ * now. What a
  * service does about refusals, and its `refused` line, are the driver's to add. `xfer` and `what`,
  * the log's name for the upload, must outlive the loop.
  */

@@ -72,8 +72,8 @@ class Dropbox : public DriverOf<DropboxErrorHandler> {
     bool DirectUpload(XferData* xfer, const Json::Value& meta);
     bool ChunkedUpload(XferData* xfer, const Json::Value& meta);
     bool StartChunkUploadSession(std::string& out);
-    /** Sends `size` bytes as those from `*offset` on, which moves on, also for a place that the
-     * service refuses (VFS_ERR_RANGE_FAILED). */
+    /** Sends up to `size` bytes as those from `*offset` on, which moves on by what was sent, also
+     * for a place that the service refuses (VFS_ERR_RANGE_FAILED): then by all. */
     bool StartChunkUpload(XferData* xfer, const std::string& session, unsigned long long* offset,
                           unsigned long long size);
     bool CommitChunkUpload(const std::string& session, const std::string& path,
@@ -91,11 +91,11 @@ class Dropbox : public DriverOf<DropboxErrorHandler> {
     bool ReplaceTarget(const Change& what, const IsSource& is_source);
     bool AskCopyRef(const std::string& path, Json::Value& out);
     bool MayShareAccount(const Dropbox& other) const;
-    /** With `sent` the offset moves on by what the source had. */
+    /** The offset moves on by what the source had, told in `sent`. */
     bool SendChunk(XferData* xfer, const std::string& session, const std::string& path,
-                   unsigned long long* offset, unsigned long long size, SentBytes* sent);
+                   unsigned long long* offset, unsigned long long size, SentBytes& sent);
     bool SendAt(XferData* xfer, const std::string& session, unsigned long long* offset,
-                unsigned long long size, SentBytes* sent);
+                unsigned long long size, SentBytes& sent);
     bool SendToEnd(XferData* xfer, const std::string& session, const std::string& path);
     bool PrepareDownload(XferData* xfer, const Json::Value& meta, const std::string& path);
 };

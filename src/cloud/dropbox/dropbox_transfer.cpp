@@ -94,11 +94,16 @@ bool Dropbox::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
             return SendToEnd(xfer, session, path);
         }
         unsigned long long offset = 0;
+        unsigned long long arrived = 0;
+        SentBytes sent;
         const auto send = [&](unsigned long long length) {
-            return SendChunk(xfer, session, path, &offset, length, nullptr);
+            const bool done = SendChunk(xfer, session, path, &offset, length, sent);
+            arrived += sent.count;
+            return done;
         };
         const auto finish = [&] {
-            if (offset != total) {
+            // A piece that was left out for its wrong place has moved the offset alone.
+            if (offset != total || arrived != total) {
                 LOG_ERROR("upload size is not match");
                 if (GetErrorCode() == VFS_ERR_NONE) {
                     SetError(VFS_ERR_TRANSFER_ABORTED, "");
@@ -116,7 +121,7 @@ bool Dropbox::SendToEnd(XferData* xfer, const std::string& session, const std::s
     unsigned long long offset = 0;
     SentBytes sent;
     while (!sent.ended) {
-        if (!SendChunk(xfer, session, path, &offset, kLargestDirect, &sent)) {
+        if (!SendChunk(xfer, session, path, &offset, kLargestDirect, sent)) {
             return false;
         }
     }
@@ -144,15 +149,15 @@ bool Dropbox::StartChunkUploadSession(std::string& out) {
 }
 
 bool Dropbox::SendChunk(XferData* xfer, const std::string& session, const std::string& path,
-                        unsigned long long* offset, unsigned long long size, SentBytes* sent) {
+                        unsigned long long* offset, unsigned long long size, SentBytes& sent) {
     const XferContext& context = *xfer->context;
     AttemptPlan plan;
     plan.send = [&] { return SendAt(xfer, session, offset, size, sent); };
     plan.judge = [&](__tag_vfs_err_ code) {
         return JudgeUpload(*this, context, code == VFS_ERR_RANGE_FAILED);
     };
-    plan.rewind = [&] {
-        return SeekSource(context.fd, static_cast<off64_t>(*offset),
+    plan.rewind = [&, begin = SourceBegin(context, *offset)] {
+        return SeekSource(context.fd, begin, static_cast<off64_t>(*offset),
                           "Failed to seek file to back to last position, %m");
     };
     plan.copy = CopyError::kNever;  // StartChunkUpload has left the driver's record as it must be
@@ -165,11 +170,12 @@ bool Dropbox::SendChunk(XferData* xfer, const std::string& session, const std::s
 
 bool Dropbox::StartChunkUpload(XferData* xfer, const std::string& session,
                                unsigned long long* offset, unsigned long long size) {
-    return SendAt(xfer, session, offset, size, nullptr);
+    SentBytes sent;
+    return SendAt(xfer, session, offset, size, sent);
 }
 
 bool Dropbox::SendAt(XferData* xfer, const std::string& session, unsigned long long* offset,
-                     unsigned long long size, SentBytes* sent) {
+                     unsigned long long size, SentBytes& sent) {
     return Guard(*this, [&] {
         if (!HasSource(xfer) || offset == nullptr) {
             SetError(VFS_ERR_CLOUD_FAILED, "");
@@ -182,8 +188,8 @@ bool Dropbox::SendAt(XferData* xfer, const std::string& session, unsigned long l
         if (!PrepareUpload(*this, request, xfer)) {
             return false;
         }
-        if (SendUpload(*this, *xfer, kSizeNotKnown, sent)) {
-            *offset += sent == nullptr ? size : sent->count;
+        if (SendUpload(*this, *xfer, kSizeNotKnown, &sent)) {
+            *offset += sent.count;
             return true;
         }
         SetError(api->GetError());

@@ -166,7 +166,11 @@ namespace {
 class Session {
   public:
     Session(GDrive& drive, XferData& xfer, const std::string& uri, unsigned long long total)
-        : drive_(drive), xfer_(xfer), uri_(uri), total_(total) {}
+        : drive_(drive),
+          xfer_(xfer),
+          uri_(uri),
+          total_(total),
+          begin_(SourceBegin(*xfer.context)) {}
 
     bool Send(const std::string& url) {
         AttemptPlan plan;
@@ -224,7 +228,7 @@ class Session {
         if (total_ == kSizeNotKnown) {
             start_ = 0;  // a rest of it cannot be named
         }
-        if (SeekSource(xfer_.context->fd, static_cast<off64_t>(start_),
+        if (SeekSource(xfer_.context->fd, begin_, static_cast<off64_t>(start_),
                        "Failed to seek file to %llu, %m")) {
             return true;
         }
@@ -256,6 +260,7 @@ class Session {
     XferData& xfer_;
     const std::string& uri_;
     const unsigned long long total_;  ///< kSizeNotKnown for a source that just ends
+    const off64_t begin_;             ///< position of the file's first byte in its source
     unsigned long long start_ = 0;    ///< bytes that the service has
     bool sent_ = false;
     bool stored_ = false;

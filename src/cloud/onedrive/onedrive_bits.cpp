@@ -35,7 +35,7 @@ int64_t FileSize(const Json::Value& meta, const UploadSize& size) {
 }
 
 /** Bytes of the file that the service has, by its last answer; 0 when it does not say. */
-long long Received(const APIHandler* api) {
+long long Received(APIHandler* api) {
     int64_t received = 0;
     if (api != nullptr) {
         json::toInt64(AnswerHeader(*api, kReceived), received);
@@ -123,7 +123,12 @@ class Fragments {
   public:
     Fragments(OneDrive& drive, XferData& xfer, const std::string& url, const std::string& session,
               long long total)
-        : drive_(drive), xfer_(xfer), url_(url), session_(session), total_(total) {}
+        : drive_(drive),
+          xfer_(xfer),
+          url_(url),
+          session_(session),
+          total_(total),
+          source_begin_(SourceBegin(*xfer.context)) {}
 
     bool Send(long long length) {
         if (position_ != offset_ && !GoOn()) {
@@ -156,12 +161,24 @@ class Fragments {
         return false;
     }
 
-    bool Close() {
-        if (offset_ < total_) {
+    /** What the service has stored short: the count of fragments is that of the file, so that what
+     * is said again for one is missing at the end. Closed before, the session would be the file. */
+    bool SendRest() {
+        while (offset_ < total_) {
+            const long long before = offset_;
             LOG_ERROR("The service has %lld of %lld bytes", offset_, total_);
+            if (!Send(std::min<long long>(kMostAtOnce, total_ - offset_))) {
+                return false;
+            }
+            if (offset_ <= before) {
+                drive_.SetError(VFS_ERR_TRANSFER_ABORTED, "");
+                return false;
+            }
         }
-        return drive_.CloseUploadSession(url_, session_);
+        return true;
     }
+
+    bool Close() { return drive_.CloseUploadSession(url_, session_); }
 
   private:
     static constexpr const char* kRefused = "Chunk upload failed and do not retry";
@@ -212,7 +229,7 @@ class Fragments {
 
     bool GoBack() {
         position_ = offset_;
-        if (SeekSource(xfer_.context->fd, offset_,
+        if (SeekSource(xfer_.context->fd, source_begin_, offset_,
                        "Failed to seek file to back to last position, %m")) {
             return true;
         }
@@ -236,11 +253,12 @@ class Fragments {
     const std::string& url_;
     const std::string& session_;
     const long long total_;
-    long long offset_ = 0;    ///< bytes that the service has
-    long long begin_ = 0;     ///< of the fragment under way, in the file
-    long long end_ = 0;       ///< of the same
-    long long start_ = 0;     ///< where the last attempt began
-    long long position_ = 0;  ///< where the source stands behind the last fragment
+    const off64_t source_begin_;  ///< position of the file's first byte
+    long long offset_ = 0;        ///< bytes that the service has
+    long long begin_ = 0;         ///< of the fragment under way, in the file
+    long long end_ = 0;           ///< of the same
+    long long start_ = 0;         ///< where the last attempt began
+    long long position_ = 0;      ///< where the source stands behind the last fragment
 };
 
 }  // namespace
@@ -265,7 +283,7 @@ bool OneDrive::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
         return ForEachChunk(
             static_cast<unsigned long long>(total), kMostAtOnce,
             [&](unsigned long long length) { return file.Send(static_cast<long long>(length)); },
-            [&] { return (size.known || file.EndsHere()) && file.Close(); });
+            [&] { return file.SendRest() && (size.known || file.EndsHere()) && file.Close(); });
     });
 }
 

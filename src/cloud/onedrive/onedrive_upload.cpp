@@ -69,8 +69,8 @@ bool OneDrive::SendWhole(XferData& xfer, const Json::Value& meta, const std::str
     AttemptPlan plan = WholeUploadPlan(*this, xfer, url);
     // A new token is for the caller's next upload: this request has the old one.
     plan.judge = [&](__tag_vfs_err_ code) { return JudgeRenewing(*this, *xfer.context, code); };
-    plan.rewind = [&] {
-        return SeekSource(xfer.context->fd, 0, "Failed to seek file to zero position, %m");
+    plan.rewind = [&, begin = SourceBegin(*xfer.context)] {
+        return SeekSource(xfer.context->fd, begin, 0, "Failed to seek file to zero position, %m");
     };
     plan.refused = "Direct upload failed and do not retry";
     return RunAttempts(*this, plan) && HasTaken();

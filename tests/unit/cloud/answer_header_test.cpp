@@ -25,6 +25,25 @@ TEST(AnswerHeader, IsFoundInAnyCase) {
     EXPECT_EQ(AnswerHeader(api, "Loc"), "");
 }
 
+TEST(AnswerHeader, IsThatOfTheLastAnswerAndNotOfARedirectionBeforeIt) {
+    const wire::WireServer last(
+        {{wire::ReadRequest(), wire::Send(wire::Answer(200, "", "x-size: 7\r\n"))},
+         {wire::ReadRequest(), wire::Send(wire::Answer(200))}});
+    for (const char* text : {"7", ""}) {
+        const wire::WireServer first(
+            {{wire::ReadRequest(),
+              wire::Send(wire::Answer(302, "", "X-Size: 3\r\nLocation: " + last.Url() + "\r\n"))}});
+        APIHandler api;
+        api.SetErrorHandler(new BoxErrorHandler);
+        ASSERT_TRUE(api.Init());
+        api.SetURL(first.Url(), false);
+        ASSERT_TRUE(api.Process(0));
+        EXPECT_EQ(AnswerHeader(api, "X-Size"), text);
+        ASSERT_TRUE(api.Init());
+        EXPECT_EQ(AnswerHeader(api, "X-Size"), "") << "nothing has been asked";
+    }
+}
+
 TEST(AnswerStatus, OfTwoHundredsAloneMeansStored) {
     for (const int status : {200, 201, 204, 299, 304, 308, 400, 503}) {
         const wire::WireServer server({{wire::ReadRequest(), wire::Send(wire::Answer(status))}});

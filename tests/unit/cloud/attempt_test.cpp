@@ -119,15 +119,15 @@ TEST_F(Attempts, ASourceThatCannotSeekIsLogged) {
     ASSERT_EQ(pipe(ends), 0);
     const UniqueFd in(ends[0]);
     const UniqueFd out(ends[1]);
-    EXPECT_FALSE(SeekSource(in.Get(), 0, "Failed to seek file to back to zero position, %m"));
+    EXPECT_FALSE(SeekSource(in.Get(), 0, 0, "Failed to seek file to back to zero position, %m"));
     EXPECT_TRUE(seams::Logged("Failed to seek file to back to zero position, Illegal seek"))
         << seams::LogDump();
 }
 
 TEST_F(Attempts, ASourceIsSoughtBeyondFourGiB) {
     const UniqueFd file(memfd_create("source", 0));
-    EXPECT_TRUE(SeekSource(file.Get(), 5368709121, "%m"));
-    EXPECT_EQ(lseek64(file.Get(), 0, SEEK_CUR), 5368709121);
+    EXPECT_TRUE(SeekSource(file.Get(), 7, 5368709121, "%m"));
+    EXPECT_EQ(lseek64(file.Get(), 0, SEEK_CUR), 5368709128);
 }
 
 TEST_F(Attempts, PiecesOfAnUploadEndWithTheRest) {

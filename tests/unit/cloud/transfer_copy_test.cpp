@@ -285,6 +285,49 @@ TEST_F(Copies, ASourceThatHasLessThanItsSizeIsNoSuccess) {
     EXPECT_EQ(dst_.GetErrorCode(), VFS_ERR_TRANSFER_ABORTED);
 }
 
+TEST_F(Copies, ASideThatFailsWithoutACodeFailsTheCopyWithOne) {
+    src_.Serve("12345");
+    dst_.upload = [](XferData*, const Json::Value&) { return false; };
+    EXPECT_FALSE(Copy(5));
+    EXPECT_EQ(dst_.GetErrorCode(), VFS_ERR_CLOUD_FAILED);
+    EXPECT_EQ(YLIBCErrGet(), 0x8000U);
+    EXPECT_TRUE(seams::LoggedPart("Upload Failed, err:")) << seams::LogDump();
+    dst_.Keep();
+    src_.download = [](XferData*, const Json::Value&) { return false; };
+    EXPECT_FALSE(Copy(5));
+    EXPECT_EQ(src_.GetErrorCode(), VFS_ERR_CLOUD_FAILED);
+    EXPECT_TRUE(seams::LoggedPart("Download Failed, err:")) << seams::LogDump();
+}
+
+TEST_F(Copies, AFirstChunkWithMoreThanTheSizeLeavesTheTargetAlone) {
+    for (const long long told : {0LL, 4LL}) {
+        src_.Serve("12345");
+        EXPECT_FALSE(Copy(told));
+        EXPECT_EQ(dst_.GetErrorCode(), VFS_ERR_TRANSFER_ABORTED);
+        EXPECT_THAT(dst_.metas, IsEmpty());
+    }
+    EXPECT_TRUE(seams::LoggedPart("The source has more than its size, 1 bytes"))
+        << seams::LogDump();
+}
+
+TEST_F(Copies, BytesBehindTheSizeThatNobodyTakesAreNoSuccess) {
+    src_.Serve(Pattern(20000), 10000);
+    dst_.upload = [&](XferData* xfer, const Json::Value&) {
+        // libcurl asks for nothing behind the length that was announced.
+        for (size_t left = 15000; left > 0;) {
+            char room[15000];
+            const size_t n = xfer->callback(room, 1, left, xfer->context);
+            if (n > left) {
+                return false;
+            }
+            left -= n;
+        }
+        return true;
+    };
+    EXPECT_FALSE(Copy(15000));
+    EXPECT_EQ(dst_.GetErrorCode(), VFS_ERR_TRANSFER_ABORTED);
+}
+
 TEST_F(Copies, AnUploadThatLeavesBytesOutIsNoSuccess) {
     src_.Serve(Pattern(1000));
     dst_.upload = [](XferData*, const Json::Value&) { return true; };

@@ -143,6 +143,16 @@ TEST_F(DropboxSession, OfABusyServiceIsWaitedForAtEachStep) {
     EXPECT_TRUE(seams::Logged("Retry chunk upload: 0/6")) << seams::LogDump();
 }
 
+TEST_F(DropboxSession, OfAFileThatDoesNotStandAtItsStartRepeatsEachPieceFromItsPlaceBehindThat) {
+    Give({kStarted, Answer(503), kTaken, Answer(503), kTaken, kTaken});
+    Bytes bytes(1, "skipped" + content_);
+    lseek(bytes.file.Get(), 7, SEEK_SET);
+    EXPECT_TRUE(Upload(bytes)) << seams::LogDump();
+    EXPECT_THAT(Offsets(), ElementsAre(0, 0, kPiece, kPiece));
+    EXPECT_TRUE(All()[2].body == content_.substr(0, kPiece));
+    EXPECT_EQ(All()[4].body, "b");
+}
+
 TEST_F(DropboxSession, APieceIsTriedSixTimesInAll) {
     std::vector<std::string> answers(8, Answer(503));
     answers[0] = kStarted;
@@ -298,7 +308,7 @@ TEST_F(DropboxRange, ThatIsRefusedForAFileGoesOnBehindItAndTheSizesDoNotMatch) {
     Give({kStarted, Answer(416), kTaken, kTaken});
     EXPECT_FALSE(Upload());
     EXPECT_THAT(Requests(), ElementsAre(kStart, kAppend, kAppend, kAppend));
-    EXPECT_THAT(Offsets(), ElementsAre(0, kPiece, 2 * kPiece));
+    EXPECT_THAT(Offsets(), ElementsAre(0, kPiece, kPiece + 1));
     EXPECT_EQ(All()[2].body, "b");
     EXPECT_TRUE(seams::Logged("upload size is not match")) << seams::LogDump();
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_RANGE_FAILED);

@@ -142,6 +142,14 @@ TEST_F(DropboxUpload, IsTriedSixTimesInAll) {
         << seams::LogDump();
 }
 
+TEST_F(DropboxUpload, IsRepeatedFromWhereTheFileStood) {
+    Give({Answer(503), Answer(200)});
+    Bytes bytes(1, "not hello");
+    lseek(bytes.file.Get(), 4, SEEK_SET);
+    EXPECT_TRUE(Upload(bytes, 5)) << seams::LogDump();
+    EXPECT_EQ(All().back().body, "hello");
+}
+
 TEST_F(DropboxUpload, OfAStreamIsNotRepeated) {
     Give({Answer(503), Answer(200)});
     Bytes bytes(1, "hello");

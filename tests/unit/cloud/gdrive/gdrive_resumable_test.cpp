@@ -203,13 +203,6 @@ TEST_F(GDriveResumable, OfWhatCannotSeekEndsWithALine) {
     EXPECT_EQ(Puts(), 1U);
 }
 
-TEST_F(GDriveResumable, BeginsAtTheFirstByteOfAFileWhereverThatStands) {
-    Bytes bytes(1, content);
-    lseek(bytes.context.fd, 77, SEEK_SET);
-    EXPECT_TRUE(Upload(bytes)) << seams::LogDump();
-    EXPECT_TRUE(Stored() == content);
-}
-
 class GDriveFile : public GDriveResumable {
   protected:
     GDriveFile() : file(memfd_create("file", MFD_CLOEXEC)) {
@@ -241,6 +234,12 @@ TEST_F(GDriveFile, ThatIsShorterThanAnnouncedIsNotStored) {
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_TRANSFER_ABORTED);
     EXPECT_FALSE(amy.Exists("/a.bin"));
     EXPECT_TRUE(seams::Logged("The file ended 1 bytes before its size")) << seams::LogDump();
+}
+
+TEST_F(GDriveFile, IsStoredFromWhereItStands) {
+    lseek(file.Get(), 77, SEEK_SET);
+    EXPECT_TRUE(Upload(kDirect + 23)) << seams::LogDump();
+    EXPECT_TRUE(Stored() == whole.substr(77));
 }
 
 TEST_F(GDriveFile, ThatIsLongerThanAnnouncedIsStoredUpToThere) {

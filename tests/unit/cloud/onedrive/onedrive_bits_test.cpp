@@ -163,6 +163,13 @@ TEST_F(OneDriveBits, AFragmentThatTheServiceIsTooBusyForIsRepeatedFromWhereItSay
     EXPECT_TRUE(seams::LoggedPart("\"BITS-Received-Content-Range\":\"33554432\""));
 }
 
+TEST_F(OneDriveBits, AFileThatDoesNotStandAtItsStartIsSentFromThereThroughAllRepeats) {
+    Give({opened, Has(0, 503), Has(kFirst), Has(kFirst, 503), Has(kTotal - kMiB), ok});
+    lseek(file.Get(), kMiB, SEEK_SET);
+    EXPECT_TRUE(Upload(kTotal - kMiB)) << seams::LogDump();
+    EXPECT_TRUE(IsPart(2, kMiB, kFirst) && IsPart(4, kMiB + kFirst, 7 * kMiB));
+}
+
 TEST_F(OneDriveBits, AWrongRangeIsCuredByGoingBackToWhereTheServiceIs) {
     Give({opened, Has(kFirst), Has(kFirst - kMiB, 416), Has(kTotal - kMiB), Has(kTotal), ok});
     EXPECT_TRUE(Upload()) << seams::LogDump();
@@ -218,7 +225,6 @@ TEST_F(OneDriveBits, ARepeatFromTheStartTellsWhereTheServiceIsAndTheRestFollows)
     lseek(file.Get(), 0, SEEK_SET);
     Give({opened, Has(kFirst), Answer(500), Has(kTotal), ok});
     EXPECT_TRUE(Upload()) << seams::LogDump();
-    EXPECT_EQ(Ranges().back(), "bytes 0-8388607/41943040");
     EXPECT_FALSE(seams::LoggedPart("The service has ")) << seams::LogDump();
 }
 
@@ -239,14 +245,17 @@ TEST_F(OneDriveBits, AFragmentOnAConnectionThatDiesIsSentAgainWhole) {
     EXPECT_TRUE(BodyOf(server->Received().at(3)) == Part(0, kFirst));
 }
 
-TEST_F(OneDriveBits, AFragmentStoredShortMovesTheOffsetBackAndTheArithmeticStays) {
-    Give({opened, Has(kMiB), Has(9 * kMiB), ok});
+TEST_F(OneDriveBits, AFragmentStoredShortMovesTheOffsetBackAndTheRestFollowsBehindTheLastOne) {
+    Give({opened, Has(kMiB), Has(9 * kMiB), Has(kTotal), ok});
     EXPECT_TRUE(Upload()) << seams::LogDump();
-    EXPECT_THAT(Ranges(),
-                ElementsAre("bytes 0-33554431/41943040", "bytes 1048576-9437183/41943040"));
-    EXPECT_TRUE(IsPart(2, kMiB, 8 * kMiB));
-    EXPECT_EQ(Packets().back(), "Close-Session");
-    EXPECT_TRUE(seams::Logged("The service has 9437184 of 41943040 bytes")) << seams::LogDump();
+    EXPECT_THAT(Ranges(), ElementsAre("bytes 0-33554431/41943040", "bytes 1048576-9437183/41943040",
+                                      "bytes 9437184-41943039/41943040"));
+    EXPECT_TRUE(IsPart(3, 9 * kMiB, 31 * kMiB));
+    lseek(file.Get(), 0, SEEK_SET);
+    Give({opened, Has(kFirst), Has(kTotal - 5), Has(kTotal - 5), ok});
+    EXPECT_FALSE(Upload()) << "no nearer to the end, a session is not closed";
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_TRANSFER_ABORTED);
+    EXPECT_THAT(Packets(), ElementsAre("Create-Session", "Fragment", "Fragment", "Fragment"));
 }
 
 TEST_F(OneDriveBits, AServiceThatClaimsMoreThanItWasSentIsNotBelieved) {
@@ -343,8 +352,7 @@ TEST_F(OneDriveBits, TheResultIsThatOfCloseSession) {
     }
 }
 
-// --- streams
-// ---------------------------------------------------------------------------------------
+// --- streams -------------------------------------------------------------------------------------
 
 class OneDriveBitsStream : public OneDriveBits {
   protected:

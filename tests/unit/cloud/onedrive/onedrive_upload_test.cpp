@@ -130,6 +130,17 @@ TEST_F(OneDriveUpload, OfASourceWhoseSizeIsNotKnownGoesInChunks) {
     EXPECT_THAT(BodyOf(Request(0)), HasSubstr("01234"));
 }
 
+TEST_F(OneDriveUpload, ThatFailsIsSentAgainFromWhereTheFileStood) {
+    Give({Answer(503), Answer(201, "{}")});
+    std::string whole;
+    const UniqueFd file = PatternFile(1000, &whole);
+    lseek(file.Get(), 77, SEEK_SET);
+    EXPECT_TRUE(Cloud::UploadFile(drive.get(), std::string(kServerId) + "/docs/a", file.Get(), 923,
+                                  nullptr, nullptr, nullptr))
+        << seams::LogDump();
+    EXPECT_EQ(BodyOf(Request(1)), whole.substr(77));
+}
+
 TEST_F(OneDriveUpload, ThatFailsIsSentAgainFromByteZero) {
     Give({Answer(503), Refusal(420, "request_throttled", "Wait 10 seconds"), Answer(201, "{}")});
     EXPECT_TRUE(Upload(1000)) << seams::LogDump();
