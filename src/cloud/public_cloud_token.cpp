@@ -182,6 +182,7 @@ void PublicCloud::TakeTokenOfOthers() {
             continue;
         }
         token_ = stored.token;
+        ours_is_stored = true;
         // A new grant may have come with another client of the service.
         if (stored.profile["client_id"].isString()) {
             client_id_ = stored.profile["client_id"].asString();
@@ -192,16 +193,14 @@ void PublicCloud::TakeTokenOfOthers() {
 /**
  * What ends later is newer. What ends earlier may be, too, since a service gives what life it
  * likes: it is when all profiles have lost the token that this driver got from them. A file that
- * could not be rewritten keeps a token that this driver had before.
+ * could not be rewritten keeps a token that this driver has spent.
  */
 bool PublicCloud::IsNewer(const TokenInfo& stored, bool ours_is_stored) const {
-    if (Seconds(stored.expire_time) > Seconds(token_.expire_time)) {
-        return true;
+    if (std::find(replaced_.begin(), replaced_.end(), stored.access_token) != replaced_.end()) {
+        return false;
     }
-    const bool had =
-        stored.access_token == token_.access_token ||
-        std::find(replaced_.begin(), replaced_.end(), stored.access_token) != replaced_.end();
-    return !had && !ours_is_stored && !token_is_given_;
+    return Seconds(stored.expire_time) > Seconds(token_.expire_time) ||
+           (!ours_is_stored && !token_is_given_);
 }
 
 bool PublicCloud::AskForToken() {

@@ -81,7 +81,12 @@ PermissionDecision DecideByMembership(unsigned int uid, _VFS_USER_CONFIG_ config
     if (!groups) {
         return No(PERMISSION_NO_GROUPS);
     }
-    return IsConsulted(config) ? DecideByListedGroups(groups.get()) : No(PERMISSION_NOT_ENABLED);
+    const PermissionDecision decision =
+        IsConsulted(config) ? DecideByListedGroups(groups.get()) : No(PERMISSION_NOT_ENABLED);
+    // Of a directory that does not answer the list has no groups, and there is no other sign of it.
+    return decision.allowed || YLIBGroupIsAdminGroupMemByUid(uid, 1) >= 0
+               ? decision
+               : No(PERMISSION_NO_GROUPS);
 }
 
 PermissionDecision DecideByGroups(unsigned int uid, _VFS_USER_CONFIG_ config) {

@@ -84,11 +84,13 @@ TEST_F(StoredToken, ThatEndsEarlierIsNotTakenWhileAnotherProfileHasTheDrivers) {
 TEST_F(StoredToken, ThatWasSpentDoesNotComeBackFromAFileThatCouldNotBeRewritten) {
     TokenDriver cloud(profiles::kUser, Driven(Ago(3600)));
     EXPECT_TRUE(Renew(cloud, true)) << seams::LogDump();
-    for (const auto mode : {VFS_CONFIG_CONNECT, VFS_CONFIG_SERVER}) {
-        Store(mode, Plain(Ago(3600)));
+    for (const long long later : {0, 7200}) {
+        for (const auto mode : {VFS_CONFIG_CONNECT, VFS_CONFIG_SERVER}) {
+            Store(mode, Plain(Ago(3600 - 2 * later)));
+        }
+        EXPECT_TRUE(Renew(cloud, true)) << seams::LogDump();
+        EXPECT_EQ("new-CANARY-refresh", Spent());
     }
-    EXPECT_TRUE(Renew(cloud, true)) << seams::LogDump();
-    EXPECT_EQ("new-CANARY-refresh", Spent());
 }
 
 TEST_F(StoredToken, DoesNotTakeThePlaceOfTheOneThatACallerGave) {

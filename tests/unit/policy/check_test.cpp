@@ -62,6 +62,7 @@ TEST_F(Permission, NobodyPassesAsAnAdministratorWhileADirectoryServiceDoesNotAns
     EXPECT_EQ(Rule(kBen), PERMISSION_GROUP_ENABLED);
     Put(kUnderAdmin);
     EXPECT_FALSE(May(kCleo));
+    EXPECT_EQ(Rule(kCleo), PERMISSION_NO_GROUPS) << "a no that tells why";
 }
 
 TEST_F(Permission, AdministratorCannotBeShutOutByTheOwnEntry) {
