@@ -277,6 +277,12 @@ bool Cloud::Download(XferData* xfer, const Json::Value& meta) {
     if (!DownloadProcess(xfer, meta)) {
         return false;
     }
+    if (transfer.answer.refused) {
+        const unsigned int cause = transfer.answer.refused_for;
+        SetPlatformErr(cause);
+        SetError(cause == kPlatformCancelled ? VFS_ERR_CANCELLED : VFS_ERR_TRANSFER_ABORTED, "");
+        return false;
+    }
     if (mark.IsWiped() && LastCurlCode(api) != CURLE_OK && IsCut(transfer.answer)) {
         // A body that broke off behind a good status counts as a success for the handler; here it
         // is a part of the file.
