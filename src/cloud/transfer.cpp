@@ -35,6 +35,20 @@ constexpr __tag_vfs_err_ kFinal[] = {
     VFS_ERR_RATE_LIMITED, VFS_ERR_PERMISSION_DENIED, VFS_ERR_NOT_FOUND,
 };
 
+/**
+ * What a driver ends with becomes what a transfer ends with. A failure has a code, though some of a
+ * driver's steps set none; a success has none of its own: what the driver overcame on the way, such
+ * as a token that had ended, is no failure.
+ */
+bool Finish(Cloud& cloud, bool done, const Json::Value& before) {
+    if (done) {
+        cloud.SetError(before);
+    } else if (cloud.GetErrorCode() == VFS_ERR_NONE) {
+        cloud.SetError(VFS_ERR_CLOUD_FAILED, "");
+    }
+    return done;
+}
+
 /** A transfer's own context for `body`, which answers bool; false when there is no memory for it.
  */
 template <typename Body>
@@ -50,7 +64,8 @@ bool WithContext(Cloud* cloud, Body body, SourceLine at = SourceLine::Here()) {
                 cloud->SetError(VFS_ERR_CLOUD_FAILED, "");
                 return false;
             }
-            return body(*context);
+            const Json::Value before = cloud->GetError();
+            return Finish(*cloud, body(*context), before);
         },
         at);
 }
@@ -275,6 +290,12 @@ bool Cloud::Download(XferData* xfer, const Json::Value& meta) {
     ExpectAnswer(meta);
     const RequestMark mark(curl);
     if (!DownloadProcess(xfer, meta)) {
+        return false;
+    }
+    if (transfer.answer.refused) {
+        const unsigned int cause = transfer.answer.refused_for;
+        SetPlatformErr(cause);
+        SetError(cause == kPlatformCancelled ? VFS_ERR_CANCELLED : VFS_ERR_TRANSFER_ABORTED, "");
         return false;
     }
     if (mark.IsWiped() && LastCurlCode(api) != CURLE_OK && IsCut(transfer.answer)) {

@@ -34,6 +34,9 @@ struct Answer {
     unsigned long long length = 0;  ///< as in "len": 0 is the whole file
     unsigned long long received = 0;
     unsigned long long expected = 0;  ///< bytes of a whole answer; 0 when that is not known
+    /** A chunk of the size that means failure has failed, which libcurl cannot see, ... */
+    bool refused = false;
+    unsigned int refused_for = 0;  ///< ... and the platform error of that moment
 };
 
 struct TransferGlobals {
@@ -99,6 +102,8 @@ bool IsStopAsked();
  * log line in the name of `at`. */
 ssize_t ReadSource(int fd, char* data, size_t size,
                    ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
+/** What a write function returns for a chunk of `size` bytes that it does not take. */
+size_t RefuseChunk(size_t size);
 /** Asks the speed callback, if there is one, how much to take at once behind this chunk. */
 void LimitReceiving(size_t chunk, unsigned long long done, void* curl);
 /** False, logged, when an answer is another part of the file than was asked for. For its first

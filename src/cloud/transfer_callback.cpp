@@ -158,15 +158,15 @@ bool Keep(XferContext& context, const char* data, size_t size) {
 
 size_t ReceivePiece(XferContext& context, const char* data, size_t size) {
     context.can_retry = false;
-    if (IsStopAsked()) {
-        return kWriteFailed;
+    if (transfer.answer.refused || IsStopAsked()) {
+        return RefuseChunk(size);
     }
     if (transfer.answer.received == 0 && !BeginsWhereAsked(context.curl)) {
-        return kWriteFailed;
+        return RefuseChunk(size);
     }
     LimitReceiving(size, Done(), context.curl);
     if (!Keep(context, data, size)) {
-        return kWriteFailed;
+        return RefuseChunk(size);
     }
     transfer.answer.received += size;
     transfer.bytes_left -= size;
@@ -251,6 +251,15 @@ ssize_t ReadSource(int fd, char* data, size_t size, SourceLine at) {
     return n;
 }
 
+size_t RefuseChunk(size_t size) {
+    if (size == kWriteFailed && !transfer.answer.refused) {
+        // The transfer goes on, and would end as a success with this chunk missing.
+        transfer.answer.refused = true;
+        transfer.answer.refused_for = YLIBCErrGet();
+    }
+    return kWriteFailed;
+}
+
 void LimitReceiving(size_t chunk, unsigned long long done, void* curl) {
     if (transfer.speed_cb == nullptr) {
         return;
@@ -271,7 +280,7 @@ size_t FileReadCallback(char* data, size_t size, size_t count, void* context) {
 
 size_t FileWriteCallback(char* data, size_t size, size_t count, void* context) {
     return context == nullptr
-               ? kWriteFailed
+               ? RefuseChunk(size * count)
                : ReceivePiece(*static_cast<XferContext*>(context), data, size * count);
 }
 

@@ -45,11 +45,11 @@ bool GrowSlot(size_t size) {
 
 // --- download side -------------------------------------------------------------------------------
 
-size_t FailWrite() {
+size_t FailWrite(size_t size) {
     SlotLock lock;
     transfer.slot_state = kSlotAborted;
     lock.Signal(transfer.slot_full_cond);
-    return kWriteFailed;
+    return RefuseChunk(size);
 }
 
 /** The service tells the size that the upload has to announce. */
@@ -279,15 +279,15 @@ size_t CopyWriteCallback(char* data, size_t size, size_t count, void* opaque) {
     const size_t n = size * count;
     auto* context = static_cast<XferContext*>(opaque);
     if (context == nullptr) {
-        return FailWrite();
+        return FailWrite(n);
     }
     context->can_retry = false;
     if (transfer.first_write && !BeginsWhereAsked(context->curl)) {
-        return FailWrite();
+        return FailWrite(n);
     }
     TakeLength(context->curl);
     if (IsStopAsked() || data == nullptr) {
-        return FailWrite();
+        return FailWrite(n);
     }
     unsigned long long done = 0;
     const Room room = WaitForRoom(n, deadline, done);
@@ -295,11 +295,11 @@ size_t CopyWriteCallback(char* data, size_t size, size_t count, void* opaque) {
         return 0;
     }
     if (room == kNoRoom || IsStopAsked()) {
-        return FailWrite();
+        return FailWrite(n);
     }
     LimitReceiving(n, done, context->curl);
     if (!Put(data, n, deadline)) {
-        return FailWrite();
+        return FailWrite(n);
     }
     transfer.answer.received += n;
     return n;

@@ -63,6 +63,16 @@ int NumberOf(const Json::Value& record, const char* key, int otherwise) {
     return member.isInt() ? member.asInt() : otherwise;
 }
 
+/** What libcurl's result says, before a status is asked. */
+struct Failure {
+    unsigned int platform;
+    __tag_vfs_err_ code;
+};
+
+bool IsRedirection(int status) {
+    return status / 100 == 3;
+}
+
 /** A callback of ours ended the transfer; the platform error tells whether a user wanted that. */
 __tag_vfs_err_ AbortCode() {
     return YLIBCErrGet() == kPlatformCancelled ? VFS_ERR_CANCELLED : VFS_ERR_TRANSFER_ABORTED;
@@ -114,7 +124,15 @@ bool ErrorHandler::ParseError(const Json::Value& record, bool return_on_error) {
         success = true;
     } else if (!Holds(kStatusIsNotAsked, code) && response_code != 0) {
         // The status replaces what libcurl said: a body cut short behind a 200 is a success.
+        const Failure cause = {YLIBCErrGet(), code};
         success = ParseError(response_code, &code);
+        if (success && cause.code != VFS_ERR_NONE && IsRedirection(response_code)) {
+            // It led to where nobody did what was asked for: to another scheme, in a circle, to a
+            // server that is not trusted.
+            success = false;
+            code = cause.code;
+            SetPlatformErr(cause.platform);
+        }
     }
     record_["code"] = code;
     return success;

@@ -47,12 +47,15 @@ bool ReadOwnedByRoot(Json::Value& value, const std::string& path) {
     return json::fromFile(value, folder, place.name);
 }
 
-/** By the caller's identity, and by descriptor. */
+/** As root, like the write before it: the change has landed, and a caller with the identity of a
+ * user must not be told that it has not. By descriptor. */
 bool SetMode(mode_t mode) {
+    const RootUntilRestored root;
     const EntryPath place = SplitPath(paths::kPolicyFile);
     const OwnedFolder folder = OwnedFolder::Open(place.folder, 0);
     const UniqueFd fd = folder.OpenFile(place.name, O_RDONLY);
-    return fd && fchmod(fd.Get(), mode) == 0;
+    const bool set = fd && fchmod(fd.Get(), mode) == 0;
+    return Restore(root) && set;
 }
 
 /** Below /tmp everybody can make such a file: only root's tells of an update. */

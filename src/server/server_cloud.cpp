@@ -86,7 +86,9 @@ bool CloudServer::AskService(const CloudAccountRules& rules, unsigned int uid, J
         // Without a driver there is no record either.
         const int code =
             error.isObject() ? error.get("code", VFS_ERR_NONE).asInt() : VFS_ERR_FAILED;
-        return Fail(static_cast<__tag_vfs_err_>(code), rules.at);
+        // An answer that came, but does not tell whose account it is, leaves no code.
+        return Fail(code == VFS_ERR_NONE ? VFS_ERR_CLOUD_FAILED : static_cast<__tag_vfs_err_>(code),
+                    rules.at);
     }
     return NoThrow(
         VFS_ERR_CLOUD_FAILED,

@@ -279,6 +279,22 @@ TEST_F(Copies, ASourceThatHasMoreThanItsSizeIsNoSuccess) {
     EXPECT_FALSE(Copy(50000));
 }
 
+TEST_F(Copies, TwentyThreeBytesBehindTheSizeAreNoSuccessEither) {
+    src_.download = [&](XferData* xfer, const Json::Value&) {
+        Feed(src_, xfer, Pattern(100));
+        while (transfer.slot_state != kUploadDone) {
+            std::this_thread::yield();
+        }
+        return Feed(src_, xfer, Pattern(23));  // which libcurl takes for taken
+    };
+    dst_.upload = [](XferData* xfer, const Json::Value&) {
+        char room[100];
+        return xfer->callback(room, 1, sizeof room, xfer->context) == sizeof room;
+    };
+    EXPECT_FALSE(Copy(100));
+    EXPECT_EQ(src_.GetErrorCode(), VFS_ERR_TRANSFER_ABORTED);
+}
+
 TEST_F(Copies, ASourceThatHasLessThanItsSizeIsNoSuccess) {
     src_.Serve(Pattern(50000));
     EXPECT_FALSE(Copy(100000));

@@ -1,6 +1,7 @@
 #include "cloud/transfer.h"
 
 #include <fcntl.h>
+#include <sys/mman.h>
 #include <unistd.h>
 
 #include "core/handle.h"
@@ -75,6 +76,23 @@ TEST_F(Transfers, AnUploadThatTheDriverFailsIsNotRepeated) {
     EXPECT_FALSE(Upload(Open("source").Get(), 3));
     EXPECT_EQ(driver_.metas.size(), 1U);
     EXPECT_EQ(Cloud::GetUploadErrorCode(&driver_), -11);
+}
+
+TEST_F(Transfers, AFailureHasACodeAndASuccessNoneOfItsOwn) {
+    for (const bool works : {false, true}) {
+        FakeDriver driver;
+        driver.upload = driver.download = [&](XferData*, const Json::Value&) {
+            driver.SetError(works ? VFS_ERR_UNAUTHORIZED : VFS_ERR_NONE, "");
+            return works;
+        };
+        const __tag_vfs_err_ code = works ? VFS_ERR_NONE : VFS_ERR_CLOUD_FAILED;
+        const UniqueFd fd(memfd_create("file", MFD_CLOEXEC));
+        EXPECT_EQ(Cloud::UploadFile(&driver, "u", fd.Get(), 0, nullptr, nullptr, nullptr), works);
+        EXPECT_EQ(driver.GetErrorCode(), code);
+        driver.SetError(VFS_ERR_NONE, "");
+        EXPECT_EQ(Cloud::DownloadFile(&driver, "u", fd.Get(), 9, nullptr, nullptr, nullptr), works);
+        EXPECT_EQ(driver.GetErrorCode(), code);
+    }
 }
 
 TEST_F(Transfers, AnUploadOfMoreThanTwoGiBTellsItsSizeInFull) {

@@ -245,9 +245,37 @@ TEST_F(Wires, AFullDiskEndsADownloadWithWhatFitsInPlace) {
     EXPECT_EQ(umount(Path("disk").c_str()), 0);
 }
 
+TEST_F(Wires, AChunkOfAnySizeThatTheDiskDoesNotTakeIsNoSuccess) {
+    for (const size_t size : {22, 23, 24}) {
+        const WireServer server({{ReadRequest(), Send(Answer(200, std::string(size, 'x')))}});
+        WireDriver driver;
+        const UniqueFd full(open("/dev/full", O_WRONLY | O_CLOEXEC));
+        EXPECT_FALSE(Cloud::DownloadFile(&driver, server.Url(), full.Get(),
+                                         static_cast<long long>(size), nullptr, nullptr, nullptr))
+            << size;
+        EXPECT_EQ(driver.GetErrorCode(), VFS_ERR_TRANSFER_ABORTED) << size;
+        EXPECT_EQ(YLIBCErrGet(), 0x2900U) << size;
+    }
+}
+
 int cancel_in = 0;
 int CancelLater() {
     return --cancel_in < 0 ? 1 : 0;
+}
+
+TEST_F(Wires, ACancelAtAChunkOfAnySizeIsOne) {
+    for (const size_t size : {22, 23, 24}) {
+        const WireServer server({{ReadRequest(), Send(Answer(200, std::string(size, 'x')))}});
+        WireDriver driver;
+        const UniqueFd fd = Open("target");
+        cancel_in = 0;
+        EXPECT_FALSE(Cloud::DownloadFile(&driver, server.Url(), fd.Get(),
+                                         static_cast<long long>(size), nullptr, CancelLater,
+                                         nullptr))
+            << size;
+        EXPECT_EQ(driver.GetErrorCode(), VFS_ERR_CANCELLED) << size;
+        EXPECT_EQ(Target(), "") << size;
+    }
 }
 
 TEST_F(Wires, ACancelEndsADownloadAndAnUploadAsCancelled) {

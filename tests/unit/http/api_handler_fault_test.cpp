@@ -310,7 +310,7 @@ TEST_F(Fault, RedirectsInACircleEnd) {
     }
     const wire::WireServer server({script});
     Conversation<> talk;
-    talk.Get(server.Url(), 6);
+    EXPECT_FALSE(talk.Get(server.Url(), 6));
     EXPECT_EQ(talk.Curl(), 47);
     EXPECT_EQ(server.Received().size(), 31U);
     EXPECT_THAT(seams::Sleeps(), IsEmpty());
@@ -321,7 +321,7 @@ TEST_F(Fault, ARedirectLeadsNowhereButToAnotherWebServer) {
                                "gopher://127.0.0.1/x"}) {
         const wire::WireServer server({Once(MovedTo(target))});
         Conversation<> talk;
-        talk.Get(server.Url());
+        EXPECT_FALSE(talk.Get(server.Url())) << target;
         EXPECT_EQ(talk.Curl(), 1) << target;
         EXPECT_THAT(talk.api.GetResponse(), Not(HasSubstr("root:"))) << target;
     }

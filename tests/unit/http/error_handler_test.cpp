@@ -119,6 +119,24 @@ TEST(ErrorHandler, OnlyConnectTimeoutAbortAndCancelKeepTheirCodeBeforeAStatus) {
     EXPECT_EQ(Judge(errors, 9, 404).code, VFS_ERR_NOT_FOUND);
 }
 
+TEST(ErrorHandler, ACurlFailureBehindARedirectionIsNoSuccess) {
+    for (const int curl : {1, 18, 47, 52, 60}) {
+        for (const int status : {301, 302, 307, 308}) {
+            for (const bool return_on_error : {true, false}) {
+                BoxErrorHandler box;
+                EXPECT_EQ(Judge(box, curl, status, "", return_on_error),
+                          (Outcome{false, VFS_ERR_UNKNOWN, 0x8100}))
+                    << curl << " " << status;
+            }
+        }
+        DavErrorHandler dav;
+        EXPECT_EQ(Judge(dav, curl, 204), (Outcome{true, VFS_ERR_NONE, 0})) << curl;
+    }
+    GDriveErrorHandler drive;
+    EXPECT_EQ(Judge(drive, 56, 308), (Outcome{false, VFS_ERR_RECEIVE_FAILED, 0x8100}));
+    EXPECT_EQ(Judge(drive, 0, 308, "", false), (Outcome{true, VFS_ERR_NONE, 0}));
+}
+
 TEST(ErrorHandler, ACleanResultIsASuccessWhateverTheStatusWhenCurlFailsStatuses) {
     BoxErrorHandler errors;
     EXPECT_EQ(Judge(errors, 0, 500, "", true), (Outcome{true, VFS_ERR_NONE, 0}));

@@ -109,6 +109,7 @@ TEST_P(CloudAccounts, AnAnswerWithoutTheAccountIsRefusedWhereItIsNeeded) {
     const bool needed = std::string(GetParam().protocol) != "dropbox";
     EXPECT_EQ(Ask(service), !needed);
     EXPECT_EQ(seams::LoggedPart("GetAccountInfo failed, "), needed) << seams::LogDump();
+    EXPECT_EQ(GetError() == VFS_ERR_CLOUD_FAILED, needed);
 }
 
 TEST_P(CloudAccounts, ARefusalOfTheServiceReachesTheCellAndTheLog) {
