@@ -118,6 +118,7 @@ bool Request::Describe(APIHandler& api) {
 
 bool Request::Process() {
     APIHandler* api = cloud_.GetAPIHandler();
+    before_ = cloud_.GetError();
     if (rules_.renews_token ? cloud_.DoAPIRequest(retries_) : api->Process(retries_)) {
         return true;
     }
@@ -127,7 +128,15 @@ bool Request::Process() {
 
 bool Request::Refused() {
     if (way_out_ && cloud_.GetErrorCode() == spared_) {
-        return way_out_();
+        if (!way_out_()) {
+            return false;
+        }
+        // What was got round is no failure of the whole. That an item was gone stays for callers to
+        // read.
+        if (spared_ == VFS_ERR_CONFLICT) {
+            cloud_.SetError(before_);
+        }
+        return true;
     }
     LOG_ERROR_AT(at_, "Failed to process curl %s, err:%s", url_.c_str(),
                  json::toString(cloud_.GetError()).c_str());

@@ -89,6 +89,7 @@ class Request {
     Json::Value headers_, query_, body_;
     bool has_body_ = false;
     __tag_vfs_err_ spared_ = ZYROVFS::VFS_ERR_NONE;
+    Json::Value before_;  ///< the driver's record in front of the request
     std::function<bool()> way_out_;
     const char* bad_answer_ = nullptr;
 };
