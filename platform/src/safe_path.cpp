@@ -32,19 +32,6 @@ Fd Enter(int parent, const char* name) {
     return dir;
 }
 
-Fd OpenRegularAt(int dir, const std::string& name, int flags) {
-    Fd fd(openat(dir, name.c_str(), flags | kNoTrap));
-    struct stat info {};
-    if (!fd || fstat(fd.Get(), &info) != 0) {
-        return Fd();
-    }
-    if (!S_ISREG(info.st_mode)) {
-        errno = S_ISDIR(info.st_mode) ? EISDIR : ENXIO;
-        return Fd();
-    }
-    return fd;
-}
-
 /** Root's own, with no more rights for others than `mode` gives. */
 bool Claim(int dir, mode_t mode) {
     struct stat info {};
@@ -113,7 +100,7 @@ Fd OpenOrMake(const std::string& path, int flags, mode_t mode) {
     std::string name;
     const Fd dir = path.empty() ? Fd() : OpenFolderOf(path, name);
     for (int race = 0; dir && race < kMostRaces; ++race) {
-        Fd fd = OpenRegularAt(dir.Get(), name, flags);
+        Fd fd = OpenRegular(dir.Get(), name, flags | O_NOFOLLOW);
         if (fd || errno != ENOENT) {
             return fd;
         }

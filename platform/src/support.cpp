@@ -45,7 +45,7 @@ unsigned int CodeOfErrno(int error, unsigned int otherwise) {
 }
 
 Fd OpenRegular(int dir, const std::string& path, int flags) {
-    Fd fd(openat(dir, path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY | flags));
+    Fd fd(openat(dir, path.c_str(), O_CLOEXEC | O_NONBLOCK | O_NOCTTY | flags));
     struct stat info {};
     if (!fd || fstat(fd.Get(), &info) != 0) {
         return Fd();

@@ -61,8 +61,9 @@ Result OrOutOfMemory(Result failure, Body body) noexcept {
 unsigned int CodeOfErrno(int error, unsigned int otherwise);
 
 /**
- * Opens a file for reading that has to be a regular one: a FIFO is not waited for. With `dir`
- * AT_FDCWD `path` stands for itself. `flags` adds to O_RDONLY. Without a file errno tells why.
+ * Opens a file that has to be a regular one: a FIFO is not waited for. With `dir` AT_FDCWD `path`
+ * stands for itself. `flags` 0 is for reading, no link followed with O_NOFOLLOW. Without a file
+ * errno tells why.
  */
 Fd OpenRegular(int dir, const std::string& path, int flags);
 
