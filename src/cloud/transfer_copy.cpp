@@ -71,9 +71,9 @@ bool UploadAll(Side& side) {
 }
 
 /** Behind what went through: a failure that the driver overcame by itself, such as a name in the
- * way or a token that had ended, is no failure of the copy. */
+ * way or a token that had ended, is no failure of the copy. The platform's error is the process's:
+ * the other side may just have stored a cancel there. */
 void Succeed(Side& side) {
-    SetPlatformErr(0);
     side.cloud->SetError(VFS_ERR_NONE, "");
 }
 
@@ -171,8 +171,12 @@ bool CopyBoth(Cloud& src, Cloud& dst, const std::string& src_uri, const std::str
     if (!RunBoth(source, target)) {
         return false;
     }
-    return IsAllTaken(source, target) || (Report(source, "Download Failed, err:%s, zyroerr=%x") &&
-                                          Report(target, "Upload Failed, err:%s, zyroerr=%x"));
+    if (IsAllTaken(source, target)) {
+        SetPlatformErr(0);
+        return true;
+    }
+    return Report(source, "Download Failed, err:%s, zyroerr=%x") &&
+           Report(target, "Upload Failed, err:%s, zyroerr=%x");
 }
 
 }  // namespace
