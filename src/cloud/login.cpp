@@ -44,8 +44,8 @@ struct Service {
 constexpr Service kServices[] = {
     {"box", BoxAccountHost, "/api/oauth2/authorize", BoxApiHost, "/oauth2/token", "", "", false,
      true, New<BoxErrorHandler>},
-    {"dropbox", DropboxWebHost, "/oauth2/authorize", DropboxApiHost, "/oauth2/token", "", "",
-     false, false, New<DropboxErrorHandler>},
+    {"dropbox", DropboxWebHost, "/oauth2/authorize", DropboxApiHost, "/oauth2/token", "", "", false,
+     false, New<DropboxErrorHandler>},
     // A second login gives a refresh token only if the person is asked once more.
     {"google", GoogleAccountsHost, "/o/oauth2/v2/auth", GoogleAccountsHost, "/o/oauth2/token",
      "https://www.googleapis.com/auth/drive", "&access_type=offline&prompt=consent", false, true,
@@ -72,7 +72,7 @@ bool ChooseClient(const Service& service, const std::string& wanted, std::string
         return false;
     }
     const Json::Value& ids = clients[service.name];
-    client = !wanted.empty()       ? wanted
+    client = !wanted.empty()        ? wanted
              : service.fixed_client ? FixedClientId(service.name)
              : ids.size() == 1      ? ids[0].asString()
                                     : "";
@@ -179,8 +179,8 @@ bool ReadTokens(const Service& service, const std::string& client, const std::st
     Json::Value answer;
     int64_t life = 0;
     if (!json::fromString(answer, text) || Text(answer, "access_token").empty() ||
-        (service.expires && (Text(answer, "refresh_token").empty() ||
-                             !json::toInt64(answer["expires_in"], life)))) {
+        (service.expires &&
+         (Text(answer, "refresh_token").empty() || !json::toInt64(answer["expires_in"], life)))) {
         LOG_ERROR("An answer without tokens, %s", WithoutTokens(text).c_str());
         return Fail(VFS_ERR_CLOUD_FAILED);
     }
@@ -246,9 +246,8 @@ bool FinishLogin(const Login& login, const std::string& answer, Json::Value& pro
             return false;
         }
         // A code is good for one request.
-        return api->Process(0)
-                   ? ReadTokens(*service, login.client_id, api->GetResponse(), profile)
-                   : RefusedBy(*api, refusal);
+        return api->Process(0) ? ReadTokens(*service, login.client_id, api->GetResponse(), profile)
+                               : RefusedBy(*api, refusal);
     });
 }
 

@@ -34,7 +34,8 @@ class LoginCommand {
         // With both ends open here, neither side waits for the other.
         input_ = open("/tmp/login.in", O_RDWR | O_CLOEXEC);
         Must("{ " + kTool + " login " + arguments +
-             " --user amy </tmp/login.in >/tmp/login.out 2>&1; echo $? >/tmp/login.code; } >/dev/null 2>&1 &");
+             " --user amy </tmp/login.in >/tmp/login.out 2>&1; echo $? >/tmp/login.code; } "
+             ">/dev/null 2>&1 &");
     }
     LoginCommand(const LoginCommand&) = delete;
     LoginCommand& operator=(const LoginCommand&) = delete;
@@ -83,9 +84,7 @@ class ToolLogin : public testing::TestWithParam<const char*> {
         Must(kTool + " profile delete " + place_->Id() + " --user amy");
     }
     std::string Service() const { return GetParam(); }
-    bool HasProfile() const {
-        return ForAmy("profile show " + place_->Id()).status == 0;
-    }
+    bool HasProfile() const { return ForAmy("profile show " + place_->Id()).status == 0; }
 
     Place* place_ = nullptr;
 };
@@ -208,9 +207,10 @@ TEST(ToolLoginAlone, AnInputThatEndsIsNoAnswer) {
 }
 
 TEST(ToolLoginAlone, JsonKeepsTheAddressOutOfTheDocument) {
-    const Outcome outcome = machine::Run(kTool +
-                                " login box --json --port 0 --timeout 1 --user amy </dev/null "
-                                "2>/tmp/login.err");
+    const Outcome outcome =
+        machine::Run(kTool +
+                     " login box --json --port 0 --timeout 1 --user amy </dev/null "
+                     "2>/tmp/login.err");
     EXPECT_EQ(outcome.status, 1);
     EXPECT_EQ(outcome.output[0], '{') << outcome.output;
     EXPECT_THAT(Read("/tmp/login.err"), HasSubstr("/api/oauth2/authorize?"));

@@ -48,8 +48,8 @@ int ReportNoClient(const LoginOptions& options, bool json) {
 
 int ReportRefusal(const LoginOptions& options, const Utils::LoginRefusal& refusal, bool json) {
     if (GetError() == VFS_ERR_ACCESS_DENIED) {
-        return ReportProblem("The request was refused on the page of the service. Nothing was saved.",
-                             json);
+        return ReportProblem(
+            "The request was refused on the page of the service. Nothing was saved.", json);
     }
     if (refusal.error.empty()) {
         return ReportFailure("login " + options.service, json);
@@ -125,9 +125,8 @@ int Save(const LoginOptions& options, unsigned int uid, Json::Value profile, boo
     if (!json) {
         Say("Signed in as " + Printable(account.name) + " <" + Printable(account.email) + ">.");
     }
-    const int status = options.again.empty()
-                           ? AddEntry(kProfile, uid, "", profile, false, json)
-                           : Renew(options, uid, account.email, profile, json);
+    const int status = options.again.empty() ? AddEntry(kProfile, uid, "", profile, false, json)
+                                             : Renew(options, uid, account.email, profile, json);
     if (status == kSuccess && !json) {
         Say("Next: zyrovfs account " + Printable(options.service + "://" + account.email) +
             " --uid " + std::to_string(uid));
@@ -166,14 +165,14 @@ int LogIn(const LoginOptions& options, unsigned int uid, bool json) {
 
 void AddLoginCommand(CLI::App& app, Session& session) {
     const auto options = std::make_shared<LoginOptions>();
-    CLI::App* command = AddUserCommand(
-        app, session, "login", "Sign in at a cloud with a browser, and save the account",
-        [=, &session](unsigned int uid) {
-            Cloud::InitCurlGlobal();
-            const int status = LogIn(*options, uid, session.json);
-            Cloud::CleanupCurlGlobal();
-            return status;
-        });
+    CLI::App* command = AddUserCommand(app, session, "login",
+                                       "Sign in at a cloud with a browser, and save the account",
+                                       [=, &session](unsigned int uid) {
+                                           Cloud::InitCurlGlobal();
+                                           const int status = LogIn(*options, uid, session.json);
+                                           Cloud::CleanupCurlGlobal();
+                                           return status;
+                                       });
     command->add_option("SERVICE", options->service, "box, dropbox, google or onedrive")
         ->required()
         ->check(CLI::IsMember({"box", "dropbox", "google", "onedrive"}));

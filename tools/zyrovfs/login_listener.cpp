@@ -13,7 +13,8 @@ constexpr const char* kArrived =
     "<!DOCTYPE html><meta charset=utf-8><title>Signed in</title><p>The answer has arrived. Close "
     "this page, and go on where you began.";
 constexpr const char* kForeign =
-    "<!DOCTYPE html><meta charset=utf-8><title>Not this one</title><p>This is not the answer to the "
+    "<!DOCTYPE html><meta charset=utf-8><title>Not this one</title><p>This is not the answer to "
+    "the "
     "login that is waiting. Begin again from the address that the command has shown.";
 /** No address of a service is longer. */
 constexpr size_t kLongestLine = 16384;

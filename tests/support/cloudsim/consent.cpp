@@ -11,10 +11,17 @@ std::string Escaped(const std::string& text) {
     std::string out;
     for (const char c : text) {
         switch (c) {
-            case '&': out += "&amp;"; break;
-            case '<': out += "&lt;"; break;
-            case '"': out += "&quot;"; break;
-            default: out += c;
+            case '&':
+                out += "&amp;";
+                break;
+            case '<':
+                out += "&lt;";
+                break;
+            case '"':
+                out += "&quot;";
+                break;
+            default:
+                out += c;
         }
     }
     return out;
@@ -51,12 +58,12 @@ ConsentRequest::ConsentRequest(const Request& request)
       scope(request.Query("scope")) {}
 
 std::string ConsentRequest::Problem(const TokenStore& tokens) const {
-    return !tokens.IsClientId(client)                ? "unknown client_id"
-           : !IsLoopback(redirect_uri)               ? "redirect_uri is not registered"
-           : response_type != "code"                 ? "unsupported response_type"
-           : !challenge.empty() && method != "S256"  ? "unsupported code_challenge_method"
+    return !tokens.IsClientId(client)                     ? "unknown client_id"
+           : !IsLoopback(redirect_uri)                    ? "redirect_uri is not registered"
+           : response_type != "code"                      ? "unsupported response_type"
+           : !challenge.empty() && method != "S256"       ? "unsupported code_challenge_method"
            : !challenge.empty() && challenge.size() != 43 ? "wrong code_challenge"
-                                                     : "";
+                                                          : "";
 }
 
 std::string ConsentRequest::Back(const Headers& parameters) const {

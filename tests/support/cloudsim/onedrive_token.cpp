@@ -42,8 +42,8 @@ Reply OneDrive::Token(const std::string& text) {
     Tokens tokens;
     if (grant == "authorization_code" ? !TakeCode(form, client, tokens)
                                       : !tokens_.Refresh(form.Query(needed), client, tokens)) {
-        return TokenError("invalid_grant", "The provided value for the input parameter '" +
-                                               needed + "' is not valid.");
+        return TokenError("invalid_grant", "The provided value for the input parameter '" + needed +
+                                               "' is not valid.");
     }
     Json::Value body;
     body["token_type"] = "bearer";

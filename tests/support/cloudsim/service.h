@@ -79,9 +79,9 @@ class Service {
     std::unique_ptr<Handler> Consent(const Request& request);
     /** The end of such a login at the token endpoint. */
     bool TakeCode(const Request& form, const std::string& client, Tokens& tokens) {
-        return tokens_.Exchange(
-            form.Query("code"),
-            {client, form.Query("redirect_uri"), form.Query("code_verifier")}, tokens);
+        return tokens_.Exchange(form.Query("code"),
+                                {client, form.Query("redirect_uri"), form.Query("code_verifier")},
+                                tokens);
     }
 
     const ServerOptions options_;

@@ -45,16 +45,14 @@ Simulated Make(const std::string& name, std::string (Service::*page)() const, co
 
 Simulated MakeService(const std::string& name) {
     using namespace cloudsim;
-    return name == "box" ? Make<BoxService>(name, &BoxService::AccountHost, "BoxAccountHost",
+    return name == "box"       ? Make<BoxService>(name, &BoxService::AccountHost, "BoxAccountHost",
                                             &BoxService::ApiHost, "BoxApiHost")
-           : name == "dropbox"
-               ? Make<Dropbox>(name, &Dropbox::WebHost, "DropboxWebHost", &Dropbox::ApiHost,
-                               "DropboxApiHost")
-           : name == "google"
-               ? Make<GDrive>(name, &GDrive::AccountsHost, "GoogleAccountsHost",
-                              &GDrive::AccountsHost, "GoogleAccountsHost")
-               : Make<OneDrive>(name, &OneDrive::LoginHost, "LiveLoginHost", &OneDrive::LoginHost,
-                                "LiveLoginHost");
+           : name == "dropbox" ? Make<Dropbox>(name, &Dropbox::WebHost, "DropboxWebHost",
+                                               &Dropbox::ApiHost, "DropboxApiHost")
+           : name == "google"  ? Make<GDrive>(name, &GDrive::AccountsHost, "GoogleAccountsHost",
+                                             &GDrive::AccountsHost, "GoogleAccountsHost")
+                               : Make<OneDrive>(name, &OneDrive::LoginHost, "LiveLoginHost",
+                                               &OneDrive::LoginHost, "LiveLoginHost");
 }
 
 class LoginAt : public profiles::ProfileTest, public testing::WithParamInterface<const char*> {
@@ -83,8 +81,8 @@ class LoginAt : public profiles::ProfileTest, public testing::WithParamInterface
     /** Where the service sends the browser of a person who presses this button. */
     std::string Press(const std::string& decision) {
         EXPECT_THAT(browser_.Get(login_.address).body, HasSubstr("<option>amy@example.com"));
-        const cloudsim::Got got = browser_.Send(
-            "POST", login_.address, "account=amy%40example.com&decision=" + decision);
+        const cloudsim::Got got =
+            browser_.Send("POST", login_.address, "account=amy%40example.com&decision=" + decision);
         EXPECT_EQ(302, got.status) << got.body;
         const size_t begin = got.head.find("Location: ") + 10;
         return got.head.substr(begin, got.head.find("\r\n", begin) - begin);
@@ -219,8 +217,7 @@ TEST_P(LoginAt, AClientThatIsNotNamedMustBeTheOnlyOne) {
     EXPECT_EQ(VFS_ERR_BAD_PARAM, GetError());
 }
 
-INSTANTIATE_TEST_SUITE_P(Services, LoginAt,
-                         testing::Values("box", "dropbox", "google", "onedrive"),
+INSTANTIATE_TEST_SUITE_P(Services, LoginAt, testing::Values("box", "dropbox", "google", "onedrive"),
                          [](const auto& service) { return std::string(service.param); });
 
 TEST(LoginParameters, UnknownServicesAndEmptyAddressesAreRefused) {
