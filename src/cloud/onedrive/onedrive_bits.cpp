@@ -1,3 +1,5 @@
+#include <strings.h>
+
 #include <algorithm>
 
 #include "cloud/answer_header.h"
@@ -10,6 +12,7 @@
 #include "core/handle.h"
 #include "core/json.h"
 #include "core/log.h"
+#include "core/loggable_url.h"
 #include "http/api_handler.h"
 
 namespace ZYROCloud {
@@ -32,6 +35,18 @@ int64_t FileSize(const Json::Value& meta, const UploadSize& size) {
     const bool guess = !size.known && meta.isMember(kLikelyBytes);
     json::toInt64(meta.get(guess ? kLikelyBytes : "total_bytes", 0), total);
     return total;
+}
+
+/** Whoever has the session can write into the file. */
+Json::Value LoggableHeaders(Json::Value headers) {
+    for (const std::string& name : headers.getMemberNames()) {
+        for (const char* secret : {kSessionId, "Set-Cookie", "Location"}) {
+            if (strcasecmp(name.c_str(), secret) == 0) {
+                headers[name] = "***";
+            }
+        }
+    }
+    return headers;
 }
 
 /** Bytes of the file that the service has, by its last answer; 0 when it does not say. */
@@ -111,8 +126,8 @@ bool OneDrive::SendFragment(XferData* xfer, const std::string& url, long long le
         return HasTaken();
     }
     SetError(api->GetError());
-    LOG_ERROR(kRequestFailed, url.c_str(), json::toString(GetError()).c_str());
-    LOG_ERROR("%s", json::toString(api->GetHeaderResponse()).c_str());
+    LOG_ERROR(kRequestFailed, LoggableUrl(url).c_str(), json::toString(GetError()).c_str());
+    LOG_ERROR("%s", json::toString(LoggableHeaders(api->GetHeaderResponse())).c_str());
     return false;
 }
 
