@@ -79,12 +79,12 @@ TEST(ToolClouds, WhatADriverWouldDoUnaskedIsRefusedWithASentence) {
     std::ofstream("/home/amy/small.txt") << "hello";
     for (Place& place : TheClouds().places) {
         SCOPED_TRACE(place.protocol);
-        const std::string to = "cp /home/amy/small.txt '" + place.Id();
-        const Outcome quote = ForAmy(to + "/a\"b.txt'");
-        EXPECT_EQ(quote.status, place.protocol == "onedrive" ? 0 : 1) << quote.output;
-        if (quote.status != 0) {
-            EXPECT_THAT(quote.output, HasSubstr("double quote"));
-        }
+        const Outcome quote = ForAmy("cp /home/amy/small.txt '" + place.Id() + "/a\"b.txt'");
+        // OneDrive's own refusal of such a name goes to the user as it is.
+        const bool ours = place.protocol != "onedrive";
+        EXPECT_EQ(quote.output.find("double quote") != std::string::npos, ours) << quote.output;
+        EXPECT_NE(quote.status, 0);
+        EXPECT_EQ(place.Bytes("/a\"b.txt"), "nothing");
     }
     Place& box = TheClouds().At("box");
     box.account->AddPath("/held/inside", "kept");
@@ -106,7 +106,7 @@ TEST(ToolClouds, AnUploadThatIsSentAgainCountsItsBytesOnce) {
     place.service->AddFault(cloudsim::Fault::On("POST", "/2/files/upload").Answer(503, "{}"));
     const Outcome copy = ForAmy("cp --json /home/amy/again.bin " + place.Id() + "/again.bin");
     EXPECT_EQ(copy.status, 0) << copy.output;
-    EXPECT_THAT(copy.output, HasSubstr("\"bytes\":300000")) << copy.output;
+    EXPECT_THAT(copy.output, HasSubstr("\"bytes\" : 300000")) << copy.output;
 }
 
 TEST(ToolClouds, AnAccountIsShownWithItsNameAndSpace) {
