@@ -18,7 +18,7 @@ SERVER_PACKAGES=(
 )
 TEST_PACKAGES=(
   libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev python3
-  man-db groff-base bsdextrautils rclone curl
+  man-db groff-base bsdextrautils rclone curl strace
 )
 BENCH_PACKAGES=(libbenchmark-dev python3 libmicrohttpd-dev libgnutls28-dev libfuse3-dev nginx curl rclone)
 

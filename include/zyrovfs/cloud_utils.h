@@ -25,6 +25,21 @@ ZYROVFS_API Cloud* CreateCloudByServerID(unsigned int uid, const std::string& se
 ZYROVFS_API Cloud* CreateCloudByURI(unsigned int uid, const std::string& uri,
                                     ZYROVFS::Server::VFS_CONFIG_MODE mode);
 
+// --- before a transfer --------------------------------------------------------------------------
+
+/**
+ * Whether the driver would do with this transfer what a person expects; if not, `why` is a sentence
+ * to show. Some services' drivers send a name with a double quote in another form than it has, take
+ * another folder for a name that stands in its path, or delete a folder in an upload's way. A
+ * caller who knows of that need not ask; one who acts for a person asks first.
+ *
+ * `uri` is where an upload of `size` bytes goes, -1 for a size that is not known, or, with `upload`
+ * false, where a download comes from. May ask the service. False without a driver, and when the
+ * service could not be asked: the driver's record has the cause.
+ */
+ZYROVFS_API bool IsTransferSafe(Cloud* cloud, const std::string& uri, bool upload, long long size,
+                                std::string& why);
+
 // --- accounts -----------------------------------------------------------------------------------
 
 /** What a service tells of an account; -1 for sizes that it does not tell. */

@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <string>
+#include <vector>
 
 #include "zyrovfs/export.h"
 
@@ -78,6 +79,29 @@ class ZYROVFS_API TaskMgr {
   private:
     TaskMgrPrivate* private_;
 };
+
+// --- what stands in the queues, for people to see. As the operations above: they work as root,
+// wait for the lock, never throw and leave the error cell alone.
+
+struct TaskQueueEntry {
+    std::string id;
+    int pid;
+};
+
+/** Types of which the acting user has queues, sorted; none where nothing was ever queued. False
+ * when the registry cannot be read. */
+ZYROVFS_API bool ListTaskQueues(std::vector<std::string>& names);
+
+/** The entries of a queue in their order, none for a queue that is not there. False when it cannot
+ * be locked or read, also for what a stranger put in its place. */
+ZYROVFS_API bool ReadTaskQueue(const char* name, std::vector<TaskQueueEntry>& entries);
+
+/**
+ * Takes one entry out, at once: Clean keeps the whole queue waiting for seconds, which is for jobs
+ * that died in it. True also for an entry that is not there; false when the queue cannot be locked,
+ * read or written.
+ */
+ZYROVFS_API bool RemoveFromTaskQueue(const char* name, const char* taskID, int pid);
 
 }  // namespace ZYROVFS
 

@@ -8,6 +8,7 @@
 #include "bridge/handle.h"
 #include "core/json_member.h"
 #include "core/log.h"
+#include "core/loggable_url.h"
 
 namespace ZYROCloud::gvfs {
 
@@ -60,8 +61,8 @@ long long Read(const ReadCall& call, SourceLine at) {
         return 0;
     }
     StoreError(*handle.cloud, call.err);
-    LOG_ERROR_AT(at, "Failed to download [%s] to buffer from:%llu, len:%llu", handle.url.c_str(),
-                 static_cast<unsigned long long>(handle.position),
+    LOG_ERROR_AT(at, "Failed to download [%s] to buffer from:%llu, len:%llu",
+                 LoggableUrl(handle.url).c_str(), static_cast<unsigned long long>(handle.position),
                  static_cast<unsigned long long>(call.size));
     return -1;
 }

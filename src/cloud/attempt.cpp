@@ -4,6 +4,7 @@
 
 #include "core/json.h"
 #include "core/log.h"
+#include "core/loggable_url.h"
 #include "http/api_handler.h"
 
 namespace ZYROCloud {
@@ -69,7 +70,7 @@ class Attempts {
 
     void Log(const char* format) const {
         if (format != nullptr) {
-            LOG_ERROR_AT(at_, format, plan_.what != nullptr ? plan_.what->c_str() : "",
+            LOG_ERROR_AT(at_, format, plan_.what != nullptr ? LoggableUrl(*plan_.what).c_str() : "",
                          json::toString(cloud_.GetError()).c_str());
         }
     }

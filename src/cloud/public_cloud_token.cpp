@@ -27,6 +27,7 @@ namespace {
 constexpr long long kGrace = 60;
 constexpr int kPasses = 6;
 constexpr int kRetriesPerPass = 6;
+constexpr unsigned int kLongestSleep = 30;  // seconds between two requests for a token
 constexpr size_t kCredentialBuffer = 4097;
 
 /** Failures that no further request for a token would cure. */
@@ -209,6 +210,8 @@ bool PublicCloud::AskForToken() {
         SetError(VFS_ERR_CLOUD_FAILED, "");
         return false;
     }
+    // The mount lock is held: nobody of this user connects meanwhile.
+    handler->SetLongestSleep(kLongestSleep);
     // The body of a refusal tells a grant that is spent from a request that was malformed.
     handler->SetReturnOnError(false);
     Json::Value header;

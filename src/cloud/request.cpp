@@ -6,6 +6,7 @@
 
 #include "cloud/guard.h"
 #include "core/json.h"
+#include "core/loggable_url.h"
 #include "http/api_handler.h"
 
 namespace ZYROCloud {
@@ -138,7 +139,7 @@ bool Request::Refused() {
         }
         return true;
     }
-    LOG_ERROR_AT(at_, "Failed to process curl %s, err:%s", url_.c_str(),
+    LOG_ERROR_AT(at_, "Failed to process curl %s, err:%s", LoggableUrl(url_).c_str(),
                  json::toString(cloud_.GetError()).c_str());
     return false;
 }

@@ -107,7 +107,9 @@ size_t SendPiece(XferContext& context, char* data, size_t want) {
         SetPlatformErr(kPlatformShort);
         return CURL_READFUNC_ABORT;
     }
-    transfer.bytes_left -= static_cast<size_t>(n);
+    // By the position: a retry sends again what was counted before.
+    transfer.bytes_left = position >= 0 ? static_cast<unsigned long long>(left - n)
+                                        : transfer.bytes_left - static_cast<size_t>(n);
     if (context.limited) {
         context.chunk_left -= static_cast<unsigned int>(n);
     }

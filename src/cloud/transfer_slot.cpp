@@ -61,6 +61,7 @@ void TakeLength(void* curl) {
         } else if (length != -1) {
             SlotLock lock;
             transfer.bytes_left = static_cast<unsigned long long>(length);
+            transfer.bytes_total = transfer.bytes_left;  // or the progress would run past it
             transfer.answer.expected = transfer.bytes_left;
         }
     }

@@ -2,6 +2,7 @@
 #ifndef ZYROVFS_CORE_HANDLE_H
 #define ZYROVFS_CORE_HANDLE_H
 
+#include <dirent.h>
 #include <unistd.h>
 
 #include <cstdio>
@@ -48,6 +49,7 @@ struct FreeWith {
     }
 };
 
+using UniqueDir = std::unique_ptr<DIR, FreeWith<closedir>>;
 using UniqueFile = std::unique_ptr<FILE, FreeWith<fclose>>;
 using UniqueCString = std::unique_ptr<char, FreeWith<std::free>>;
 

@@ -85,6 +85,8 @@ void APIHandler::Reset() {
     }
     form_data_ = nullptr;
     form_file_ = FormFile();
+    sink_ = Sink();
+    keeps_refusal_ = false;
     seek_function_ = nullptr;
     seek_data_ = nullptr;
     body_is_read_ = false;
@@ -199,8 +201,8 @@ bool APIHandler::ParseCurlError(CURLcode code) {
     long status = 0;
     const CURLcode info = curl_easy_getinfo(curl_, CURLINFO_RESPONSE_CODE, &status);
     if (info != CURLE_OK) {
-        LOG_ERROR("Failed to get curl response info, url=%s, code=%d, err=%s",
-                  LoggableUrl().c_str(), static_cast<int>(info), curl_easy_strerror(info));
+        LOG_ERROR("Failed to get curl response info, url=%s, code=%d, err=%s", ShownUrl().c_str(),
+                  static_cast<int>(info), curl_easy_strerror(info));
         status = 0;
         code = info;
     }
@@ -326,11 +328,23 @@ CURLcode APIHandler::Transfer() {
     ResetRespHeader();
     const CURLcode code = curl_easy_perform(curl_);
     if (code != CURLE_SEND_ERROR || !CanSendAgain()) {
-        return code;
+        return Refused(code);
     }
     ResetRespString();
     ResetRespHeader();
-    return curl_easy_perform(curl_);
+    return Refused(curl_easy_perform(curl_));
+}
+
+bool APIHandler::IsRefusal() {
+    constexpr long kFirstFailure = 400;
+    long status = 0;
+    return curl_easy_getinfo(curl_, CURLINFO_RESPONSE_CODE, &status) == CURLE_OK &&
+           status >= kFirstFailure;
+}
+
+/** As libcurl itself ends a refusal, but with the body at hand. */
+CURLcode APIHandler::Refused(CURLcode code) {
+    return code == CURLE_OK && keeps_refusal_ && IsRefusal() ? CURLE_HTTP_RETURNED_ERROR : code;
 }
 
 /** Whether an old connection broke before any answer, and the body is back at its start. */
@@ -364,8 +378,8 @@ bool APIHandler::Perform(int attempts) {
         AdaptTo(code, failed);
         ++failed;
         LOG_ERROR("Retry times: %d/%d, err: %d, url: %s", failed, attempts, static_cast<int>(code),
-                  LoggableUrl().c_str());
-        sleep(GetRetrySleepTime());
+                  ShownUrl().c_str());
+        sleep(std::min(GetRetrySleepTime(), longest_sleep_));
         if (failed == attempts || !CanStartOver()) {
             return false;
         }

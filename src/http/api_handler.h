@@ -17,6 +17,7 @@
 #include <curl/curl.h>
 #include <json/value.h>
 
+#include <limits>
 #include <string>
 #include <vector>
 
@@ -27,6 +28,10 @@
 #include "zyrovfs/cloud.h"
 
 namespace ZYROCloud {
+
+/** Bytes of an answer that is kept in memory. The longest that services give are pages of listings,
+ * a thousand items with some thousand bytes each. Contents of files do not go this way. */
+inline constexpr size_t kLongestAnswer = size_t{64} << 20;
 
 /** What libcurl calls to go back in the bytes to send: CURL_SEEKFUNC_... */
 using SeekCallback = int (*)(void* context, curl_off_t offset, int origin);
@@ -98,6 +103,15 @@ class APIHandler {
     /** Before Init: whether libcurl fails a status of 400 or more, without its body. Default true,
      * and stays set for later requests. */
     bool SetReturnOnError(bool return_on_error);
+    /**
+     * Behind the write function, for a download: the body of a status of 400 or more goes to the
+     * error handler and not to that function, and fails the transfer. Without this call libcurl
+     * throws such a body away, and with it the cause. For this request only.
+     */
+    bool KeepRefusal();
+    /** For all requests: Process sleeps no longer at once than this, whatever the error handler
+     * asks for. */
+    void SetLongestSleep(unsigned int seconds) { longest_sleep_ = seconds; }
     /** Required before Process. Owned from here on; an earlier one is deleted. */
     bool SetErrorHandler(ErrorHandler* handler);
 
@@ -159,6 +173,7 @@ class APIHandler {
 
     // --- callbacks for libcurl -------------------------------------------------------------------
 
+    /** Stops the transfer when `out` would grow beyond kLongestAnswer. */
     static size_t WriteToStrBuf(char* data, size_t size, size_t count, std::string* out) noexcept;
     static size_t MutedWriteCallback(void* data, size_t size, size_t count, void*) noexcept;
     /** Stores one header line. std::out_of_range for a name and a colon with nothing behind. */
@@ -190,7 +205,7 @@ class APIHandler {
     bool AddMember(const char* key, const std::string& name, const Json::Value& value);
     char* KeepText(ZYROVFS::UniqueCString text);
     void UsePinnedCertificate(const std::string& path);
-    std::string LoggableUrl() const;
+    std::string ShownUrl() const;
     bool SetHeaders(curl_slist** list);
     bool SetTarget();
     bool SetBody();
@@ -199,6 +214,8 @@ class APIHandler {
     bool SetUp(curl_slist** headers, curl_mime** form);
     bool Perform(int attempts);
     CURLcode Transfer();
+    CURLcode Refused(CURLcode code);
+    bool IsRefusal();
     bool CanSendAgain();
     bool CanStartOver();
     void AdaptTo(CURLcode code, int failed);
@@ -212,6 +229,7 @@ class APIHandler {
     CURLSH* share_;
     ErrorHandler* error_handler_ = nullptr;
     bool return_on_error_ = true;
+    unsigned int longest_sleep_ = std::numeric_limits<unsigned int>::max();
     FormUploadData* form_data_ = nullptr;
     char* cert_data_ = nullptr;  ///< one of the loan's texts
     /** Where libcurl reads the file of a form. */
@@ -220,11 +238,20 @@ class APIHandler {
         SeekCallback seek = nullptr;
         void* seek_data = nullptr;
     };
+    static size_t WriteOrKeepRefusal(char* data, size_t size, size_t count, void* handler) noexcept;
     static size_t ReadFormFile(char* data, size_t size, size_t count, void* file);
     static int SeekFormFile(void* file, curl_off_t offset, int origin);
     CURLcode AddFormFile(curl_mime* form);
 
+    /** Where a download goes, for the part of its answers that is none of the file. */
+    struct Sink {
+        CurlCallback function = nullptr;
+        void* data = nullptr;
+    };
+
     FormFile form_file_;
+    Sink sink_;
+    bool keeps_refusal_ = false;
     SeekCallback seek_function_ = nullptr;
     void* seek_data_ = nullptr;
     bool body_is_read_ = false;  ///< from a function, which may not be able to give it again

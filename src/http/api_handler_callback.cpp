@@ -4,14 +4,33 @@
 #include "http/api_handler.h"
 
 namespace ZYROCloud {
+namespace {
+
+/** From a write function: libcurl ends the transfer. An empty chunk, for which this would be its
+ * size, does not occur. */
+constexpr size_t kNotTaken = 0;
+
+}  // namespace
 
 size_t APIHandler::WriteToStrBuf(char* data, size_t size, size_t count, std::string* out) noexcept {
-    try {
-        out->append(data, size * count);
-    } catch (const std::exception&) {
-        return 0;  // no memory for it: libcurl ends the transfer
+    const size_t length = size * count;
+    if (length > kLongestAnswer - std::min(out->size(), kLongestAnswer)) {
+        return kNotTaken;
     }
-    return size * count;
+    try {
+        out->append(data, length);
+    } catch (const std::exception&) {
+        return kNotTaken;  // no memory for it
+    }
+    return length;
+}
+
+/** For libcurl, `handler` is the APIHandler. */
+size_t APIHandler::WriteOrKeepRefusal(char* data, size_t size, size_t count,
+                                      void* handler) noexcept {
+    auto& self = *static_cast<APIHandler*>(handler);
+    return self.IsRefusal() ? WriteToStrBuf(data, size, count, &self.response_)
+                            : self.sink_.function(data, size, count, self.sink_.data);
 }
 
 size_t APIHandler::MutedWriteCallback(void*, size_t size, size_t count, void*) noexcept {

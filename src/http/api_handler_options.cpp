@@ -163,10 +163,23 @@ bool APIHandler::ChooseConnections() {
 }
 
 bool APIHandler::SetWriteFunAndData(CurlCallback function, void* data) {
+    sink_.function = function != nullptr ? function : sink_.function;
+    sink_.data = data != nullptr ? data : sink_.data;
     return (function == nullptr ||
             Accept(curl_easy_setopt(curl_, CURLOPT_WRITEFUNCTION, function), "write function")) &&
            (data == nullptr ||
             Accept(curl_easy_setopt(curl_, CURLOPT_WRITEDATA, data), "write data"));
+}
+
+bool APIHandler::KeepRefusal() {
+    if (sink_.function == nullptr) {
+        return false;
+    }
+    keeps_refusal_ = true;
+    return Accept(curl_easy_setopt(curl_, CURLOPT_FAILONERROR, 0L), "fail on error") &&
+           Accept(curl_easy_setopt(curl_, CURLOPT_WRITEFUNCTION, &WriteOrKeepRefusal),
+                  "write function") &&
+           Accept(curl_easy_setopt(curl_, CURLOPT_WRITEDATA, this), "write data");
 }
 
 bool APIHandler::SetReadFunAndData(CurlCallback function, void* data) {

@@ -4,6 +4,7 @@
 #include <cstring>
 
 #include "core/log.h"
+#include "core/loggable_url.h"
 #include "core/paths.h"
 #include "http/api_handler.h"
 #include "mount/known_hosts.h"
@@ -21,19 +22,6 @@ constexpr char kSchemeEnd[] = "://";
 
 bool StartsWith(const std::string& text, const char* start) {
     return text.compare(0, strlen(start), start) == 0;
-}
-
-/** User, password and query of a URL are nobody else's business. */
-std::string Loggable(const std::string& url) {
-    std::string text = url.substr(0, url.find_first_of("?#"));
-    const size_t scheme = text.find("://");
-    const size_t host = scheme == std::string::npos ? 0 : scheme + strlen("://");
-    const size_t end = std::min(text.find('/', host), text.size());
-    const size_t at = text.rfind('@', end);
-    if (at != std::string::npos && at >= host && at < end) {
-        text.erase(host, at + 1 - host);
-    }
-    return text;
 }
 
 bool IsSsh(const std::string& url) {
@@ -81,9 +69,9 @@ bool Logged(CURLcode code, SourceLine at = SourceLine::Here()) {
 
 }  // namespace
 
-std::string APIHandler::LoggableUrl() const {
+std::string APIHandler::ShownUrl() const {
     const Json::Value& url = request_["url"];
-    return url.isString() ? Loggable(url.asString()) : "";
+    return url.isString() ? LoggableUrl(url.asString()) : "";
 }
 
 bool APIHandler::SetURL(const std::string& url, bool need_escape) {
@@ -137,7 +125,7 @@ bool APIHandler::SetSSLOpt(const std::string& url) {
 bool APIHandler::SetVFSURL(const std::string& url) {
     std::string converted;
     if (!Utils::ConvDavProtocol(url, converted)) {
-        LOG_ERROR("Failed to convert protocol %s", Loggable(url).c_str());
+        LOG_ERROR("Failed to convert protocol %s", LoggableUrl(url).c_str());
         return false;
     }
     if (IsDavs(url)) {
@@ -151,7 +139,7 @@ bool APIHandler::SetVFSURL(const std::string& url) {
     if (IsFileProtocol(url)) {
         const CURLcode code = curl_easy_setopt(curl_, CURLOPT_PROXY, "");
         if (code != CURLE_OK) {
-            LOG_ERROR("Failed to set url to %s, code=%d, err=%s", Loggable(url).c_str(),
+            LOG_ERROR("Failed to set url to %s, code=%d, err=%s", LoggableUrl(url).c_str(),
                       static_cast<int>(code), curl_easy_strerror(code));
             ParseCurlError(code);
             return false;
@@ -185,7 +173,7 @@ bool APIHandler::SetTarget() {
         url.clear();
     }
     if (url.empty()) {
-        LOG_ERROR("Failed to escape url, %s", Loggable(given).c_str());
+        LOG_ERROR("Failed to escape url, %s", LoggableUrl(given).c_str());
         return false;
     }
     if (request_.isMember("get_param")) {

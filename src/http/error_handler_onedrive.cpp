@@ -1,3 +1,4 @@
+#include <algorithm>
 #include <cstdlib>
 #include <limits>
 
@@ -31,6 +32,7 @@ constexpr StatusRow kRows[] = {
 };
 
 constexpr unsigned int kExtraWait = 30;
+constexpr unsigned int kLongestWait = 3600;
 
 /** A refused token request has a text under "error", the service's own answers an object. */
 std::string DetailOfBody(const std::string& message) {
@@ -54,12 +56,12 @@ bool FindWait(const std::string& message, std::string& seconds) {
 
 /** What the service asks for, with some more. 0 means that it need not be left alone at all. */
 unsigned int WaitFor(const std::string& seconds) {
-    constexpr unsigned long kMost = std::numeric_limits<unsigned int>::max() - kExtraWait;
     const unsigned long asked = strtoul(seconds.c_str(), nullptr, 0);
-    if (asked > kMost) {
+    if (asked > std::numeric_limits<unsigned int>::max() - kExtraWait) {
         return kBusySleep;  // no time that anyone can mean
     }
-    return asked == 0 ? 0 : static_cast<unsigned int>(asked) + kExtraWait;
+    // It decides about its own pause, and not about how long a call may take.
+    return asked == 0 ? 0 : std::min(static_cast<unsigned int>(asked), kLongestWait) + kExtraWait;
 }
 
 unsigned int ThrottledSleep(const std::string& message) {

@@ -1,9 +1,11 @@
+#include <unistd.h>
 #include <zosplatform/group.h>
 #include <zosplatform/user.h>
 
 #include <cstdlib>
 #include <cstring>
 
+#include "core/identity.h"
 #include "core/no_throw.h"
 #include "policy/belonging.h"
 #include "policy/user_settings.h"
@@ -120,6 +122,8 @@ PermissionDecision Decide(unsigned int uid, _VFS_USER_CONFIG_ config, const char
 template <typename Question>
 PermissionDecision Ask(Question question) {
     const ErrorCellKept kept;
+    // A policy that cannot be read leaves its reader at root; a question changes nobody's identity.
+    const EffectiveUid caller(geteuid());
     PermissionDecision decision = No(PERMISSION_NOT_ENABLED);
     NoThrow(VFS_ERR_FAILED, [&] {
         decision = question();

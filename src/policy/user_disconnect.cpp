@@ -20,8 +20,6 @@
 namespace ZYROVFS::Cfg {
 namespace {
 
-using UniqueDir = std::unique_ptr<DIR, FreeWith<closedir>>;
-
 /** Only the very text of a number: a folder of another name belongs to nobody. */
 bool ToUid(const std::string& text, unsigned int& uid) {
     const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), uid);

@@ -22,8 +22,6 @@
 namespace ZYROVFS::Server {
 namespace {
 
-using UniqueDir = std::unique_ptr<DIR, FreeWith<closedir>>;
-
 bool IsAnyDaemonDead() {
     return DBUS::CheckDaemonDied() || GVFSD::CheckDaemonDied() || GVFSD_FUSE::CheckDaemonDied();
 }

@@ -14,7 +14,6 @@
 
 #include "core/error_cell.h"
 #include "core/identity.h"
-#include "core/log.h"
 #include "task/task_file.h"
 #include "zyrovfs/utils.h"
 
@@ -27,6 +26,8 @@ struct TaskMgrPrivate {
 namespace {
 
 using task::Entry;
+using task::IsType;
+using task::OrOnFault;
 using task::QueueFiles;
 using task::QueueLock;
 using task::QueueReader;
@@ -44,23 +45,6 @@ struct Job {
 
 bool IsEmpty(const char* text) {
     return text == nullptr || *text == '\0';
-}
-
-/** A type names a folder and files in it: another name would lead root out of the registry. */
-bool NamesNoType(const char* name) {
-    return IsEmpty(name) || strchr(name, '/') != nullptr || strcmp(name, ".") == 0 ||
-           strcmp(name, "..") == 0;
-}
-
-/** Nothing leaves an operation by exception; `fault` is its answer when memory runs out. */
-template <typename Result, typename Body>
-Result OrOnFault(Result fault, Body body, SourceLine at = SourceLine::Here()) noexcept {
-    try {
-        return body();
-    } catch (const std::exception& e) {
-        LOG_ERROR_AT(at, "Unexpected failure, %s", e.what());
-        return fault;
-    }
 }
 
 // --- adding -----------------------------------------------------------------------------------
@@ -341,23 +325,23 @@ void TaskMgr::SetMaxTask(unsigned int n) {
 }
 
 bool TaskMgr::GetTaskPath(const char* name, std::string& path) {
-    return !NamesNoType(name) && OrOnFault(false, [&] {
-        path = task::FilesOf(name).folder;
-        return true;
-    });
+    return IsType(name) && OrOnFault(false, [&] {
+               path = task::FilesOf(name).folder;
+               return true;
+           });
 }
 
 bool TaskMgr::Add(const char* name, const char* taskID, int pid) {
-    return !NamesNoType(name) && !IsEmpty(taskID) && OrOnFault(false, [&] {
-        const QueueFiles files = task::FilesOf(name);
-        const RootUid as_root;
-        return AddLine(files, taskID, pid);
-    });
+    return IsType(name) && !IsEmpty(taskID) && OrOnFault(false, [&] {
+               const QueueFiles files = task::FilesOf(name);
+               const RootUid as_root;
+               return AddLine(files, taskID, pid);
+           });
 }
 
 int64_t TaskMgr::IsRunnable(const char* name, const char* taskID, int pid, Check check,
                             void* data) {
-    if (NamesNoType(name) || IsEmpty(taskID)) {
+    if (!IsType(name) || IsEmpty(taskID)) {
         return 0;
     }
     return OrOnFault(int64_t{0}, [&] {
@@ -368,20 +352,20 @@ int64_t TaskMgr::IsRunnable(const char* name, const char* taskID, int pid, Check
 }
 
 bool TaskMgr::IsAddable(const char* name, int pid) {
-    return NamesNoType(name) || OrOnFault(true, [&] {
-               const QueueFiles files = task::FilesOf(name);
-               const RootUid as_root;
-               return AskForRoom(files, pid, LimitOf(private_));
-           });
+    return !IsType(name) || OrOnFault(true, [&] {
+        const QueueFiles files = task::FilesOf(name);
+        const RootUid as_root;
+        return AskForRoom(files, pid, LimitOf(private_));
+    });
 }
 
 bool TaskMgr::Clean(const char* name, const char* taskID, int pid, Check check, void* data,
                     bool background) {
-    return !NamesNoType(name) && OrOnFault(false, [&] {
-        const QueueFiles files = task::FilesOf(name);
-        const RootUid as_root;
-        return CleanOrHandOver(files, {name, taskID, pid, check, data}, background);
-    });
+    return IsType(name) && OrOnFault(false, [&] {
+               const QueueFiles files = task::FilesOf(name);
+               const RootUid as_root;
+               return CleanOrHandOver(files, {name, taskID, pid, check, data}, background);
+           });
 }
 
 }  // namespace ZYROVFS

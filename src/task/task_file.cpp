@@ -12,6 +12,7 @@
 #include <ctime>
 #include <utility>
 
+#include "core/entry_name.h"
 #include "core/paths.h"
 #include "zyrovfs/global.h"
 
@@ -19,8 +20,6 @@ namespace ZYROVFS::task {
 namespace {
 
 constexpr int kLockSeconds = 600;
-/** Far beyond any queue, far below what would exhaust the memory of the box by its longest line. */
-constexpr off_t kLargestQueue = 64 << 20;
 
 UniqueFile Stream(UniqueFd fd, const char* mode) {
     UniqueFile file(fd ? fdopen(fd.Get(), mode) : nullptr);
@@ -38,6 +37,10 @@ pid_t ProcessId(const char* text) {
 }
 
 }  // namespace
+
+bool IsType(const char* name) {
+    return name != nullptr && IsEntryName(name);
+}
 
 QueueFiles FilesOf(const char* name) {
     QueueFiles files{};

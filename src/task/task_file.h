@@ -4,12 +4,31 @@
 
 #include <sys/types.h>
 
+#include <exception>
 #include <string>
 
 #include "core/handle.h"
+#include "core/log.h"
 #include "core/owned_folder.h"
 
 namespace ZYROVFS::task {
+
+/** Far beyond any queue, far below what would exhaust the memory of the box by its longest line. */
+inline constexpr off_t kLargestQueue = 64 << 20;
+
+/** A type names a folder and files in it: another name would lead root out of the registry. */
+bool IsType(const char* name);
+
+/** Nothing leaves an operation by exception; `fault` is its answer when memory runs out. */
+template <typename Result, typename Body>
+Result OrOnFault(Result fault, Body body, SourceLine at = SourceLine::Here()) noexcept {
+    try {
+        return body();
+    } catch (const std::exception& e) {
+        LOG_ERROR_AT(at, "Unexpected failure, %s", e.what());
+        return fault;
+    }
+}
 
 /** Under which nobody is kept from the queue; the umask in force takes from it. */
 inline constexpr mode_t kQueueMode = 0777;

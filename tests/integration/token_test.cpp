@@ -238,6 +238,26 @@ TEST_F(Token, ABusyServiceIsAsked42TimesWithTheHandlersWaits) {
     ExpectUnlocked();
 }
 
+/** Of a service that may say how long it wants to be left alone. */
+class ThrottledDriver : public TokenDriver {
+  public:
+    using TokenDriver::TokenDriver;
+    bool SetAPIErrorHandler(APIHandler* handler) override {
+        return handler != nullptr && handler->SetErrorHandler(new OneDriveErrorHandler);
+    }
+};
+
+TEST_F(Token, AServiceCannotOrderALongSleepUnderTheMountLock) {
+    const std::string years =
+        R"({"error":{"code":"request_throttled","message":"Wait 99999999 seconds."}})";
+    const wire::WireServer server(
+        {Answers({wire::Answer(420, years), wire::Answer(420, years), wire::Answer(200, kGood)})});
+    ThrottledDriver cloud(profiles::kUser, Driven(Ago(3600)));
+    cloud.token_url = server.Url("/token");
+    EXPECT_TRUE(cloud.RefreshToken(false)) << seams::LogDump();
+    EXPECT_EQ(std::vector<unsigned>(2, 30U), seams::Sleeps());
+}
+
 TEST_F(Token, AFailureThatIsNotRetriedIsAskedOncePerPassWithoutAWait) {
     EXPECT_FALSE(Renew(Always(wire::Answer(404))));
     EXPECT_EQ(VFS_ERR_NOT_FOUND, cloud_->GetErrorCode());

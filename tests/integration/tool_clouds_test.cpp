@@ -75,6 +75,40 @@ TEST(ToolClouds, AFileBeyondOneRequestGoesUpToEachCloudAndComesBack) {
     }
 }
 
+TEST(ToolClouds, WhatADriverWouldDoUnaskedIsRefusedWithASentence) {
+    std::ofstream("/home/amy/small.txt") << "hello";
+    for (Place& place : TheClouds().places) {
+        SCOPED_TRACE(place.protocol);
+        const Outcome quote = ForAmy("cp /home/amy/small.txt '" + place.Id() + "/a\"b.txt'");
+        // OneDrive's own refusal of such a name goes to the user as it is.
+        const bool ours = place.protocol != "onedrive";
+        EXPECT_EQ(quote.output.find("double quote") != std::string::npos, ours) << quote.output;
+        EXPECT_NE(quote.status, 0);
+        EXPECT_EQ(place.Bytes("/a\"b.txt"), "nothing");
+    }
+    Place& box = TheClouds().At("box");
+    box.account->AddPath("/held/inside", "kept");
+    const Outcome folder = ForAmy("cp /home/amy/small.txt " + box.Id() + "/held");
+    EXPECT_EQ(folder.status, 1);
+    EXPECT_THAT(folder.output, HasSubstr("A folder of that name stands there"));
+    EXPECT_EQ(box.Bytes("/held/inside"), "kept");
+    Place& onedrive = TheClouds().At("onedrive");
+    onedrive.account->AddPath("/small/x", "x");
+    onedrive.tree->Refresh();
+    const Outcome other = ForAmy("cp /home/amy/small.txt " + onedrive.Id() + "/small/small");
+    EXPECT_EQ(other.status, 1);
+    EXPECT_THAT(other.output, HasSubstr("would land in another folder"));
+}
+
+TEST(ToolClouds, AnUploadThatIsSentAgainCountsItsBytesOnce) {
+    std::ofstream("/home/amy/again.bin") << Pattern(300000, 3);
+    Place& place = TheClouds().At("dropbox");
+    place.service->AddFault(cloudsim::Fault::On("POST", "/2/files/upload").Answer(503, "{}"));
+    const Outcome copy = ForAmy("cp --json /home/amy/again.bin " + place.Id() + "/again.bin");
+    EXPECT_EQ(copy.status, 0) << copy.output;
+    EXPECT_THAT(copy.output, HasSubstr("\"bytes\" : 300000")) << copy.output;
+}
+
 TEST(ToolClouds, AnAccountIsShownWithItsNameAndSpace) {
     for (Place& place : TheClouds().places) {
         SCOPED_TRACE(place.protocol);

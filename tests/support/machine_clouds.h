@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 #include <json/value.h>
 
+#include <algorithm>
 #include <fstream>
 #include <memory>
 #include <string>
@@ -93,6 +94,11 @@ class Clouds : public testing::Environment {
             "sed -E 's|\"path\":\"\",\"protocol\":\"([a-z]+)\"|"
             "\"path\":\"/tmp/clouds/\\1\",\"protocol\":\"\\1\"|g' "
             "/usr/zyro/etc/zyrovfs/4001/servers.conf >/var/tmp/zyrovfs/4001/connect.conf");
+    }
+
+    Place& At(const std::string& protocol) {
+        return *std::find_if(places.begin(), places.end(),
+                             [&](const Place& place) { return place.protocol == protocol; });
     }
 
     std::vector<Place> places;

@@ -114,8 +114,10 @@ int List(unsigned int uid, const std::string& name, bool json) {
     ActFor(uid);
     Json::Value document;
     Json::Value& tasks = document["tasks"] = Json::arrayValue;
-    const std::vector<std::string> names =
-        name.empty() ? TaskNames() : std::vector<std::string>{name};
+    std::vector<std::string> names{name};
+    if (name.empty() && !ZYROVFS::ListTaskQueues(names)) {
+        return ReportProblem("The queues cannot be read.", json);
+    }
     for (const std::string& queue : names) {
         std::vector<TaskEntry> entries;
         if (!ReadTasks(queue, entries)) {

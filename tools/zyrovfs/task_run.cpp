@@ -15,7 +15,6 @@
 #include <cstring>
 
 #include "report.h"
-#include "task_queue.h"
 
 namespace tool {
 namespace {
@@ -203,7 +202,7 @@ int RunTask(unsigned int uid, const TaskRun& chosen, bool json) {
     }
     // Where that fails, the entry counts no more once this process has ended, and the next clean-up
     // takes it out.
-    RemoveTask(run.name, run.id, getpid());
+    ZYROVFS::RemoveFromTaskQueue(run.name.c_str(), run.id.c_str(), getpid());
     return status;
 }
 

@@ -2,6 +2,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 #include <zosplatform/file.h>
+#include <zyrovfs/cloud_utils.h>
 #include <zyrovfs/error.h>
 
 #include <cerrno>
@@ -68,6 +69,9 @@ class Transfer {
         }
         const TransferTask task(uid_, ServerIds());
         long long size = 0;
+        if (!IsSafe(*source_, options_.from, false, -1)) {
+            return failure_;
+        }
         if (!source_->GetFileSize(options_.from, &size)) {
             return Fail(*source_);
         }
@@ -122,6 +126,16 @@ class Transfer {
         return ReportProblem(step + " failed: " + cause, json_);
     }
 
+    /** What a driver would do with this that nobody asked for is refused in words. */
+    bool IsSafe(Cloud& cloud, const std::string& uri, bool upload, long long size) {
+        std::string why;
+        if (ZYROCloud::Utils::IsTransferSafe(&cloud, uri, upload, size, why)) {
+            return true;
+        }
+        failure_ = cloud.GetErrorCode() == VFS_ERR_NONE ? ReportProblem(why, json_) : Fail(cloud);
+        return false;
+    }
+
     void Start(long long size, bool bar, long long already = 0) {
         progress_ =
             std::make_unique<Progress>(NameOf(options_.from), size, options_.rate,
@@ -174,6 +188,9 @@ class Transfer {
         if (!S_ISREG(info.st_mode)) {
             return ReportProblem(options_.from + " is no file.", json_);
         }
+        if (!IsSafe(*target_, options_.to, true, info.st_size)) {
+            return failure_;
+        }
         if (!target_->CanFileUpload(static_cast<unsigned long long>(info.st_size))) {
             return Fail(*target_);
         }
@@ -189,6 +206,10 @@ class Transfer {
         if (!source_->GetFileSize(options_.from, &size)) {
             return Fail(*source_);
         }
+        if (!IsSafe(*source_, options_.from, false, size) ||
+            !IsSafe(*target_, options_.to, true, size)) {
+            return failure_;
+        }
         if (!target_->CanFileUpload(static_cast<unsigned long long>(size))) {
             return Fail(*target_);
         }
@@ -203,6 +224,9 @@ class Transfer {
     /** Into a file beside the target, which takes its name when it is whole. */
     int Download() {
         NameTarget();
+        if (!IsSafe(*source_, options_.from, false, -1)) {
+            return failure_;
+        }
         long long size = 0;
         if (!source_->GetFileSize(options_.from, &size)) {
             return Fail(*source_);
@@ -271,7 +295,9 @@ class Transfer {
         const std::string place = by_url && url.isString() ? url.asString() : options_.from;
         const long long most = options_.rate > 0 ? kPieceOfSlow : kPiece;
         std::vector<char> piece(static_cast<size_t>(most) + 1);
+        const long long begin = from;
         while (from < size) {
+            progress_->BeginAt(from - begin);
             const long long want = std::min(most, size - from);
             long long got = 0;
             if (!Cloud::DownloadFileToBuffer(source_.get(), place, piece.data(), from, want, &got,

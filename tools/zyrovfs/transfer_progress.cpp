@@ -24,7 +24,9 @@ using std::chrono::duration;
 using std::chrono::milliseconds;
 
 volatile std::sig_atomic_t cancelled = 0;
-std::atomic<long long> moved{0};
+std::atomic<long long> moved{0};    // what a speed limit counts
+std::atomic<long long> arrived{0};  // what is there: a retry begins again
+std::atomic<long long> base{0};     // what was there when the piece under way began
 std::atomic<Progress*> shown{nullptr};
 std::atomic<long long> limit{0};
 Clock::time_point begin;
@@ -42,7 +44,7 @@ size_t Columns() {
 
 Progress::Progress(std::string name, long long total, long long rate, bool bar, long long already)
     : name_(std::move(name)), total_(total), rate_(rate), bar_(bar), already_(already) {
-    moved = 0;
+    moved = arrived = base = 0;
     begin = drawn = Clock::now();
     limit = rate_;
     shown = this;
@@ -71,7 +73,11 @@ void Progress::CatchSignals() {
 }
 
 long long Progress::Bytes() const {
-    return moved;
+    return arrived;
+}
+
+void Progress::BeginAt(long long bytes) {
+    base = bytes;
 }
 
 double Progress::Seconds() const {
@@ -86,9 +92,9 @@ int Progress::OnCancel() {
     return cancelled;
 }
 
-int Progress::OnProgress(unsigned long long chunk, unsigned long long /*done*/) {
-    // A retry begins again, and the engine's count with it; what was moved was moved.
+int Progress::OnProgress(unsigned long long chunk, unsigned long long done) {
     moved += static_cast<long long>(chunk);
+    arrived = base + static_cast<long long>(done);
     Progress* progress = shown;
     if (progress != nullptr && progress->bar_ && Clock::now() - drawn >= kRedraw) {
         drawn = Clock::now();
@@ -113,7 +119,7 @@ long long Progress::OnSpeed(unsigned long long chunk, unsigned long long /*done*
 void Progress::Draw() const {
     const double seconds = std::max(Seconds(), 0.001);
     const double rate = static_cast<double>(moved) / seconds;
-    const auto have = static_cast<double>(already_ + moved);
+    const auto have = static_cast<double>(already_ + arrived);
     std::string text = HumanBytes(have);
     double part = -1;
     if (total_ > 0) {

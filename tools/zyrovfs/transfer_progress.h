@@ -26,7 +26,10 @@ class Progress {
      * an error of writing. */
     static void CatchSignals();
 
+    /** What has arrived; bytes that a retry sends again count once. */
     long long Bytes() const;
+    /** A piece begins, of which the engine counts from 0, behind so many bytes. */
+    void BeginAt(long long bytes);
     double Seconds() const;
     static bool Cancelled();
 

@@ -59,7 +59,11 @@ int YLIBUserInfoEnumBySubstr(unsigned int type, const char* substr, const char* 
  * -1 on failure. */
 int YLIBUserAdminListGet(unsigned int type, PYLIBCSZLIST* list);
 
-/** 1 when this machine takes users from a directory server, else 0. */
+/**
+ * 1 when this machine is bound to a directory server whose users and groups it fetches into lists
+ * of its own, for which callers wait, else 0. Where they come from the name service, as on plain
+ * Linux, there is nothing to wait for, and the answer is 0.
+ */
 int ZYROLDAPIsBinded(void);
 
 #ifdef __cplusplus

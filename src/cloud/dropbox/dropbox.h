@@ -97,6 +97,7 @@ class Dropbox : public DriverOf<DropboxErrorHandler> {
     bool SendAt(XferData* xfer, const std::string& session, unsigned long long* offset,
                 unsigned long long size, SentBytes& sent);
     bool SendToEnd(XferData* xfer, const std::string& session, const std::string& path);
+    bool IsThere(const std::string& path);
     bool PrepareDownload(XferData* xfer, const Json::Value& meta, const std::string& path);
 };
 

@@ -239,15 +239,27 @@ bool Dropbox::DownloadProcess(XferData* xfer, const Json::Value& meta) {
             if (code != VFS_ERR_NOT_FOUND) {
                 return judge(code);
             }
-            sleep(kLookAfter);
-            Json::Value info;
-            return GetFileInfo(path, Json::Value(), info) ? NextStep::RetryAfter(kCatchUp)
-                                                          : NextStep::End();
+            return IsThere(path) ? NextStep::RetryAfter(kCatchUp) : NextStep::End();
         };
         plan.copy = CopyError::kAfterCancelTest;
         plan.first_number = 1;
         return RunAttempts(*this, plan);
     });
+}
+
+/** Of a file that the content side does not have. */
+bool Dropbox::IsThere(const std::string& path) {
+    const Json::Value missing = GetError();
+    sleep(kLookAfter);
+    Json::Value info;
+    if (GetFileInfo(path, Json::Value(), info)) {
+        return true;
+    }
+    // A refusal without its body, as they all are behind a download: the first one had it.
+    if (GetErrorCode() == VFS_ERR_BAD_REQUEST) {
+        SetError(missing);
+    }
+    return false;
 }
 
 bool Dropbox::PrepareDownload(XferData* xfer, const Json::Value& meta, const std::string& path) {
@@ -259,7 +271,8 @@ bool Dropbox::PrepareDownload(XferData* xfer, const Json::Value& meta, const std
     if (!request.FailOnError().Prepare(xfer)) {
         return false;
     }
-    if (!SetRange(*this, meta)) {
+    // Of this request's own refusal the body is wanted: it tells a file that is not there yet.
+    if (!api->KeepRefusal() || !SetRange(*this, meta)) {
         SetError(VFS_ERR_CLOUD_FAILED, "");
         return false;
     }

@@ -14,6 +14,7 @@
 #include "cloud/size_limit.h"
 #include "cloud/upload_body.h"
 #include "core/log.h"
+#include "core/loggable_url.h"
 #include "http/api_handler.h"
 #include "http/error_handler_table.h"
 
@@ -149,7 +150,8 @@ bool GDrive::StartUpload(const std::string& session_uri, XferData* xfer, unsigne
 bool GDrive::SendRest(const XferData& xfer, const std::string& session_uri) {
     if (!SendUpload(*this, xfer)) {
         SetError(api->GetError());
-        LOG_ERROR(kRequestFailed, session_uri.c_str(), json::toString(GetError()).c_str());
+        LOG_ERROR(kRequestFailed, LoggableUrl(session_uri).c_str(),
+                  json::toString(GetError()).c_str());
         return false;
     }
     if (IsStored(*api)) {

@@ -1,8 +1,11 @@
+#include <strings.h>
+
 #include <algorithm>
 
 #include "cloud/answer_header.h"
 #include "cloud/attempt.h"
 #include "cloud/guard.h"
+#include "cloud/onedrive/fragment_cursor.h"
 #include "cloud/onedrive/onedrive.h"
 #include "cloud/onedrive/onedrive_api.h"
 #include "cloud/request.h"
@@ -10,6 +13,7 @@
 #include "core/handle.h"
 #include "core/json.h"
 #include "core/log.h"
+#include "core/loggable_url.h"
 #include "http/api_handler.h"
 
 namespace ZYROCloud {
@@ -32,6 +36,18 @@ int64_t FileSize(const Json::Value& meta, const UploadSize& size) {
     const bool guess = !size.known && meta.isMember(kLikelyBytes);
     json::toInt64(meta.get(guess ? kLikelyBytes : "total_bytes", 0), total);
     return total;
+}
+
+/** Whoever has the session can write into the file. */
+Json::Value LoggableHeaders(Json::Value headers) {
+    for (const std::string& name : headers.getMemberNames()) {
+        for (const char* secret : {kSessionId, "Set-Cookie", "Location"}) {
+            if (strcasecmp(name.c_str(), secret) == 0) {
+                headers[name] = "***";
+            }
+        }
+    }
+    return headers;
 }
 
 /** Bytes of the file that the service has, by its last answer; 0 when it does not say. */
@@ -78,15 +94,14 @@ bool OneDrive::StartUpload(XferData* xfer, const std::string& url, const std::st
     return Guard(*this, [&] {
         const std::string range = RangeText(*offset, length, total);
         // The service's word counts, however the request ended: that is where a repeat begins.
-        const ScopeExit believe([&] {
+        const ScopeExit move_on([&] {
             const long long received = Received(api);
-            *offset += length;
-            if (received > *offset) {
+            const long long sent = *offset + length;
+            if (received > sent) {
                 LOG_ERROR("Wrong size, %llu, %llu", static_cast<unsigned long long>(received),
-                          static_cast<unsigned long long>(*offset));
-                return;
+                          static_cast<unsigned long long>(sent));
             }
-            *offset = received;
+            *offset = OffsetBehind(*offset, length, received);
         });
         Request request(*this, kFrame);
         request.To(kBitsMethod, url)
@@ -111,8 +126,8 @@ bool OneDrive::SendFragment(XferData* xfer, const std::string& url, long long le
         return HasTaken();
     }
     SetError(api->GetError());
-    LOG_ERROR(kRequestFailed, url.c_str(), json::toString(GetError()).c_str());
-    LOG_ERROR("%s", json::toString(api->GetHeaderResponse()).c_str());
+    LOG_ERROR(kRequestFailed, LoggableUrl(url).c_str(), json::toString(GetError()).c_str());
+    LOG_ERROR("%s", json::toString(LoggableHeaders(api->GetHeaderResponse())).c_str());
     return false;
 }
 
@@ -128,24 +143,19 @@ class Fragments {
           url_(url),
           session_(session),
           total_(total),
-          source_begin_(SourceBegin(*xfer.context)) {}
+          source_begin_(SourceBegin(*xfer.context)),
+          cursor_(total) {}
 
     bool Send(long long length) {
-        if (position_ != offset_ && !GoOn()) {
+        if (cursor_.IsSourceElsewhere() && !ReturnToOffset()) {
             return false;
         }
-        begin_ = start_ = offset_;
-        end_ = std::min(offset_ + length, total_);
+        cursor_.BeginFragment(length);
         if (!SendWithRetries(length)) {
             return false;
         }
-        if (start_ >= begin_) {
-            return true;
-        }
-        // An answer was lost, and with it where to go on: what went out was the start of the file,
-        // which the service knows. It has said where it really is; the fragment itself follows.
-        Believe();
-        return offset_ < begin_ || offset_ >= end_ || (GoBack() && SendWithRetries(end_ - offset_));
+        const long long rest = cursor_.RestOfFragment(Received(drive_.GetAPIHandler()));
+        return rest == 0 || (SeekToOffset() && SendWithRetries(rest));
     }
 
     /** Whether a file of a size that was guessed is no longer than that: closed, it would count as
@@ -164,13 +174,13 @@ class Fragments {
     /** What the service has stored short: the count of fragments is that of the file, so that what
      * is said again for one is missing at the end. Closed before, the session would be the file. */
     bool SendRest() {
-        while (offset_ < total_) {
-            const long long before = offset_;
-            LOG_ERROR("The service has %lld of %lld bytes", offset_, total_);
-            if (!Send(std::min<long long>(kMostAtOnce, total_ - offset_))) {
+        while (!cursor_.IsWhole()) {
+            const long long before = cursor_.Offset();
+            LOG_ERROR("The service has %lld of %lld bytes", before, total_);
+            if (!Send(std::min<long long>(kMostAtOnce, total_ - before))) {
                 return false;
             }
-            if (offset_ <= before) {
+            if (cursor_.Offset() <= before) {
                 drive_.SetError(VFS_ERR_TRANSFER_ABORTED, "");
                 return false;
             }
@@ -191,8 +201,8 @@ class Fragments {
             return JudgeRenewing(drive_, *xfer_.context, code, code == VFS_ERR_RANGE_FAILED);
         };
         plan.rewind = [this] {
-            Believe();
-            return GoBack();
+            cursor_.AdoptServerOffset(Received(drive_.GetAPIHandler()));
+            return SeekToOffset();
         };
         plan.copy = CopyError::kAtEnd;
         plan.retry = "Retry chunk upload";
@@ -209,27 +219,20 @@ class Fragments {
         return false;
     }
 
-    /** What the service has of a failed attempt it keeps, and a repeat goes that much further: but
-     * not beyond the file. */
     bool SendOnce(long long length) {
-        if (offset_ >= end_) {
-            return true;  // an answer was lost, and no bytes
+        const long long size = cursor_.BeginAttempt(length);
+        if (size == 0) {
+            return true;
         }
-        const long long size = std::min(length, total_ - offset_);
-        start_ = offset_;
-        position_ = offset_ + size;
-        return drive_.StartUpload(&xfer_, url_, session_, &offset_, size, total_);
+        long long offset = cursor_.Offset();
+        const bool done = drive_.StartUpload(&xfer_, url_, session_, &offset, size, total_);
+        cursor_.MoveTo(offset);
+        return done;
     }
 
-    /** Goes to where the service says it is, beyond what was repeated, but not beyond what has been
-     * sent. */
-    void Believe() {
-        offset_ = std::max(offset_, std::min(Received(drive_.GetAPIHandler()), end_));
-    }
-
-    bool GoBack() {
-        position_ = offset_;
-        if (SeekSource(xfer_.context->fd, source_begin_, offset_,
+    bool SeekToOffset() {
+        cursor_.SourceIsAtOffset();
+        if (SeekSource(xfer_.context->fd, source_begin_, cursor_.Offset(),
                        "Failed to seek file to back to last position, %m")) {
             return true;
         }
@@ -238,9 +241,9 @@ class Fragments {
     }
 
     /** The service has stored less than it was sent, and the next fragment begins there. */
-    bool GoOn() {
+    bool ReturnToOffset() {
         if (xfer_.context->fd != -1) {
-            return GoBack();
+            return SeekToOffset();
         }
         // What it lacks of a stream is gone, and what follows must not take its place.
         drive_.SetError(VFS_ERR_RANGE_FAILED, "");
@@ -254,11 +257,7 @@ class Fragments {
     const std::string& session_;
     const long long total_;
     const off64_t source_begin_;  ///< position of the file's first byte
-    long long offset_ = 0;        ///< bytes that the service has
-    long long begin_ = 0;         ///< of the fragment under way, in the file
-    long long end_ = 0;           ///< of the same
-    long long start_ = 0;         ///< where the last attempt began
-    long long position_ = 0;      ///< where the source stands behind the last fragment
+    FragmentCursor cursor_;
 };
 
 }  // namespace

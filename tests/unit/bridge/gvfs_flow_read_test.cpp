@@ -2,6 +2,7 @@
 #include "bridge/gvfs_flow_read.h"
 
 #include "bridge/handle.h"
+#include "core/loggable_url.h"
 #include "support/backend.h"
 
 namespace backend {
@@ -133,8 +134,8 @@ TEST_P(FlowRead, OfAFileThatVanishedFails) {
     EXPECT_EQ(Read(handle, 4), -1);
     EXPECT_NE(err, kUntouched);
     EXPECT_EQ(handle->position, 5);
-    EXPECT_TRUE(
-        seams::LoggedPart("Failed to download [" + handle->url + "] to buffer from:5, len:4"))
+    EXPECT_TRUE(seams::LoggedPart("Failed to download [" + ZYROVFS::LoggableUrl(handle->url) +
+                                  "] to buffer from:5, len:4"))
         << seams::LogDump();
 }
 

@@ -81,6 +81,21 @@ TEST_F(Callbacks, AReadCountsDownWhatIsLeftAndTellsTheProgress) {
     EXPECT_EQ(transfer.bytes_left, 0U);
 }
 
+TEST_F(Callbacks, ARetryThatSendsTheFileAgainDoesNotRunPastTheTotal) {
+    Put("source", Pattern(1500));
+    const UniqueFd fd = Open("source");
+    context_.fd = fd.Get();
+    ASSERT_EQ(lseek(fd.Get(), 500, SEEK_SET), 500);
+    transfer.source_end = 1500;
+    transfer.progress_cb = Progress;
+    EXPECT_EQ(Read(600), 600U);
+    ASSERT_EQ(lseek(fd.Get(), 500, SEEK_SET), 500);
+    EXPECT_EQ(Read(600), 600U);
+    EXPECT_EQ(Read(600), 400U);
+    EXPECT_THAT(progress_told, ElementsAre(std::pair(600ULL, 600ULL), std::pair(600ULL, 600ULL),
+                                           std::pair(400ULL, 1000ULL)));
+}
+
 TEST_F(Callbacks, ASpeedWithinWhatIsWantedLimitsAReadAndAnyOtherLeavesItAsItWas) {
     Put("source", Pattern(1000));
     const UniqueFd fd = Open("source");

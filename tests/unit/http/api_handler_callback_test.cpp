@@ -54,6 +54,16 @@ TEST(Callback, BodiesAreAppendedOrDropped) {
     EXPECT_EQ(APIHandler::MutedWriteCallback(piece, 2, 7, nullptr), 14U);
 }
 
+TEST(Callback, ABodyThatWouldGrowBeyondTheLongestAnswerEndsTheTransfer) {
+    std::string body(kLongestAnswer - 3, 'x');
+    char piece[] = "bcd";
+    EXPECT_EQ(APIHandler::WriteToStrBuf(piece, 1, 3, &body), 3U);
+    EXPECT_EQ(APIHandler::WriteToStrBuf(piece, 1, 1, &body), 0U);
+    EXPECT_EQ(body.size(), kLongestAnswer);
+    body += "more";
+    EXPECT_EQ(APIHandler::WriteToStrBuf(piece, 1, 1, &body), 0U);
+}
+
 TEST(Callback, TheDebugSinkKeepsTextAndNamesTheOthers) {
     std::string out;
     char text[] = "told";

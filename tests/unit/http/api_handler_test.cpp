@@ -258,6 +258,17 @@ TEST_F(Handler, AThrottledOneDriveIsLeftAloneAsLongAsItAsks) {
     EXPECT_THAT(seams::Sleeps(), ElementsAre(40, 0, 5));
 }
 
+TEST_F(Handler, ALongestSleepBoundsWhatAServiceMayOrder) {
+    const std::string years =
+        R"({"error":{"code":"request_throttled","message":"Wait 99999999 seconds."}})";
+    const wire::WireServer server({Once(wire::Answer(420, years)), Once(wire::Answer(420, years)),
+                                   Once(wire::Answer(503)), Once(wire::Answer(200))});
+    Conversation<OneDriveErrorHandler> talk(false);
+    talk.api.SetLongestSleep(30);
+    EXPECT_TRUE(talk.Get(server.Url(), 6));
+    EXPECT_THAT(seams::Sleeps(), ElementsAre(30, 30, 5));
+}
+
 TEST_F(Handler, AResolveFailureOnTheThirdAttemptTurnsIpv4OnlyOnForAttemptsFourOnward) {
     for (const CURLcode code : {CURLE_COULDNT_RESOLVE_PROXY, CURLE_COULDNT_RESOLVE_HOST}) {
         Conversation<> talk;

@@ -188,20 +188,11 @@ TEST_F(UserList, WithoutABindingThereAreNoOthers) {
     EXPECT_EQ(Enum(0, -1, kAll).total, 5);
 }
 
-TEST_F(UserList, BindingIsReadFromTheNameServiceSwitch) {
-    const auto bound = [](const char* line) {
+TEST_F(UserList, UsersOfADirectoryServerAreNotWaitedFor) {
+    for (const char* line : {"passwd: files ldap", "passwd:\tfiles sss [NOTFOUND=return]", ""}) {
         std::ofstream("/etc/nsswitch.conf") << line << '\n';
-        return ZYROLDAPIsBinded();
-    };
-    EXPECT_EQ(bound("passwd: files ldap"), 1);
-    EXPECT_EQ(bound("passwd:\tfiles sss [NOTFOUND=return]"), 1);
-    EXPECT_EQ(bound("passwd: files winbind"), 0);
-    EXPECT_EQ(bound("passwd: files # ldap"), 0);
-    EXPECT_EQ(bound("group: files ldap"), 0);
-    EXPECT_EQ(bound("passwd: ldapx"), 0);
-    EXPECT_EQ(bound(""), 0);
-    std::filesystem::remove("/etc/nsswitch.conf");
-    EXPECT_EQ(ZYROLDAPIsBinded(), 0);
+        EXPECT_EQ(ZYROLDAPIsBinded(), 0) << line;
+    }
 }
 
 TEST_F(UserList, DirectoryServersAndDomainsAddTheirUsers) {
@@ -212,7 +203,6 @@ TEST_F(UserList, DirectoryServersAndDomainsAddTheirUsers) {
     std::ofstream("/etc/winbind.passwd") << accounts::UserLine("OFFICE\\dora", 30001) << '\n'
                                          << accounts::UserLine("LAB\\dirk", 30002) << '\n';
     accounts::BindToServices("ldap winbind");
-    EXPECT_EQ(ZYROLDAPIsBinded(), 1);
     EXPECT_THAT(Enum(0, -1, ZOS_AUTH_LDAP).names, ElementsAre("lena"));
     EXPECT_THAT(Enum(0, -1, ZOS_AUTH_DOMAIN).names, ElementsAre("LAB\\dirk", "OFFICE\\dora"));
     EXPECT_THAT(Enum(0, -1, ZOS_AUTH_DOMAIN, "office").names, ElementsAre("OFFICE\\dora"));

@@ -65,6 +65,19 @@ TEST_F(Permission, NobodyPassesAsAnAdministratorWhileADirectoryServiceDoesNotAns
     EXPECT_EQ(Rule(kCleo), PERMISSION_NO_GROUPS) << "a no that tells why";
 }
 
+TEST_F(Permission, IsAskedOfADamagedPolicyWithoutLeavingTheCallerAtRoot) {
+    Put("cut");
+    const policy::EffectiveUser user(kAmy);
+    EXPECT_FALSE(CheckPermissionByUID(kAmy, kAsk, nullptr));
+    EXPECT_EQ(geteuid(), kAmy);
+    EXPECT_FALSE(CheckPermissionByBelongingGID(kAmy, kAsk, nullptr));
+    EXPECT_EQ(geteuid(), kAmy);
+    EXPECT_FALSE(CheckPermissionByUserName("amy", kAsk, nullptr));
+    EXPECT_EQ(geteuid(), kAmy);
+    EXPECT_FALSE(ExplainPermission(kAmy, kAsk, nullptr).allowed);
+    EXPECT_EQ(geteuid(), kAmy);
+}
+
 TEST_F(Permission, AdministratorCannotBeShutOutByTheOwnEntry) {
     Put(R"({"user_enabled_type":"custom","user_settings":{"4004":{"enabled":false}}})");
     EXPECT_TRUE(May(kRoot));

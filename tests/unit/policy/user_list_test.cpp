@@ -148,14 +148,11 @@ TEST_F(List, IdsThatTheEnumerationLacksAreLookedUpByName) {
                 ElementsAre("administrators on fixed", "painters on", "rowers off", "users off"));
 }
 
-TEST_F(List, NamesThatCannotBeLookedUpHaveNoId) {
+TEST_F(List, OfLdapNeedsNoListOfItsOwnAndNamesThatCannotBeLookedUpHaveNoId) {
     std::ofstream("/etc/ldap.passwd") << accounts::UserLine("lena", 20001) << '\n';
     std::ofstream("/etc/ldap.group") << accounts::GroupLine("choir", 20002) << '\n';
     accounts::BindToServices("ldap");
     failing_directory::no_ids = true;
-    std::filesystem::create_directories("/usr/zyro/etc/private");
-    std::ofstream(paths::kLdapUserList) << "";
-    std::ofstream(paths::kLdapGroupList) << "";
     Query query;
     query.auth_type = "ldap";
     ASSERT_TRUE(Ask(query));

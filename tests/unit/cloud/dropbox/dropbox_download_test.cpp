@@ -9,6 +9,9 @@ constexpr const char* kLook =
 
 const std::string kThere = Answer(200, R"({"path":"/a.txt","is_dir":false})");
 
+/** What the content side says of a path that it does not know. */
+const std::string kNotYet = Refusal(R"({".tag":"path","path":{".tag":"not_found"}})");
+
 std::string Part(const std::string& body, const std::string& range) {
     return wire::Answer(206, body, "Connection: close\r\nContent-Range: bytes " + range + "\r\n");
 }
@@ -101,7 +104,7 @@ TEST_F(DropboxDownload, ThatTheServiceRefusesHasTheCodeOfTheStatusAndLeavesNoByt
                 {Answer(401), VFS_ERR_UNAUTHORIZED},
                 {Answer(403), VFS_ERR_UNKNOWN},
                 {Answer(404), VFS_ERR_UNKNOWN},
-                {kNotFound, VFS_ERR_BAD_REQUEST},
+                {Refusal(R"({".tag":"unsupported_file"})"), VFS_ERR_BAD_REQUEST},
                 {Answer(416), VFS_ERR_UNKNOWN},
                 {Answer(507), VFS_ERR_QUOTA_EXCEEDED}};
     for (const auto& row : rows) {
@@ -192,22 +195,15 @@ TEST_F(DropboxDownload, GoesOnWhereItBrokeOff) {
     EXPECT_EQ(lseek(bytes_.file.Get(), 0, SEEK_CUR), 3000000);
 }
 
-/** A content side that does not know the file yet, in the words that reach the driver. */
-class DropboxFreshFile : public DropboxDownload {
-  protected:
-    void SetUp() override {
-        DropboxDownload::SetUp();
-        // Its 404 stands for "not found" also where the answer comes without its body.
-        drive->GetAPIHandler()->SetErrorHandler(new BoxErrorHandler);
-    }
-};
+// --- a file that was just created, which the content side does not have yet
+// -----------------------
 
-TEST_F(DropboxFreshFile, ADownloadOfAFileThatWasJustCreatedWaitsThirteenSecondsPerTryUpToSixTries) {
+TEST_F(DropboxDownload, OfAFileThatWasJustCreatedWaitsThirteenSecondsPerTryUpToSixTries) {
     std::vector<std::string> answers;
     std::vector<std::string> requests;
     std::vector<unsigned> sleeps;
     for (int i = 0; i < 6; ++i) {
-        answers.insert(answers.end(), {Answer(404), kThere});
+        answers.insert(answers.end(), {kNotYet, kThere});
         requests.insert(requests.end(), {kDownload, kLook});
         sleeps.insert(sleeps.end(), {3, 10});
     }
@@ -222,24 +218,43 @@ TEST_F(DropboxFreshFile, ADownloadOfAFileThatWasJustCreatedWaitsThirteenSecondsP
     }
     EXPECT_TRUE(
         seams::LoggedPart("Failed to process curl " + ContentHost() + "/2/files/download, err:{"));
+    EXPECT_EQ(bytes_.received, "");
 }
 
-TEST_F(DropboxFreshFile, ADownloadGetsTheFileOnceTheContentSideHasIt) {
-    Give({Answer(404), kThere, Answer(200, "hello")});
+TEST_F(DropboxDownload, GetsTheFileOnceTheContentSideHasIt) {
+    Give({kNotYet, kThere, Answer(200, "hello")});
     EXPECT_TRUE(Download()) << seams::LogDump();
     EXPECT_EQ(bytes_.received, "hello");
     EXPECT_THAT(seams::Sleeps(), ElementsAre(3, 10));
 }
 
-TEST_F(DropboxFreshFile, ADownloadOfWhatIsTrulyGoneEnds) {
-    Give({Answer(404), Answer(404)});
-    EXPECT_FALSE(Download());
-    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_NOT_FOUND);
-    EXPECT_THAT(Requests(), ElementsAre(kDownload, kLook));
-    EXPECT_THAT(seams::Sleeps(), ElementsAre(3));
-    Give({Answer(404), Answer(200, R"({"is_deleted":true})")});
-    EXPECT_FALSE(Download());
+TEST_F(DropboxDownload, OfWhatIsTrulyGoneEndsBehindOneLook) {
+    for (const std::string& look : {kNotFound, Answer(200, R"({"is_deleted":true})")}) {
+        Give({kNotYet, look});
+        seams::Reset();
+        drive->SetError(VFS_ERR_NONE, "");
+        EXPECT_FALSE(Download());
+        EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_NOT_FOUND);
+        EXPECT_THAT(Requests(), ElementsAre(kDownload, kLook));
+        EXPECT_THAT(seams::Sleeps(), ElementsAre(3));
+    }
     EXPECT_TRUE(seams::Logged("This file(/a.txt) is the trash")) << seams::LogDump();
+}
+
+TEST_F(DropboxDownload, ThatIsRefusedWhileTheServiceIsAwayTellsThatAndNotThatTheFileIsGone) {
+    Give({kNotYet, Answer(401)});
+    EXPECT_FALSE(Download());
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_UNAUTHORIZED);
+}
+
+TEST_F(DropboxDownload, ThatIsRefusedForAnotherReasonIsNotWaitedFor) {
+    const std::string reason = R"({".tag":"path","path":{".tag":"restricted_content"}})";
+    Give({Refusal(reason)});
+    EXPECT_FALSE(Download());
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_BAD_REQUEST);
+    EXPECT_THAT(Requests(), ElementsAre(kDownload));
+    EXPECT_THAT(seams::Sleeps(), IsEmpty());
+    EXPECT_THAT(drive->GetError()["msg"].asString(), HasSubstr("restricted_content"));
 }
 
 }  // namespace
