@@ -5,6 +5,8 @@
 namespace ZYROVFS {
 namespace {
 
+constexpr const char* kVariable = "DBUS_SESSION_BUS_ADDRESS";
+
 struct Told {
     uid_t uid = 0;
     std::string address;
@@ -19,11 +21,13 @@ Told& LastTold() {
 
 bool SetBusAddress(uid_t uid, const std::string& address) {
     LastTold() = {uid, address};
-    return setenv("DBUS_SESSION_BUS_ADDRESS", address.c_str(), 1) == 0;
+    return setenv(kVariable, address.c_str(), 1) == 0;
 }
 
 std::string ToldBusAddress(uid_t uid) {
-    return LastTold().uid == uid ? LastTold().address : std::string();
+    const char* now = getenv(kVariable);
+    const Told& told = LastTold();
+    return told.uid == uid && now != nullptr && told.address == now ? told.address : std::string();
 }
 
 }  // namespace ZYROVFS
