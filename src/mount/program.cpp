@@ -239,9 +239,9 @@ pid_t Launch(const Program& program, uid_t uid, void (*become)(const Start&), To
 std::vector<std::string> UserEnvironment(uid_t uid) {
     // A proxy's names are those of the platform's resolver, which answers backends that ask.
     constexpr std::array kKept = {
-        "LANG",        "LC_ALL",     "LC_CTYPE",  "LC_MESSAGES", "TZ",       "http_proxy",
-        "https_proxy", "ftp_proxy",  "all_proxy", "no_proxy",    "HTTPS_PROXY", "FTP_PROXY",
-        "ALL_PROXY",   "NO_PROXY",
+        "LANG",        "LC_ALL",      "LC_CTYPE",  "LC_MESSAGES", "TZ",
+        "http_proxy",  "https_proxy", "ftp_proxy", "all_proxy",   "no_proxy",
+        "HTTPS_PROXY", "FTP_PROXY",   "ALL_PROXY", "NO_PROXY",
     };
     std::vector<std::string> environment = {
         "PATH=/usr/local/sbin:/usr/local/bin:/usr/sbin:/usr/bin:/sbin:/bin",

@@ -89,7 +89,8 @@ pid_t StartHelper(const char* job, uid_t uid, const Ends& talk, const Ends& repo
         SetErr(VFS_ERR_FAILED, at);
         return -1;
     }
-    Program helper{{path, job}, UserEnvironment(uid), {talk.helpers.Get(), report.helpers.Get(), -1}};
+    Program helper{
+        {path, job}, UserEnvironment(uid), {talk.helpers.Get(), report.helpers.Get(), -1}};
     if (lock.fd >= 0) {
         helper.descriptors.push_back(lock.fd);
     }

@@ -1,7 +1,7 @@
 /**
  * Work that only the user may do runs in a program of its own: mount, unmount, path lookup, launch
- * of the fuse daemon, repair of its mount point. Whatever the calling process has done with GIO, its
- * threads, signals, descriptors and environment stays behind there.
+ * of the fuse daemon, repair of its mount point. Whatever the calling process has done with GIO,
+ * its threads, signals, descriptors and environment stays behind there.
  */
 #ifndef ZYROVFS_MOUNT_RUN_AS_USER_H
 #define ZYROVFS_MOUNT_RUN_AS_USER_H

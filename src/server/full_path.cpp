@@ -92,40 +92,37 @@ bool AskGio(const char* uri, std::string& full) {
     return true;
 }
 
-/** A lookup that finds nothing answers with nothing. */
+/**
+ * In the helper. A lookup that finds nothing answers with nothing, and a helper that could not
+ * become the user ends with 1.
+ */
+void AskGioJob(const Json::Value& request) {
+    if (!BecomeUserInHelper(UserOf(request))) {
+        EndHelper(1);
+    }
+    std::string full;
+    EndHelper(AskGio(request["uri"].asCString(), full) && !WriteAll(STDOUT_FILENO, full) ? 1 : 0);
+}
+
 bool LookUp(const Json::Value& request) {
     const std::string remote = request["remote"].asString();
     const std::string uri = request["id"].asString() + (remote.empty() ? "" : "/" + remote);
-    const bool asked_gio_only = !request.isMember("may_connect");
-    connecting_on_demand = !request["may_connect"].asBool();
     std::string full;
-    if (!AskGio(uri.c_str(), full) &&
-        (asked_gio_only || !GetFullPathByConfig(uri.c_str(), full))) {
-        if (!asked_gio_only) {
-            LOG_ERROR("Failed to get full path, %s", uri.c_str());
-        }
+    if (!AskGio(uri.c_str(), full) && !GetFullPathByConfig(uri.c_str(), full)) {
+        LOG_ERROR("Failed to get full path, %s", uri.c_str());
         return false;
     }
     return WriteAll(STDOUT_FILENO, remote.empty() ? full : full + "\n" + remote);
 }
 
-void RunLookUp(const Json::Value& request) {
+void LookUpJob(const Json::Value& request) {
     if (!BecomeUserInHelper(UserOf(request))) {
         EndHelper(1);
     }
+    connecting_on_demand = request["connecting"].asBool();
     NoThrow(VFS_ERR_FAILED, [&] { return LookUp(request); });
     EndHelper(0);
 }
-
-}  // namespace
-}  // namespace ZYROVFS::Utils
-
-namespace ZYROVFS {
-const HelperJob kLookUpJob = {"look-up", Utils::RunLookUp};
-}  // namespace ZYROVFS
-
-namespace ZYROVFS::Utils {
-namespace {
 
 /**
  * A process whose every id is the user's, such as a backend, asks by itself. With root's identity
@@ -144,10 +141,9 @@ bool AskGioAsUser(const char* uri, std::string& full) {
         return AskGio(uri, full);
     }
     Json::Value request(Json::objectValue);
-    request["id"] = uri;
-    request["remote"] = "";
+    request["uri"] = uri;
     const SigchldGuard collectable;
-    const HelperRun run = RunAsUser(kLookUpJob.name, GetActorUID(), request, ReadLastPiece);
+    const HelperRun run = RunAsUser(kAskGioJob.name, GetActorUID(), request, ReadLastPiece);
     if (run.Result() != 0 || run.report.empty()) {
         return false;
     }
@@ -160,7 +156,7 @@ bool LookUpInHelper(unsigned int uid, const std::string& id, const std::string& 
     Json::Value request(Json::objectValue);
     request["id"] = id;
     request["remote"] = remote;
-    request["may_connect"] = !connecting_on_demand;
+    request["connecting"] = connecting_on_demand;
     const SigchldGuard collectable;
     const HelperRun run = RunAsUser(kLookUpJob.name, uid, request, ReadLastPiece);
     if (run.how != HelperRun::kEnded) {
@@ -239,3 +235,10 @@ bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const
 }
 
 }  // namespace ZYROVFS::Utils
+
+namespace ZYROVFS {
+
+const HelperJob kAskGioJob = {"ask-gio", Utils::AskGioJob};
+const HelperJob kLookUpJob = {"look-up", Utils::LookUpJob};
+
+}  // namespace ZYROVFS

@@ -5,8 +5,8 @@
 namespace ZYROVFS {
 
 void RunHelper(const char* job) {
-    for (const HelperJob* row : {&kMountJob, &kUnmountJob, &kLookUpJob, &kLaunchFuseJob,
-                                 &kRepairMountPointJob}) {
+    for (const HelperJob* row : {&kMountJob, &kUnmountJob, &kAskGioJob, &kLookUpJob,
+                                 &kLaunchFuseJob, &kRepairMountPointJob}) {
         if (strcmp(row->name, job) == 0) {
             RunHelperJob(*row);
         }

@@ -6,6 +6,8 @@
 
 namespace ZYROVFS {
 
+/** GIO's path of a URI; and the whole lookup, which may connect on demand. */
+extern const HelperJob kAskGioJob;
 extern const HelperJob kLookUpJob;
 
 /** Runs the job of this name, as RunAsUser has asked for it. Returns only for an unknown name. */

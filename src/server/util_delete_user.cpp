@@ -124,8 +124,8 @@ void RemoveFiles(unsigned int uid, bool removeProfiles, bool removeRuntime) {
 }
 
 void CleanUp(unsigned int uid, bool removeProfiles, bool removeRuntime) {
-    // As root the process acts for whom the environment names; as a user, for itself alone: it would
-    // take its own lock and end its own mounts for those of the one who goes.
+    // As root the process acts for whom the environment names; as a user, for itself alone: it
+    // would take its own lock and end its own mounts for those of the one who goes.
     const EffectiveUid as_root(geteuid() == uid ? uid : 0);
     setenv("ZYROVFS_UID", std::to_string(uid).c_str(), 1);
     // A process that has acted for somebody else knows that user's bus, and would look there for

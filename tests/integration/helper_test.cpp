@@ -1,5 +1,6 @@
 // The helper program of the shipped library, under callers of every kind: what it is given and what
 // not, with whom it ends, and that its answer is known.
+#include <fcntl.h>
 #include <gio/gio.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -144,8 +145,7 @@ TEST(Helper, HasTheUsersOwnBusInItsEnvironmentAndNothingOfTheCallers) {
     });
     const std::string environment = Proc(mount.Helper(), "environ");
     ASSERT_THAT(environment, HasSubstr("XDG_RUNTIME_DIR=/var/tmp/user/4001\n"));
-    EXPECT_THAT(environment,
-                HasSubstr("DBUS_SESSION_BUS_ADDRESS=" + machine::Read(kBusPath)));
+    EXPECT_THAT(environment, HasSubstr("DBUS_SESSION_BUS_ADDRESS=" + machine::Read(kBusPath)));
     EXPECT_THAT(environment, Not(HasSubstr("trap")));
     EXPECT_THAT(environment, Not(HasSubstr("HTTP_COOKIE")));
 }
@@ -205,14 +205,15 @@ TEST(Caller, ThatHasUsedGioItselfCanMountAndUnmount) {
                   std::string owner;
                   std::string group;
                   unsigned mode = 0;
-                  Utils::GetFileInfo((std::string(kFtp) + "/hello.txt").c_str(), owner, group, mode);
+                  Utils::GetFileInfo((std::string(kFtp) + "/hello.txt").c_str(), owner, group,
+                                     mode);
                   GFile* file = g_file_new_for_uri(kFtp);
                   char* path = g_file_get_path(file);
                   const bool used = path != nullptr;
                   g_free(path);
                   g_object_unref(file);
-                  return used && Disconnect(kAmy, kFtp) == 0 && !IsMounted() &&
-                         ConnectFtp() == 0 && Eventually(IsMounted);
+                  return used && Disconnect(kAmy, kFtp) == 0 && !IsMounted() && ConnectFtp() == 0 &&
+                         Eventually(IsMounted);
               }),
               0);
     Forget();
@@ -226,16 +227,15 @@ TEST(Caller, WhoseEffectiveUserIsTheUserGetsALocationConnectedOnDemand) {
     EXPECT_EQ(InCaller([] {
                   std::string full;
                   const std::string uri = std::string(kFtp) + "/hello.txt";
-                  return InitGlobal(kAmy, false) && setresuid(static_cast<uid_t>(-1), kAmy, 0) == 0 &&
+                  return InitGlobal(kAmy, false) &&
+                         setresuid(static_cast<uid_t>(-1), kAmy, 0) == 0 &&
                          Utils::GetFullPath(uri.c_str(), full) && full == kFile &&
                          Eventually(IsMounted);
               }),
               0);
     Forget();
-    EXPECT_EQ(InProcess([] {
-                  return Server::Delete(kAmy, Server::VFS_CONFIG_SERVER, kFtp) ? 0 : 1;
-              }),
-              0);
+    EXPECT_EQ(
+        InProcess([] { return Server::Delete(kAmy, Server::VFS_CONFIG_SERVER, kFtp) ? 0 : 1; }), 0);
 }
 
 void CollectAll(int) {
@@ -308,19 +308,18 @@ TEST(Caller, ThatCleansUpBehindOneUserMountsTheNextUsersServersAsThatUser) {
 }
 
 TEST(Caller, WithoutTheHelperIsToldSo) {
-    const std::string helper = machine::BuildDir() + "/libexec/zyrovfs/zyrovfs-helper";
+    const std::string helper = BuildDir() + "/libexec/zyrovfs/zyrovfs-helper";
     Must("mv " + helper + " " + helper + ".away");
     EXPECT_EQ(InProcess([] { return InitGlobal(kAmy, false) ? ConnectFtp() : 100; }),
               VFS_ERR_FAILED);
-    EXPECT_THAT(machine::Run(machine::BuildDir() + "/tools/zyrovfs/zyrovfs host check --build " +
-                             machine::BuildDir())
-                    .output,
-                HasSubstr("zyrovfs-helper"));
+    EXPECT_THAT(
+        machine::Run(BuildDir() + "/tools/zyrovfs/zyrovfs host check --build " + BuildDir()).output,
+        HasSubstr("zyrovfs-helper"));
     Must("mv " + helper + ".away " + helper);
 }
 
 TEST(Caller, WhoIsRootDoesNotRunAHelperThatOthersMayChange) {
-    const std::string helper = machine::BuildDir() + "/libexec/zyrovfs/zyrovfs-helper";
+    const std::string helper = BuildDir() + "/libexec/zyrovfs/zyrovfs-helper";
     for (const char* spoil : {"chmod 0777 ", "chown 4002 "}) {
         Must(spoil + helper);
         EXPECT_EQ(InProcess([] { return InitGlobal(kAmy, false) ? ConnectFtp() : 100; }),

@@ -133,8 +133,8 @@ TEST(StaleChain, IsEndedAndStartedAnewByTheSameProcess) {
                   Json::Value out;
                   // The daemon in its place never answers: the one recovery cannot end it, and the
                   // failure is told; once it is gone, the next mount brings all up.
-                  const bool first = Server::Add(kAmy, Server::VFS_CONFIG_CONNECT, id, profile,
-                                                 false, out);
+                  const bool first =
+                      Server::Add(kAmy, Server::VFS_CONFIG_CONNECT, id, profile, false, out);
                   const bool recovered = PidOf(kBus) != bus;
                   kill(idle, SIGKILL);
                   waitpid(idle, nullptr, 0);

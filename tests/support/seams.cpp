@@ -202,7 +202,8 @@ time_t time(time_t* out) {
     return now;
 }
 
-/** The coarse clock is the one by which waits are bounded: here it goes on with the pauses alone. */
+/** The coarse clock is the one by which waits are bounded: here it goes on with the pauses alone.
+ */
 int clock_gettime(clockid_t clock, timespec* out) {
     if (clock != CLOCK_MONOTONIC_COARSE) {
         return static_cast<int>(syscall(SYS_clock_gettime, clock, out));
@@ -314,6 +315,10 @@ std::vector<std::string> IdentityCalls() {
 
 void FailIdentity(const std::string& function, int error, int after) {
     Get().failures[function] = {error, after};
+}
+
+void PassTime(long microseconds) {
+    Get().slept += microseconds;
 }
 
 void SetTime(time_t now) {
