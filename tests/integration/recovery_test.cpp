@@ -4,7 +4,8 @@
 #include <signal.h>
 
 #include <algorithm>
-#include <cctype>
+#include <cerrno>
+#include <iterator>
 
 #include "support/machine.h"
 #include "zyrovfs/zyrovfs_netdrive.h"
@@ -62,6 +63,20 @@ bool Works(const Json::Value& profile) {
     return Eventually([&] { return machine::Read(file) == "hello from the remote side\n"; });
 }
 
+/** Ends daemons at once. One may follow another before its turn comes. */
+bool End(const std::vector<Daemon>& daemons) {
+    std::vector<pid_t> pids;
+    std::transform(daemons.begin(), daemons.end(), std::back_inserter(pids), PidOf);
+    for (const pid_t pid : pids) {
+        if (pid < 2 || (kill(pid, SIGKILL) != 0 && errno != ESRCH)) {
+            return false;
+        }
+    }
+    return Eventually([&] {
+        return std::all_of(pids.begin(), pids.end(), [](pid_t pid) { return kill(pid, 0) != 0; });
+    });
+}
+
 class Recovery : public testing::TestWithParam<std::vector<Daemon>> {};
 
 TEST_P(Recovery, OfAProcessThatWasReadyBefore) {
@@ -72,12 +87,8 @@ TEST_P(Recovery, OfAProcessThatWasReadyBefore) {
                   if (!Works(first) || !Works(second)) {
                       return 1;
                   }
-                  for (const Daemon& daemon : GetParam()) {
-                      const pid_t pid = PidOf(daemon);
-                      if (pid < 2 || kill(pid, SIGKILL) != 0 ||
-                          !Eventually([pid] { return kill(pid, 0) != 0; })) {
-                          return 2;
-                      }
+                  if (!End(GetParam())) {
+                      return 2;
                   }
                   if (!Works(first)) {
                       return 3;
@@ -105,44 +116,61 @@ INSTANTIATE_TEST_SUITE_P(All, Recovery,
                              return name;
                          });
 
-/** A chain whose fuse daemon has lost its registration: mounts work and have no local path. */
-TEST(StaleChain, IsEndedAndStartedAnewByTheSameProcess) {
-    EXPECT_EQ(InProcess([] {
-                  alarm(100);
-                  const Json::Value profile = Profile("ftp", 2121);
-                  if (!Works(profile)) {
-                      return 1;
-                  }
-                  const pid_t bus = PidOf(kBus);
-                  const pid_t fuse = PidOf(kFuse);
-                  // It lives, by pid, name and owner, and does nothing for anybody.
-                  machine::Must("cp /bin/sleep /tmp/gvfsd-fuse");
-                  const pid_t idle = fork();
-                  if (idle == 0) {
-                      if (setresuid(kAmy, kAmy, kAmy) == 0) {
-                          execl("/tmp/gvfsd-fuse", "gvfsd-fuse", "100", nullptr);
-                      }
-                      _exit(1);
-                  }
-                  kill(fuse, SIGKILL);
-                  machine::Must("umount -l /var/tmp/user/4001/gvfs");
-                  machine::Must("echo " + std::to_string(idle) + " > " + kFuse.pid_file);
-                  kill(PidOf(kGvfsd), SIGKILL);
-                  const bool failed = !Eventually([] { return kill(PidOf(kGvfsd), 0) != 0; });
-                  std::string id;
-                  Json::Value out;
-                  // The daemon in its place never answers: the one recovery cannot end it, and the
-                  // failure is told; once it is gone, the next mount brings all up.
-                  const bool first =
-                      Server::Add(kAmy, Server::VFS_CONFIG_CONNECT, id, profile, false, out);
-                  const bool recovered = PidOf(kBus) != bus;
-                  kill(idle, SIGKILL);
-                  waitpid(idle, nullptr, 0);
-                  return failed || first || !recovered || GetError() != VFS_ERR_FAILED ? 2
-                         : Works(profile)                                              ? 0
-                                                                                       : 3;
-              }),
-              0);
+/** A process that passes for the fuse daemon, and does nothing for anybody. */
+class IdleFuse {
+  public:
+    IdleFuse() {
+        machine::Must("cp /bin/sleep /tmp/gvfsd-fuse");
+        pid_ = fork();
+        if (pid_ == 0) {
+            if (setresuid(kAmy, kAmy, kAmy) == 0) {
+                execl("/tmp/gvfsd-fuse", "gvfsd-fuse", "100", nullptr);
+            }
+            _exit(1);
+        }
+        machine::Must("echo " + std::to_string(pid_) + " > " + kFuse.pid_file);
+    }
+    IdleFuse(const IdleFuse&) = delete;
+    IdleFuse& operator=(const IdleFuse&) = delete;
+    ~IdleFuse() {
+        kill(pid_, SIGKILL);
+        waitpid(pid_, nullptr, 0);
+    }
+
+  private:
+    pid_t pid_;
+};
+
+/** Mounts work and have no local path, since nobody shows them. */
+TEST(StaleChain, IsEndedOnceAndItsSuccessorServesTheSameProcess) {
+    EXPECT_EQ(
+        InProcess([] {
+            alarm(100);
+            const Json::Value profile = Profile("ftp", 2121);
+            std::string id = "ftp://remo@127.0.0.1:2121";
+            if (!Works(profile) || !Server::Delete(kAmy, Server::VFS_CONFIG_CONNECT, id.c_str())) {
+                return 1;
+            }
+            const pid_t bus = PidOf(kBus);
+            if (!End({kFuse})) {
+                return 2;
+            }
+            machine::Must("umount -l /var/tmp/user/4001/gvfs");
+            {
+                const IdleFuse idle;
+                Json::Value out;
+                id.clear();
+                if (Server::Add(kAmy, Server::VFS_CONFIG_CONNECT, id, profile, false, out) ||
+                    GetError() != VFS_ERR_FAILED) {
+                    return 3;
+                }
+            }
+            if (PidOf(kBus) == bus || kill(PidOf(kBus), 0) != 0) {
+                return 4;
+            }
+            return Works(profile) ? 0 : 5;
+        }),
+        0);
 }
 
 }  // namespace
