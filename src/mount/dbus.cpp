@@ -14,6 +14,7 @@
 #include "mount/daemon.h"
 #include "mount/glib_handle.h"
 #include "mount/program.h"
+#include "mount/user_environment.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"

@@ -21,6 +21,7 @@
 #include "mount/helper.h"
 #include "mount/program.h"
 #include "mount/run_as_user.h"
+#include "mount/user_environment.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"

@@ -5,6 +5,7 @@
 #include "core/paths.h"
 #include "mount/daemon.h"
 #include "mount/program.h"
+#include "mount/user_environment.h"
 #include "zyrovfs/vfs.h"
 
 namespace ZYROVFS {

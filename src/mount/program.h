@@ -21,12 +21,6 @@ struct Program {
 };
 
 /**
- * The environment of whatever runs for a user: the user's own runtime folder and session bus, the
- * language and the proxies of the caller, and nothing else.
- */
-std::vector<std::string> UserEnvironment(uid_t uid);
-
-/**
  * Starts a child of this process, which has root's identity in full if this one can have it, and
  * its own otherwise. Its pid, or -1 with errno; then there is nothing to collect.
  */

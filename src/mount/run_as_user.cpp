@@ -14,6 +14,7 @@
 #include "mount/helper_path.h"
 #include "mount/lock.h"
 #include "mount/program.h"
+#include "mount/user_environment.h"
 
 namespace ZYROVFS {
 namespace {

@@ -9,10 +9,10 @@
 
 #include <csignal>
 
-#include "core/bus_address.h"
 #include "core/fd_io.h"
 #include "core/handle.h"
 #include "mount/fork_as_user.h"
+#include "mount/user_environment.h"
 #include "support/fake_daemons.h"
 #include "support/seams.h"
 #include "zyrovfs/global.h"
