@@ -68,7 +68,7 @@ std::string Find(const std::string& library) {
     const std::string folder = library.substr(0, name);
     // The second is where a build tree has it; there, the library is at the top.
     for (const char* below : {ZYROVFS_HELPER_FROM_LIBRARY, "libexec/zyrovfs/zyrovfs-helper"}) {
-        const std::string path = folder.empty() ? std::string() : Resolve(folder + below);
+        std::string path = folder.empty() ? std::string() : Resolve(folder + below);
         if (!path.empty()) {
             return path;
         }

@@ -55,16 +55,12 @@ void TakeDescriptors(const Start& start) {
 
 /** Real and effective ids that differ make the loader and GLib distrust the environment, and the
  * new program loses the saved one. */
-void LevelIds() {
+bool LevelIds() {
     if (geteuid() != 0) {
-        return;
+        return true;
     }
-    if (getgid() != getegid()) {
-        setregid(getegid(), getegid());
-    }
-    if (getuid() != 0) {
-        setreuid(0, 0);
-    }
+    return (getgid() == getegid() || setregid(getegid(), getegid()) == 0) &&
+           (getuid() == 0 || setreuid(0, 0) == 0);
 }
 
 [[noreturn]] void Execute(const Start& start) {
@@ -78,7 +74,9 @@ void BecomeChild(const Start& start) {
     ResetSignals();
     TakeDescriptors(start);
     RegainRoot();
-    LevelIds();
+    if (!LevelIds()) {
+        Fail(start);
+    }
     Execute(start);
 }
 

@@ -152,7 +152,7 @@ TEST(StaleChain, IsEndedOnceAndItsSuccessorServesTheSameProcess) {
                 return 1;
             }
             const pid_t bus = PidOf(kBus);
-            if (!End({kFuse})) {
+            if (!End({kGvfsd, kFuse})) {
                 return 2;
             }
             machine::Must("umount -l /var/tmp/user/4001/gvfs");
