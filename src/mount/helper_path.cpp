@@ -8,6 +8,7 @@
 #include <cstdlib>
 
 #include "core/handle.h"
+#include "core/identity.h"
 
 namespace ZYROVFS {
 namespace {
@@ -57,7 +58,7 @@ bool IsTrusted(const std::string& path, uid_t owner) {
 /** Links resolved; empty when there is no such program. */
 std::string Resolve(const std::string& path) {
     const UniqueCString found(realpath(path.c_str(), nullptr));
-    return found != nullptr && access(found.get(), X_OK) == 0 ? found.get() : std::string();
+    return found != nullptr && eaccess(found.get(), X_OK) == 0 ? found.get() : std::string();
 }
 
 std::string Find(const std::string& library) {
@@ -79,6 +80,7 @@ std::string Find(const std::string& library) {
 }  // namespace
 
 std::string HelperPath() {
+    const EffectiveUid as_root(0);  // a user may not be able to enter the folders on the way
     const std::string library = LibraryPath();
     std::string path = Find(library);
     if (path.empty()) {

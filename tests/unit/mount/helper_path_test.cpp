@@ -65,6 +65,15 @@ TEST_F(HelperFile, IsNotRunByWhoeverCanBeRootAgain) {
               0);
 }
 
+TEST_F(HelperFile, IsFoundWhereTheEffectiveUserMayNotGo) {
+    chmod(folder_.c_str(), 0700);
+    EXPECT_EQ(
+        scratch::InChild([this] {
+            return setresuid(0, 4001, 0) == 0 && HelperPath() == path_ && geteuid() == 4001 ? 0 : 1;
+        }),
+        0);
+}
+
 TEST_F(HelperFile, IsTheUsersOwnRiskInAProcessWithoutRoot) {
     chmod(path_.c_str(), 0777);
     EXPECT_EQ(scratch::InChild(
