@@ -27,7 +27,8 @@ ZYROVFS_API uid_t GetActorUID();
  * gvfsd-fuse are up; the environment (ZYROVFS_UID, XDG_RUNTIME_DIR, DBUS_SESSION_BUS_ADDRESS)
  * stays set to that user. For callers with effective or saved root identity.
  *
- * Once it has succeeded in a process, later calls without `force` answer true at once. With
+ * Once it has succeeded in a process, later calls without `force` for the same user answer true at
+ * once, until the process turns to another user. With
  * `force` it only starts a chain when none of the three daemons is known to be dead: a dead one
  * means that nobody is using the chain, so clean-up must not bring it to life.
  *

@@ -33,8 +33,8 @@ class ZYROVFS_API VFS {
     /**
      * Mounts the location as the user, waiting as long as the server does. True also when it was
      * mounted already. False leaves a code of the mount family; with VFS_ERR_IDENTITY_QUESTION the
-     * detail has "host" and "fingerprint", with VFS_ERR_CERT_UNTRUSTED the certificate. A mount
-     * child that is killed gives false with the cell as it was.
+     * detail has "host" and "fingerprint", with VFS_ERR_CERT_UNTRUSTED the certificate. A
+     * helper that is killed gives false with the cell as it was. The calling process runs no GIO.
      */
     bool Mount();
 

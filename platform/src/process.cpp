@@ -44,6 +44,12 @@ bool ParseNumber(std::string_view text, Number& number) {
     return std::from_chars(text.data(), text.data() + text.size(), number).ec == std::errc();
 }
 
+/** A thread has a folder under its own number too, and is no process of that number. */
+bool IsProcess(std::string_view status, pid_t pid) {
+    pid_t group = 0;
+    return ParseNumber(Field(status, "Tgid"), group) && group == pid;
+}
+
 bool HasEnded(std::string_view status) {
     const std::string_view state = Field(status, "State");
     if (state.empty() || state.front() == 'X') {
@@ -58,7 +64,7 @@ bool Describe(pid_t pid, YLIBCPROC& record) {
     const zos::Fd process = OpenProcess(pid);
     const auto status = ReadFile(process, "status");
     const auto name = ReadFile(process, "comm");
-    if (!status || !name) {
+    if (!status || !name || !IsProcess(*status, pid)) {
         return false;
     }
     const std::string_view ids = Field(*status, "Uid");
@@ -82,7 +88,7 @@ pid_t YLIBCProcFork() {
 int YLIBCProcAlive(pid_t pid) {
     return zos::OrOutOfMemory(0, [pid] {
         const auto status = ReadFile(OpenProcess(pid), "status");
-        return status && !HasEnded(*status) ? 1 : 0;
+        return status && IsProcess(*status, pid) && !HasEnded(*status) ? 1 : 0;
     });
 }
 

@@ -6,6 +6,7 @@
 #include <cstdlib>
 #include <utility>
 
+#include "core/bus_address.h"
 #include "core/paths.h"
 #include "zyrovfs/error.h"
 
@@ -71,7 +72,7 @@ bool InitEnv(const char* uid, const char* busAddress) {
     }
     setenv("ZYROVFS_UID", uid, 1);
     setenv("XDG_RUNTIME_DIR", paths::RuntimeDir(GetActorUID()).c_str(), 1);
-    setenv("DBUS_SESSION_BUS_ADDRESS", busAddress, 1);
+    SetBusAddress(GetActorUID(), busAddress);
     return true;
 }
 

@@ -1,8 +1,6 @@
 #include "mount/daemon.h"
 
-#include <fcntl.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <cerrno>
 #include <climits>
@@ -12,7 +10,6 @@
 #include "core/log.h"
 #include "core/owned_folder.h"
 #include "core/paths.h"
-#include "mount/fork_as_user.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 
@@ -123,23 +120,6 @@ bool WritePid(const Daemon& daemon, uid_t uid, int pid, SourceLine at) {
 
 MountLockRelease::~MountLockRelease() {
     Utils::UnLockMnt();
-}
-
-void PointStdioAtNull() {
-    const int null = open("/dev/null", O_RDWR);
-    for (int fd = STDIN_FILENO; fd <= STDERR_FILENO; ++fd) {
-        dup2(null, fd);
-    }
-    if (null > STDERR_FILENO) {
-        close(null);
-    }
-}
-
-void BecomeDaemonOf(uid_t uid) {
-    setsid();
-    if (!BecomeUserBySavedRoot(uid)) {
-        _exit(1);
-    }
 }
 
 }  // namespace ZYROVFS

@@ -61,19 +61,6 @@ class MountLockRelease {
     ~MountLockRelease();
 };
 
-// Child side of a launch, between fork and exec.
-
-/** Descriptors 0, 1 and 2 become /dev/null. */
-void PointStdioAtNull();
-
-/**
- * The daemon gets a session of its own, out of reach of the signals of the caller's terminal, and
- * is the user for good. With only its effective id changed it could become root again, and the
- * loader and GLib would take it for a set-uid program and ignore the address of the bus. A child
- * that cannot become the user ends here.
- */
-void BecomeDaemonOf(uid_t uid);
-
 }  // namespace ZYROVFS
 
 #endif

@@ -3,15 +3,18 @@
 
 #include <algorithm>
 #include <chrono>
-#include <cstdlib>
 
+#include "core/bus_address.h"
 #include "core/error_cell.h"
 #include "core/handle.h"
 #include "core/log.h"
 #include "core/no_throw.h"
 #include "core/paths.h"
+#include "mount/bus_address.h"
 #include "mount/daemon.h"
 #include "mount/glib_handle.h"
+#include "mount/program.h"
+#include "mount/user_environment.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"
@@ -19,54 +22,30 @@
 namespace ZYROVFS {
 namespace {
 
-using UniqueStrv = std::unique_ptr<char*, FreeWith<g_strfreev>>;
 using UniqueChannel = std::unique_ptr<GIOChannel, FreeWith<g_io_channel_unref>>;
-
-constexpr const char* kBusAddress = "DBUS_SESSION_BUS_ADDRESS";
-constexpr int kLastInheritedFd = 1023;
 
 /** How long a bus that lives may keep its address to itself, beyond the fixed wait. */
 constexpr auto kAddressPatience = std::chrono::seconds(10);
 
-struct BusChild {
-    int address_fd;
-    uid_t uid;
-};
-
-void SetUpBus(gpointer data) {
-    const auto* child = static_cast<const BusChild*>(data);
-    PointStdioAtNull();
-    for (int fd = STDERR_FILENO + 1; fd <= kLastInheritedFd; ++fd) {
-        if (fd != child->address_fd) {
-            close(fd);
-        }
-    }
-    fcntl(child->address_fd, F_SETFD, 0);
-    BecomeDaemonOf(child->uid);
-}
-
 /** A gvfsd that dies is activated again by the bus and would then bring up a fuse daemon of its
- * own, at the place of ours. */
-UniqueStrv BusEnvironment() {
-    return UniqueStrv(g_environ_setenv(g_get_environ(), "GVFS_DISABLE_FUSE", "1", TRUE));
+ * own, at the place of ours. The address of a bus before is nothing to the new one. */
+std::vector<std::string> BusEnvironment(uid_t uid) {
+    std::vector<std::string> environment = UserEnvironment(uid);
+    const auto is_address = [](const std::string& entry) {
+        return entry.rfind("DBUS_SESSION_BUS_ADDRESS=", 0) == 0;
+    };
+    environment.erase(std::remove_if(environment.begin(), environment.end(), is_address),
+                      environment.end());
+    environment.emplace_back("GVFS_DISABLE_FUSE=1");
+    return environment;
 }
 
 /** The pid of a bus that prints its address to `address_fd`; 0 on failure. */
-GPid SpawnBus(int address_fd, uid_t uid) {
-    const std::string command = std::string(paths::kDbusDaemon) +
-                                " --session --print-address=" + std::to_string(address_fd);
-    char** words = nullptr;
-    GError* error = nullptr;
-    GPid pid = 0;
-    g_shell_parse_argv(command.c_str(), nullptr, &words, &error);
-    const UniqueStrv argv(words);
-    BusChild child{address_fd, uid};
-    if (error == nullptr) {
-        g_spawn_async(nullptr, argv.get(), BusEnvironment().get(), G_SPAWN_LEAVE_DESCRIPTORS_OPEN,
-                      SetUpBus, &child, &pid, &error);
-    }
-    const UniqueError failure(error);
-    return failure == nullptr ? pid : 0;
+pid_t SpawnBus(int address_fd, uid_t uid) {
+    const Program bus{{paths::kDbusDaemon, "--session", "--print-address=3"},
+                      BusEnvironment(uid),
+                      {-1, -1, -1, address_fd}};
+    return std::max(StartDaemon(bus, uid), 0);
 }
 
 bool WaitReadable(int fd, std::chrono::steady_clock::time_point end) {
@@ -97,7 +76,7 @@ std::string ReadAddress(int fd) {
 }
 
 /** Starts a bus; its address, empty on failure. */
-std::string RunBus(uid_t uid, GPid& pid) {
+std::string RunBus(uid_t uid, pid_t& pid) {
     int ends[2];
     if (pipe2(ends, O_CLOEXEC) != 0) {
         LOG_ERROR("Failed to create pipe, %m");
@@ -120,7 +99,7 @@ std::string RunBus(uid_t uid, GPid& pid) {
 }
 
 bool Launch(uid_t uid) {
-    GPid pid = 0;
+    pid_t pid = 0;
     const std::string address = RunBus(uid, pid);
     if (address.empty()) {
         LOG_ERROR("Failed to run dbus, uid=%u", uid);
@@ -131,26 +110,20 @@ bool Launch(uid_t uid) {
         LOG_ERROR("Failed to create %s, %m", path.c_str());
         return false;
     }
-    return WritePid(kDbusDaemon, uid, pid) && setenv(kBusAddress, address.c_str(), 1) == 0;
+    return WritePid(kDbusDaemon, uid, pid) && SetBusAddress(uid, address);
 }
 
-bool ReadAddressFile(const std::string& path, std::string& address) {
-    if (!Utils::LockMnt(false)) {
-        return false;
-    }
-    const MountLockRelease release;
-    return Utils::GetFileLine(path.c_str(), address);
-}
-
-/** A process that did not start the bus learns its address from the file. */
+/** A process that did not start the bus learns its address from the file. One that merely stands in
+ * the environment may be somebody else's bus. */
 bool TakeAddress() {
-    if (getenv(kBusAddress) != nullptr) {
-        return true;
-    }
-    const std::string path = paths::DbusAddress(GetActorUID());
+    const uid_t uid = GetActorUID();
     std::string address;
-    if (!ReadAddressFile(path, address) || setenv(kBusAddress, address.c_str(), 1) != 0) {
-        LOG_ERROR("Can't find file, %s", path.c_str());
+    if (Utils::LockMnt(false)) {
+        const MountLockRelease release;
+        address = BusAddressOf(uid);
+    }
+    if (address.empty() || !SetBusAddress(uid, address)) {
+        LOG_ERROR("Can't find file, %s", paths::DbusAddress(uid).c_str());
         return Fail(VFS_ERR_DBUS_ADDRESS);
     }
     return true;

@@ -50,29 +50,44 @@ void RegainRoot() {
     }
 }
 
-bool BecomeUserForGood(uid_t uid, SourceLine at) {
+IdentityStep TryBecomeUser(uid_t uid) {
     // Root's supplementary groups would open to the user what only those groups may read.
     if (geteuid() == 0 && setgroups(0, nullptr) != 0) {
-        LOG_ERROR_AT(at, "Failed to drop groups, %m");
-        return false;
+        return IdentityStep::kGroups;
     }
     if (setregid(kUsersGid, kUsersGid) != 0) {
-        LOG_ERROR_AT(at, "Failed to set gid %u, %m", kUsersGid);
-        return false;
+        return IdentityStep::kGid;
     }
-    if (setreuid(uid, uid) != 0) {
-        LOG_ERROR_AT(at, "Failed to set uid %u, %m", uid);
-        return false;
-    }
-    return true;
+    return setreuid(uid, uid) == 0 ? IdentityStep::kDone : IdentityStep::kUid;
 }
 
-bool BecomeUserBySavedRoot(uid_t uid, SourceLine at) {
-    if (seteuid(0) != 0) {
-        LOG_ERROR_AT(at, "Failed to set uid 0, %m");
-        return false;
+IdentityStep TryBecomeUserBySavedRoot(uid_t uid) {
+    return seteuid(0) == 0 ? TryBecomeUser(uid) : IdentityStep::kRoot;
+}
+
+void LogIdentity(IdentityStep step, uid_t uid, SourceLine at) {
+    switch (step) {
+        case IdentityStep::kDone:
+            break;
+        case IdentityStep::kRoot:
+            LOG_ERROR_AT(at, "Failed to set uid 0, %m");
+            break;
+        case IdentityStep::kGroups:
+            LOG_ERROR_AT(at, "Failed to drop groups, %m");
+            break;
+        case IdentityStep::kGid:
+            LOG_ERROR_AT(at, "Failed to set gid %u, %m", kUsersGid);
+            break;
+        case IdentityStep::kUid:
+            LOG_ERROR_AT(at, "Failed to set uid %u, %m", uid);
+            break;
     }
-    return BecomeUserForGood(uid, at);
+}
+
+bool BecomeUserForGood(uid_t uid, SourceLine at) {
+    const IdentityStep step = TryBecomeUser(uid);
+    LogIdentity(step, uid, at);
+    return step == IdentityStep::kDone;
 }
 
 bool BecomeRootForGood(SourceLine at) {

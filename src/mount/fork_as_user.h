@@ -50,14 +50,22 @@ ChildEnd WaitForChild(pid_t pid);
  */
 void RegainRoot();
 
+/** What a process that was to become a user could not do; kDone: it is the user. */
+enum class IdentityStep { kDone, kRoot, kGroups, kGid, kUid };
+
 /**
  * In a child, for good: real, effective and saved ids become gid 100 and `uid`, and the groups of
- * root go. The effective uid must be 0 by then. Failures are logged in the name of `at`.
+ * root go. The effective uid must be 0 by then. Nothing is logged, so that a child of a process
+ * with threads may call it before it executes another program; errno tells the cause.
  */
-bool BecomeUserForGood(uid_t uid, SourceLine at = SourceLine::Here());
+IdentityStep TryBecomeUser(uid_t uid);
+/** TryBecomeUser from any effective uid, by way of the saved root identity. */
+IdentityStep TryBecomeUserBySavedRoot(uid_t uid);
+/** Logs, with errno, a step that failed. */
+void LogIdentity(IdentityStep step, uid_t uid, SourceLine at);
 
-/** BecomeUserForGood from any effective uid, by way of the saved root identity. */
-bool BecomeUserBySavedRoot(uid_t uid, SourceLine at = SourceLine::Here());
+/** TryBecomeUser; failures are logged in the name of `at`. */
+bool BecomeUserForGood(uid_t uid, SourceLine at = SourceLine::Here());
 
 /** In a child, for good: root by the saved root identity. Failures are logged in the name of `at`.
  */

@@ -1,4 +1,3 @@
-#include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/statfs.h>
 #include <unistd.h>
@@ -19,8 +18,10 @@
 #include "core/owned_folder.h"
 #include "core/paths.h"
 #include "mount/daemon.h"
-#include "mount/fork_as_user.h"
-#include "mount/glib_handle.h"
+#include "mount/helper.h"
+#include "mount/program.h"
+#include "mount/run_as_user.h"
+#include "mount/user_environment.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"
@@ -52,25 +53,15 @@ int PrepareMountPoint(const std::string& path) {
     return kLaunched;
 }
 
-int SpawnFuse(const std::string& mount_point, GPid& pid) {
-    const char* const argv[] = {paths::kGvfsdFuse,
-                                mount_point.c_str(),
-                                "-f",
-                                "-o",
-                                "big_writes",
-                                "-o",
-                                "direct_io",
-                                "-o",
-                                "allow_other",
-                                nullptr};
-    const auto flags =
-        static_cast<GSpawnFlags>(G_SPAWN_STDOUT_TO_DEV_NULL | G_SPAWN_STDERR_TO_DEV_NULL);
-    GError* error = nullptr;
-    g_spawn_async(nullptr, const_cast<char**>(argv), nullptr, flags, nullptr, nullptr, &pid,
-                  &error);
-    const UniqueError failure(error);
-    if (failure != nullptr) {
-        LOG_ERROR("Error launching gvfsd-fuse: %s", failure->message);
+/** The fuse daemon outlives the helper, whose identity it has: it is the user already. */
+int SpawnFuse(const std::string& mount_point, uid_t uid, pid_t& pid) {
+    const Program fuse{{paths::kGvfsdFuse, mount_point, "-f", "-o", "big_writes", "-o", "direct_io",
+                        "-o", "allow_other"},
+                       UserEnvironment(uid),
+                       {-1, -1, -1}};
+    pid = StartDaemon(fuse, static_cast<uid_t>(-1));
+    if (pid < 0) {
+        LOG_ERROR("Error launching gvfsd-fuse: %m");
         return kLaunchFailed;
     }
     return kLaunched;
@@ -91,65 +82,45 @@ void ClearMountPoint(uid_t uid) {
 /** The helper's work: as the user, since the mount must be the user's. */
 int LaunchAsUser(uid_t uid) {
     ClearMountPoint(uid);
-    if (!BecomeUserBySavedRoot(uid)) {
+    if (!BecomeUserInHelper(uid)) {
         return kLaunchFailed;
     }
     const std::string mount_point = paths::FuseTree(uid);
-    GPid pid = 0;
+    pid_t pid = 0;
     int result = PrepareMountPoint(mount_point);
     if (result == kLaunched) {
-        result = SpawnFuse(mount_point, pid);
+        result = SpawnFuse(mount_point, uid, pid);
     }
     if (result == kLaunched) {
         sleep(3);
-        // Not by stdio: the buffer may hold what the caller has not yet written.
         return dprintf(STDOUT_FILENO, "%u", static_cast<unsigned>(pid)) > 0 ? kLaunched
                                                                             : kLaunchFailed;
     }
     return result;
 }
 
-/** An exception that left the child would go on with the caller's work in it. */
-[[noreturn]] void RunHelper(int report, uid_t uid) noexcept {
-    dup2(report, STDOUT_FILENO);
-    // The fuse daemon outlives the caller and its terminal.
-    setsid();
+void LaunchJob(const Json::Value& request) {
+    const uid_t uid = UserOf(request);
     const int result = LaunchAsUser(uid);
     if (result != kLaunched) {
         LOG_ERROR("Failed to run gvfsd-fuse, uid=%u, %d", uid, result);
     }
-    _exit(result);
+    EndHelper(result);
+}
+
+std::string ReadPidText(int pipe) {
+    std::string text;
+    ReadAll(pipe, text);
+    return text;
 }
 
 int RunFuse(uid_t uid, int& pid) {
     const SigchldGuard collect;
-    int ends[2];
-    if (pipe2(ends, O_CLOEXEC) != 0) {
-        LOG_ERROR("Failed to create pipe, %m");
-        return kLaunchFailed;
-    }
-    const UniqueFd answer(ends[0]);
-    UniqueFd report(ends[1]);
-    const pid_t helper = fork();
-    if (helper == 0) {
-        RunHelper(report.Get(), uid);
-    }
-    if (helper < 0) {
-        LOG_ERROR("Failed to fork, %m");
-        return kLaunchFailed;
-    }
-    report.Reset();
-    std::string text;
-    ReadAll(answer.Get(), text);
-    const int result = WaitForChild(helper).Result();
-    const long long number = strtoll(text.c_str(), nullptr, 10);
+    const HelperRun run =
+        RunAsUser(kLaunchFuseJob.name, uid, Json::Value(Json::objectValue), ReadPidText);
+    const long long number = strtoll(run.report.c_str(), nullptr, 10);
     pid = number > 0 && number <= INT_MAX ? static_cast<int>(number) : 0;
-    // Where children are collected unseen, the status is lost: without a pid the launch has failed,
-    // and the mount point tells whether it can be repaired.
-    if (result == kLaunched && pid == 0) {
-        return CanAccess(paths::FuseTree(uid)) ? kLaunchFailed : kStaleMountPoint;
-    }
-    return result;
+    return run.Result() == kLaunched && pid == 0 ? kLaunchFailed : run.Result();
 }
 
 /** Lets nobody but root change what a folder holds while root goes by a path through it. */
@@ -188,29 +159,22 @@ bool Unmount(const std::string& path, uid_t uid) {
     return YLIBCExec(paths::kUmount, path.c_str(), nullptr) == 0;
 }
 
-[[noreturn]] void UnmountAsRoot(const std::string& path, uid_t uid) noexcept {
+void RepairJob(const Json::Value& request) {
+    const uid_t uid = UserOf(request);
+    const std::string path = paths::FuseTree(uid);
     if (!BecomeRootForGood()) {
-        _exit(1);
+        EndHelper(1);
     }
     if (!Unmount(path, uid)) {
         LOG_ERROR("Failed to umount %s", path.c_str());
     }
-    _exit(0);
+    EndHelper(0);
 }
 
 /** Takes the stale mount away. Whether it worked shows in the next launch. */
 void RepairMountPoint(uid_t uid) {
     const SigchldGuard collect;
-    const std::string path = paths::FuseTree(uid);
-    const pid_t child = YLIBCProcFork();
-    if (child == 0) {
-        UnmountAsRoot(path, uid);
-    }
-    if (child < 0) {
-        LOG_ERROR("Failed to fork, %m");
-        return;
-    }
-    WaitForChild(child);
+    RunAsUser(kRepairMountPointJob.name, uid, Json::Value(Json::objectValue), nullptr);
 }
 
 bool Launch(uid_t uid) {
@@ -234,6 +198,9 @@ bool Launch(uid_t uid) {
 }
 
 }  // namespace
+
+const HelperJob kLaunchFuseJob = {"launch-fuse", LaunchJob};
+const HelperJob kRepairMountPointJob = {"repair-mount-point", RepairJob};
 
 bool GVFSD_FUSE::IsAlive(int pid) {
     return IsDaemonAlive(kGvfsdFuseDaemon, pid);

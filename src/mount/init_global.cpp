@@ -1,7 +1,10 @@
+#include "mount/init_global.h"
+
 #include <zosplatform/process.h>
 
 #include <clocale>
 #include <cstdlib>
+#include <optional>
 #include <string>
 
 #include "core/identity.h"
@@ -16,10 +19,19 @@
 namespace ZYROVFS {
 namespace {
 
-bool initialised = false;
+constexpr const char* kActingUser = "ZYROVFS_UID";
+
+/** For whom this process has brought the chain up. */
+std::optional<unsigned int> initialised;
+
+/** Whether it is that user's still: clean-up behind another user, or InitEnv, makes it theirs. */
+bool IsReadyFor(unsigned int uid) {
+    const char* acting_for = getenv(kActingUser);
+    return initialised == uid && acting_for != nullptr && acting_for == std::to_string(uid);
+}
 
 void SetEnvironment(unsigned int uid) {
-    setenv("ZYROVFS_UID", std::to_string(uid).c_str(), 1);
+    setenv(kActingUser, std::to_string(uid).c_str(), 1);
     setenv("XDG_RUNTIME_DIR", paths::RuntimeDir(GetActorUID()).c_str(), 1);
 }
 
@@ -32,20 +44,23 @@ bool StartChain() {
     return DBUS::Init() && GVFSD::Init() && GVFSD_FUSE::Init();
 }
 
+bool IsAnyDaemonDead() {
+    return DBUS::CheckDaemonDied() || GVFSD::CheckDaemonDied() || GVFSD_FUSE::CheckDaemonDied();
+}
+
 bool Prepare(unsigned int uid, bool force) {
     setlocale(LC_ALL, "");
     const UserWithRootGroup user(uid);
     SetEnvironment(uid);
     // A dead daemon means that the user is not connected to anything. Those who force only want to
     // clean up behind a chain that is there; they must not bring one to life.
-    if (force &&
-        (DBUS::CheckDaemonDied() || GVFSD::CheckDaemonDied() || GVFSD_FUSE::CheckDaemonDied())) {
+    if (force && IsAnyDaemonDead()) {
         return true;
     }
     if (!StartChain()) {
         return false;
     }
-    initialised = true;
+    initialised = uid;
     return true;
 }
 
@@ -56,10 +71,22 @@ bool InitGlobal(unsigned int uid, bool force) {
         LOG_ERROR("not support VFS in DZOS");
         return false;
     }
-    if (!force && initialised) {
+    if (!force && IsReadyFor(uid)) {
         return true;
     }
     return NoThrow(VFS_ERR_FAILED, [=] { return Prepare(uid, force); });
+}
+
+bool InitForMount(unsigned int uid) {
+    const bool was_ready = IsReadyFor(uid);
+    if (!InitGlobal(uid, false)) {
+        return false;
+    }
+    if (was_ready && IsAnyDaemonDead()) {
+        initialised.reset();
+        return InitGlobal(uid, false);
+    }
+    return true;
 }
 
 }  // namespace ZYROVFS

@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <ctime>
 
 #include "core/entry_name.h"
 #include "core/error_cell.h"
@@ -11,6 +12,7 @@
 #include "core/identity.h"
 #include "core/log.h"
 #include "core/paths.h"
+#include "mount/lock.h"
 #include "mount/mkdir.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
@@ -18,8 +20,8 @@
 namespace ZYROVFS::Utils {
 namespace {
 
-constexpr int kAttempts = 2201;
-constexpr useconds_t kPause = 50000;  // 2200 pauses between 2201 attempts make 110 seconds
+constexpr useconds_t kPause = 50000;
+constexpr time_t kPatience = 110;  // seconds; on a machine at rest 2200 pauses
 
 constexpr int kShared = LOCK_SH | LOCK_NB;
 constexpr int kExclusive = LOCK_EX | LOCK_NB;
@@ -118,8 +120,23 @@ Attempt Take(LockSlot& slot, const std::string& path, uid_t actor, int operation
     return Attempt::kTaken;
 }
 
+/** Of a clock that nobody sets; the pauses are longer than it is coarse. */
+timespec Now() {
+    timespec now{};
+    clock_gettime(CLOCK_MONOTONIC_COARSE, &now);
+    return now;
+}
+
+bool IsPast(const timespec& end) {
+    const timespec now = Now();
+    return now.tv_sec > end.tv_sec || (now.tv_sec == end.tv_sec && now.tv_nsec >= end.tv_nsec);
+}
+
+/** By the clock: a busy machine makes each pause longer, and must not make the whole wait so. */
 bool TakeWithin110Seconds(LockSlot& slot, const std::string& path, uid_t actor, int operation) {
-    for (int attempt = 1;; ++attempt) {
+    timespec end = Now();
+    end.tv_sec += kPatience;
+    for (;;) {
         const Attempt result = Take(slot, path, actor, operation);
         if (result == Attempt::kTaken) {
             return true;
@@ -128,7 +145,7 @@ bool TakeWithin110Seconds(LockSlot& slot, const std::string& path, uid_t actor, 
             SetPlatformErr(ZOS_ERR_OPEN_FAILED);
             return false;
         }
-        if (result == Attempt::kRefused || attempt == kAttempts) {
+        if (result == Attempt::kRefused || IsPast(end)) {
             SetPlatformErr(ZOS_ERR_TRY_AGAIN);
             return false;
         }
@@ -162,3 +179,21 @@ int ForceUnLockMnt() {
 }
 
 }  // namespace ZYROVFS::Utils
+
+namespace ZYROVFS {
+
+HeldLock HeldMountLock() {
+    const Utils::LockSlot& slot = *Utils::FindSlot(Utils::kMntMask);
+    return {slot.file.Get(), slot.count, slot.operation};
+}
+
+void AdoptMountLock(const HeldLock& lock) {
+    Utils::LockSlot& slot = *Utils::FindSlot(Utils::kMntMask);
+    if (!slot.file && lock.fd >= 0) {
+        slot.file.Reset(lock.fd);
+        slot.count = lock.count;
+        slot.operation = lock.operation;
+    }
+}
+
+}  // namespace ZYROVFS

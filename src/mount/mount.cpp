@@ -1,4 +1,3 @@
-#include <fcntl.h>
 #include <unistd.h>
 #include <zosplatform/process.h>
 
@@ -13,9 +12,10 @@
 #include "core/log.h"
 #include "core/no_throw.h"
 #include "core/paths.h"
-#include "mount/fork_as_user.h"
+#include "mount/helper.h"
 #include "mount/known_hosts.h"
 #include "mount/mount_child.h"
+#include "mount/run_as_user.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
@@ -89,42 +89,27 @@ void TakePath(VFS& session, const std::string& report) {
     }
 }
 
-bool Judge(VFS& session, const ChildEnd& end, const std::string& report) {
-    const int status = end.Result();
+bool Judge(VFS& session, const HelperRun& run) {
+    const int status = run.Result();
     if (status > 0) {
         SetErr(static_cast<__tag_vfs_err_>(status));
-        if (status == VFS_ERR_IDENTITY_QUESTION && !report.empty()) {
-            VFSSetJson(IdentityDetail(report));
+        if (status == VFS_ERR_IDENTITY_QUESTION && !run.report.empty()) {
+            VFSSetJson(IdentityDetail(run.report));
         }
         return false;
     }
-    TakePath(session, report);
+    TakePath(session, run.report);
     return status == 0;
 }
 
 bool MountLocked(VFS& session) {
     SigchldGuard collect;
-    int ends[2];
-    if (pipe2(ends, O_CLOEXEC) != 0) {
-        LOG_ERROR("Failed to create pipe");
+    const HelperRun run =
+        RunAsUser(kMountJob.name, GetActorUID(), DescribeSession(session), ReadReport);
+    if (run.how == HelperRun::kNoPipe) {
         collect.Dismiss();
-        return false;
     }
-    UniqueFd read_end(ends[0]);
-    UniqueFd write_end(ends[1]);
-    const uid_t actor = GetActorUID();
-    const pid_t pid = YLIBCProcFork();
-    if (pid < 0) {
-        return false;
-    }
-    if (pid == 0) {
-        read_end.Reset();
-        RunMountChild(session, actor, write_end.Release());
-    }
-    write_end.Reset();
-    const std::string report = ReadReport(read_end.Get());
-    read_end.Reset();
-    return Judge(session, WaitForChild(pid), report);
+    return run.how == HelperRun::kEnded && Judge(session, run);
 }
 
 bool MountSession(VFS& session) {

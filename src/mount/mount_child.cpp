@@ -4,14 +4,13 @@
 
 #include <cerrno>
 #include <clocale>
-#include <csignal>
 #include <new>
 
 #include "core/error_cell.h"
 #include "core/json.h"
 #include "core/log.h"
-#include "mount/fork_as_user.h"
 #include "mount/glib_handle.h"
+#include "mount/helper.h"
 #include "mount/vfs_question.h"
 #include "mount/vfs_result.h"
 #include "zyrovfs/utils.h"
@@ -19,10 +18,7 @@
 namespace ZYROVFS {
 namespace {
 
-/**
- * The loop's context is the child's own. The default one may belong to another thread of the
- * parent, which does not exist here and would never give it back, or be full of its sources.
- */
+/** The loop's context is its own: GIO's threads may have given the default one sources. */
 GMainLoop* NewLoop() {
     GMainContext* context = g_main_context_new();
     g_main_context_push_thread_default(context);
@@ -60,11 +56,27 @@ std::string ReportText(const VFS& session) {
 }
 
 /** One write: the parent reads once, and may have closed its end before a long text is through. */
-void WriteReport(int pipe, const std::string& text) {
-    signal(SIGPIPE, SIG_IGN);
-    while (write(pipe, text.data(), text.size()) < 0 && errno == EINTR) {
+void WriteReport(const std::string& text) {
+    while (write(STDOUT_FILENO, text.data(), text.size()) < 0 && errno == EINTR) {
     }
-    close(pipe);
+    close(STDOUT_FILENO);
+}
+
+/** The report goes to standard output; the failure code is the status. */
+void Run(const Json::Value& request) {
+    VFS session;
+    RestoreSession(request, session);
+    if (BecomeUserInHelper(UserOf(request))) {
+        MountLocation(session);
+    } else {
+        FailIfNoneSet();
+    }
+    const std::string text = ReportText(session);
+    if (GetError() != VFS_ERR_NONE) {
+        LOG_ERROR("Fail to mount, error = %d", GetError());
+    }
+    WriteReport(text);
+    EndHelper(GetError());
 }
 
 }  // namespace
@@ -119,19 +131,27 @@ UniqueObject<GMountOperation> NewOperation(VFSMountOperaion& mount, GFile* file)
     return operation;
 }
 
-void RunMountChild(VFS& session, uid_t actor, int report) noexcept {
-    RegainRoot();
-    if (BecomeUserForGood(actor)) {
-        MountLocation(session);
-    } else {
-        FailIfNoneSet();
-    }
-    const std::string text = ReportText(session);
-    if (GetError() != VFS_ERR_NONE) {
-        LOG_ERROR("Fail to mount, error = %d", GetError());
-    }
-    WriteReport(report, text);
-    _exit(GetError());
+Json::Value DescribeSession(const VFS& session) {
+    Json::Value request(Json::objectValue);
+    request["user"] = session.GetUser();
+    request["password"] = session.GetPass();
+    request["uri"] = session.GetURI();
+    request["path"] = session.GetPath();
+    request["codepage"] = session.GetCodePage();
+    request["full_path"] = session.GetFullPath();
+    request["force"] = session.GetForce();
+    return request;
 }
+
+void RestoreSession(const Json::Value& request, VFS& session) {
+    const std::string path = request["path"].asString();
+    session.Init(request["user"].asCString(), request["password"].asCString(),
+                 request["uri"].asCString(), path.c_str(), request["codepage"].asCString(),
+                 Json::Value(Json::objectValue), request["force"].asBool());
+    session.SetPath(path.c_str(), nullptr);  // it was converted before
+    session.SetFullPath(request["full_path"].asCString());
+}
+
+const HelperJob kMountJob = {"mount", Run};
 
 }  // namespace ZYROVFS

@@ -1,6 +1,6 @@
 /**
- * What a mount or unmount does in its forked child. The child shares nothing with the parent's
- * main loop, runs no destructor and no exit handler of the parent's, and never returns.
+ * What a mount and an unmount do in the helper, which becomes the user and runs GIO's main loop
+ * there, and how a session gets to it.
  */
 #ifndef ZYROVFS_MOUNT_MOUNT_CHILD_H
 #define ZYROVFS_MOUNT_MOUNT_CHILD_H
@@ -17,14 +17,11 @@
 
 namespace ZYROVFS {
 
-/**
- * Mounts as `actor`, writes the report to the pipe end `report` and ends with the failure code as
- * exit status.
- */
-[[noreturn]] void RunMountChild(VFS& session, uid_t actor, int report) noexcept;
+/** The session as a request of the helper, which has the password in it. */
+Json::Value DescribeSession(const VFS& session);
 
-/** Ends the connection's transfers as root, then unmounts as `actor`; exit status as above. */
-[[noreturn]] void RunUnmountChild(VFS& session, uid_t actor) noexcept;
+/** The session of a request, its path byte by byte as it was. */
+void RestoreSession(const Json::Value& request, VFS& session);
 
 /**
  * What the callbacks will work on, in the locale of the environment; null, with the failure logged

@@ -1,6 +1,3 @@
-#include <unistd.h>
-#include <zosplatform/process.h>
-
 #include <cstdlib>
 #include <memory>
 #include <string>
@@ -9,9 +6,10 @@
 #include "core/handle.h"
 #include "core/log.h"
 #include "core/no_throw.h"
-#include "mount/fork_as_user.h"
 #include "mount/glib_handle.h"
+#include "mount/helper.h"
 #include "mount/mount_child.h"
+#include "mount/run_as_user.h"
 #include "mount/vfs_result.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
@@ -20,14 +18,10 @@ namespace ZYROVFS {
 namespace {
 
 /** Transfers of the connection keep its mount busy. They may run under any identity of the user. */
-void KillTransfers(const std::string& uri) {
-    const char* user = getenv("ZYROVFS_UID");
-    if (uri.empty() || user == nullptr) {
-        return;
-    }
-    const auto uid = static_cast<unsigned int>(strtoul(user, nullptr, 10));
+void KillTransfers(const std::string& uri, const std::string& user) {
+    const auto uid = static_cast<unsigned int>(strtoul(user.c_str(), nullptr, 10));
     if (!Utils::KillProcByUID(uri.c_str(), uid)) {
-        LOG_ERROR("Failed to kill vfs procs, uid=%16s", user);
+        LOG_ERROR("Failed to kill vfs procs, uid=%16s", user.c_str());
     }
 }
 
@@ -78,17 +72,36 @@ void UnmountLocation(VFS& session) {
     }
 }
 
+void Run(const Json::Value& request) {
+    VFS session;
+    RestoreSession(request, session);
+    if (request.isMember("transfers_of")) {
+        KillTransfers(session.GetURI(), request["transfers_of"].asString());
+    }
+    if (BecomeUserInHelper(UserOf(request))) {
+        UnmountLocation(session);
+    } else {
+        FailIfNoneSet();
+    }
+    if (GetError() != VFS_ERR_NONE) {
+        LOG_ERROR("Fail to unmount, error = %d", GetError());
+    }
+    EndHelper(GetError());
+}
+
+Json::Value RequestFor(const VFS& session) {
+    Json::Value request = DescribeSession(session);
+    const char* user = getenv("ZYROVFS_UID");
+    if (!session.GetURI().empty() && user != nullptr) {
+        request["transfers_of"] = user;
+    }
+    return request;
+}
+
 bool UnmountLocked(VFS& session) {
     const SigchldGuard collect;
-    const uid_t actor = GetActorUID();
-    const pid_t pid = YLIBCProcFork();
-    if (pid < 0) {
-        return false;
-    }
-    if (pid == 0) {
-        RunUnmountChild(session, actor);
-    }
-    const int status = WaitForChild(pid).Result();
+    const HelperRun run = RunAsUser(kUnmountJob.name, GetActorUID(), RequestFor(session), nullptr);
+    const int status = run.Result();
     if (status > 0) {
         SetErr(static_cast<__tag_vfs_err_>(status));
     }
@@ -97,19 +110,7 @@ bool UnmountLocked(VFS& session) {
 
 }  // namespace
 
-void RunUnmountChild(VFS& session, uid_t actor) noexcept {
-    RegainRoot();
-    KillTransfers(session.GetURI());
-    if (BecomeUserForGood(actor)) {
-        UnmountLocation(session);
-    } else {
-        FailIfNoneSet();
-    }
-    if (GetError() != VFS_ERR_NONE) {
-        LOG_ERROR("Fail to unmount, error = %d", GetError());
-    }
-    _exit(GetError());
-}
+const HelperJob kUnmountJob = {"unmount", Run};
 
 bool VFS::UnMount() {
     return NoThrow(VFS_ERR_FAILED, [this] {

@@ -1,4 +1,3 @@
-#include <fcntl.h>
 #include <gio/gio.h>
 #include <unistd.h>
 
@@ -8,11 +7,12 @@
 
 #include "core/fd_io.h"
 #include "core/handle.h"
-#include "core/identity.h"
 #include "core/log.h"
 #include "core/no_throw.h"
-#include "mount/fork_as_user.h"
 #include "mount/glib_handle.h"
+#include "mount/helper.h"
+#include "mount/run_as_user.h"
+#include "server/helper_program.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
@@ -24,9 +24,9 @@ namespace {
 constexpr size_t kPiece = 8201;
 
 /**
- * Set while a connection is made on demand, in this process and in the children that it forks
+ * Set while a connection is made on demand, in this process and in the helpers that it starts
  * meanwhile. Making a connection looks its path up again; without this mark a location to which
- * GIO gives no path would be connected on demand in ever deeper children.
+ * GIO gives no path would be connected on demand in ever more helpers.
  */
 bool connecting_on_demand = false;
 
@@ -93,99 +93,77 @@ bool AskGio(const char* uri, std::string& full) {
 }
 
 /**
- * AskGio in a process of its own. GIO's bus connection works only in the process that made it: a
- * child that had asked GIO itself could no longer connect on demand, since the mount child that it
- * forks would wait on a connection whose thread is not there. 0, also when GIO tells no path and
- * `full` stays empty; another number when the process could not be run to its end.
+ * In the helper. A lookup that finds nothing answers with nothing, and a helper that could not
+ * become the user ends with 1.
  */
-int AskGioApart(const char* uri, std::string& full) {
-    int ends[2];
-    if (pipe2(ends, O_CLOEXEC) != 0) {
-        LOG_ERROR("Failed to create pipe");
-        return -1;
+void AskGioJob(const Json::Value& request) {
+    if (!BecomeUserInHelper(UserOf(request))) {
+        EndHelper(1);
     }
-    UniqueFd in(ends[0]);
-    UniqueFd out(ends[1]);
-    const pid_t child = fork();
-    if (child == 0) {
-        NoThrow(VFS_ERR_FAILED, [&] { return AskGio(uri, full) && WriteAll(out.Get(), full); });
-        _exit(0);
-    }
-    out.Reset();
-    if (child < 0) {
-        LOG_ERROR("Failed to fork, %m");
-        return -1;
-    }
-    full = ReadLastPiece(in.Get());
-    return WaitForChild(child).Result();
+    std::string full;
+    EndHelper(AskGio(request["uri"].asCString(), full) && !WriteAll(STDOUT_FILENO, full) ? 1 : 0);
 }
 
-/** A process that acts for somebody else may be about to fork a mount child, which must not inherit
- * GIO's connection. A backend, which is the user, has threads and must not fork for a question. */
-bool AskGioSafely(const char* uri, std::string& full) {
-    if (geteuid() == GetActorUID()) {
-        return AskGio(uri, full);
-    }
-    std::string answer;
-    if (AskGioApart(uri, answer) != 0 || answer.empty()) {
+bool LookUp(const Json::Value& request) {
+    const std::string remote = request["remote"].asString();
+    const std::string uri = request["id"].asString() + (remote.empty() ? "" : "/" + remote);
+    std::string full;
+    if (!AskGio(uri.c_str(), full) && !GetFullPathByConfig(uri.c_str(), full)) {
+        LOG_ERROR("Failed to get full path, %s", uri.c_str());
         return false;
     }
-    full = answer;
-    return true;
+    return WriteAll(STDOUT_FILENO, remote.empty() ? full : full + "\n" + remote);
+}
+
+void LookUpJob(const Json::Value& request) {
+    if (!BecomeUserInHelper(UserOf(request))) {
+        EndHelper(1);
+    }
+    connecting_on_demand = request["connecting"].asBool();
+    NoThrow(VFS_ERR_FAILED, [&] { return LookUp(request); });
+    EndHelper(0);
 }
 
 /**
- * The child. It writes its answer past the C library's buffer, which may hold output of the parent,
- * and ends without the parent's exit handlers. A lookup that finds nothing answers with nothing.
+ * A process whose every id is the user's, such as a backend, asks by itself. With root's identity
+ * behind it, it could not speak to the user's bus.
  */
-[[noreturn]] void LookUpAndExit(int pipe_end, unsigned int uid, const std::string& id,
-                                const std::string& remote) {
-    if (pipe_end != STDOUT_FILENO && dup2(pipe_end, STDOUT_FILENO) < 0) {
-        _exit(1);
-    }
-    const EffectiveUid root(0);
-    if (!BecomeUserForGood(uid)) {
-        _exit(1);
-    }
-    NoThrow(VFS_ERR_FAILED, [&] {
-        const std::string uri = remote.empty() ? id : id + "/" + remote;
-        std::string full;
-        if (AskGioApart(uri.c_str(), full) != 0) {
-            _exit(1);
-        }
-        if (full.empty() && !GetFullPathByConfig(uri.c_str(), full)) {
-            LOG_ERROR("Failed to get full path, %s", uri.c_str());
-            return false;
-        }
-        const std::string answer = remote.empty() ? full : full + "\n" + remote;
-        return WriteAll(STDOUT_FILENO, answer);
-    });
-    _exit(0);
+bool IsWhollyTheUser() {
+    uid_t real = 0;
+    uid_t effective = 0;
+    uid_t saved = 0;
+    return getresuid(&real, &effective, &saved) == 0 && real == GetActorUID() &&
+           effective == real && saved == real;
 }
 
-bool LookUpInChild(unsigned int uid, const std::string& id, const std::string& remote,
-                   std::string& uriOut, std::string& fullOut) {
-    int ends[2];
-    if (pipe2(ends, O_CLOEXEC) != 0) {
-        LOG_ERROR("Failed to create pipe");
+bool AskGioAsUser(const char* uri, std::string& full) {
+    if (IsWhollyTheUser()) {
+        return AskGio(uri, full);
+    }
+    Json::Value request(Json::objectValue);
+    request["uri"] = uri;
+    const SigchldGuard collectable;
+    const HelperRun run = RunAsUser(kAskGioJob.name, GetActorUID(), request, ReadLastPiece);
+    if (run.Result() != 0 || run.report.empty()) {
         return false;
     }
-    UniqueFd in(ends[0]);
-    UniqueFd out(ends[1]);
-    const pid_t child = fork();
-    if (child == 0) {
-        in.Reset();
-        LookUpAndExit(out.Get(), uid, id, remote);
-    }
-    out.Reset();
-    if (child < 0) {
-        LOG_ERROR("Failed to fork, %m");
+    full = run.report;
+    return true;
+}
+
+bool LookUpInHelper(unsigned int uid, const std::string& id, const std::string& remote,
+                    std::string& uriOut, std::string& fullOut) {
+    Json::Value request(Json::objectValue);
+    request["id"] = id;
+    request["remote"] = remote;
+    request["connecting"] = connecting_on_demand;
+    const SigchldGuard collectable;
+    const HelperRun run = RunAsUser(kLookUpJob.name, uid, request, ReadLastPiece);
+    if (run.how != HelperRun::kEnded) {
         return false;
     }
-    const std::string answer = ReadLastPiece(in.Get());
-    const int status = WaitForChild(child).Result();
-    SplitAnswer(answer, uriOut, fullOut);
-    return status == 0;
+    SplitAnswer(run.report, uriOut, fullOut);
+    return run.Result() == 0;
 }
 
 }  // namespace
@@ -241,7 +219,7 @@ bool GetFullPath(const char* uri, std::string& full) {
         return false;
     }
     return NoThrow(VFS_ERR_FAILED,
-                   [&] { return AskGioSafely(uri, full) || GetFullPathByConfig(uri, full); });
+                   [&] { return AskGioAsUser(uri, full) || GetFullPathByConfig(uri, full); });
 }
 
 bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const char* codepage,
@@ -251,10 +229,16 @@ bool GetFullPath(unsigned int uid, const char* serverId, const char* path, const
         return false;
     }
     return NoThrow(VFS_ERR_FAILED, [&] {
-        const SigchldGuard collectable;
         const std::string remote = ToCodepage(path, codepage);
-        return LookUpInChild(uid, serverId, remote, uriOut, fullOut);
+        return LookUpInHelper(uid, serverId, remote, uriOut, fullOut);
     });
 }
 
 }  // namespace ZYROVFS::Utils
+
+namespace ZYROVFS {
+
+const HelperJob kAskGioJob = {"ask-gio", Utils::AskGioJob};
+const HelperJob kLookUpJob = {"look-up", Utils::LookUpJob};
+
+}  // namespace ZYROVFS

@@ -2,6 +2,7 @@
 
 #include "core/error_cell.h"
 #include "core/log.h"
+#include "mount/init_global.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
@@ -62,7 +63,7 @@ std::string AccountNameOf(const std::string& email) {
 bool MountAccount(unsigned int uid, const std::string& email, const std::string& secret,
                   const std::string& id, const Json::Value& conf, bool force) {
     const std::string name = AccountNameOf(email);
-    InitGlobal(uid, false);
+    InitForMount(uid);
     VFS vfs;
     return vfs.Init(name.c_str(), secret.c_str(), id.c_str(), "", "", conf, force) && vfs.Mount();
 }

@@ -8,10 +8,10 @@
 #include "core/log.h"
 #include "core/owned_folder.h"
 #include "core/paths.h"
+#include "mount/init_global.h"
 #include "mount/known_hosts.h"
 #include "server/server_account.h"
 #include "server/server_vfs.h"
-#include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 
 namespace ZYROVFS::Server {
@@ -71,7 +71,7 @@ bool VFSServer::Mount(unsigned int uid, VFS_CONFIG_MODE mode, const Json::Value&
         // reports it there.
         return true;
     }
-    InitGlobal(uid, false);
+    InitForMount(uid);
     VFS session;
     if (!MountAs(account_.c_str(), id, conf, force, session)) {
         return false;

@@ -1,4 +1,5 @@
 #include <dirent.h>
+#include <unistd.h>
 #include <zosplatform/file.h>
 #include <zosplatform/process.h>
 
@@ -121,10 +122,18 @@ void RemoveFiles(unsigned int uid, bool removeProfiles, bool removeRuntime) {
 }
 
 void CleanUp(unsigned int uid, bool removeProfiles, bool removeRuntime) {
+    // As root the process acts for whom the environment names; as a user, for itself alone: it
+    // would take its own lock and end its own mounts for those of the one who goes.
+    const EffectiveUid as_root(geteuid() == uid ? uid : 0);
+    setenv("ZYROVFS_UID", std::to_string(uid).c_str(), 1);
     // A process that has acted for somebody else knows that user's bus, and would look there for
     // this one's mounts, find none and take them for gone. Without an address this user's is read.
     unsetenv("DBUS_SESSION_BUS_ADDRESS");
     InitGlobal(uid, true);
+    if (GetActorUID() != uid) {
+        LOG_ERROR("Failed to clean up behind user(%u) as %u", uid, GetActorUID());
+        return;
+    }
     if (!IsAnyDaemonDead()) {
         // A damaged list of connections must not keep the files in place.
         NoThrow(VFS_ERR_CONFIG_READ, [&] {

@@ -14,6 +14,7 @@
 
 #include "core/error_cell.h"
 #include "core/identity.h"
+#include "task/background.h"
 #include "task/task_file.h"
 #include "zyrovfs/utils.h"
 
@@ -298,6 +299,9 @@ bool CleanOrHandOver(const QueueFiles& files, const Job& job, bool background) {
     const pid_t child = background ? YLIBCProcFork() : -1;
     if (child > 0) {
         return true;
+    }
+    if (child == 0) {
+        task::LetGoOfOutput();
     }
     const bool cleaned = OrOnFault(false, [&] { return CleanNow(files, job); });
     if (child == 0) {

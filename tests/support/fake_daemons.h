@@ -28,6 +28,7 @@
 
 #include "core/handle.h"
 #include "core/paths.h"
+#include "support/helper_in_process.h"
 
 namespace fakes {
 

@@ -5,6 +5,8 @@
 #ifndef ZYROVFS_TESTS_FAKE_LOCATION_H
 #define ZYROVFS_TESTS_FAKE_LOCATION_H
 
+#include <fcntl.h>
+
 #include <csignal>
 #include <cstdlib>
 #include <functional>
@@ -28,9 +30,15 @@ struct Rules {
 
 inline Rules rules;
 
-/** A file without a name: children that have become somebody else still write to it. */
+/** A file without a name: children that have become somebody else still write to it. Its number is
+ * none that a helper is given. */
 inline int JournalFd() {
-    static const int fd = memfd_create("locations", MFD_CLOEXEC);
+    static const int fd = [] {
+        const int made = memfd_create("locations", MFD_CLOEXEC);
+        const int high = fcntl(made, F_DUPFD_CLOEXEC, 100);
+        close(made);
+        return high;
+    }();
     return fd;
 }
 

@@ -15,6 +15,8 @@
 #include <functional>
 #include <string>
 
+#include "support/helper_in_process.h"
+
 namespace scripted {
 
 /** How a mount or unmount ends: with success when `message` is null. */

@@ -86,6 +86,7 @@ struct Records {
     bool watch_children = false;
     std::function<void()> on_micro_sleep;
     std::optional<time_t> now;
+    std::atomic<long> slept{0};  ///< microseconds of all usleep()
     std::function<void()> on_sleep;
 };
 
@@ -201,7 +202,18 @@ time_t time(time_t* out) {
     return now;
 }
 
+/** The coarse clock is the one by which waits are bounded: here it goes on with the pauses alone.
+ */
+int clock_gettime(clockid_t clock, timespec* out) {
+    if (clock != CLOCK_MONOTONIC_COARSE) {
+        return static_cast<int>(syscall(SYS_clock_gettime, clock, out));
+    }
+    *out = {Get().slept / 1000000, Get().slept % 1000000 * 1000};
+    return 0;
+}
+
 int usleep(useconds_t microseconds) {
+    Get().slept += microseconds;
     Keep({Entry::kMicroSleep, static_cast<int>(microseconds), ""});
     if (Get().on_micro_sleep) {
         Get().on_micro_sleep();
@@ -247,7 +259,9 @@ int setregid(gid_t r, gid_t e) {
 namespace seams {
 
 void Reset() {
-    Get() = Records();
+    Records& records = Get();
+    records.~Records();
+    new (&records) Records;
 }
 
 void WatchChildren() {
@@ -301,6 +315,10 @@ std::vector<std::string> IdentityCalls() {
 
 void FailIdentity(const std::string& function, int error, int after) {
     Get().failures[function] = {error, after};
+}
+
+void PassTime(long microseconds) {
+    Get().slept += microseconds;
 }
 
 void SetTime(time_t now) {

@@ -26,6 +26,10 @@ void WatchChildren();
 std::vector<unsigned> Sleeps();
 std::vector<unsigned> MicroSleeps();
 
+/** CLOCK_MONOTONIC_COARSE goes on by the microseconds of each usleep(), by these, and by nothing
+ * else. */
+void PassTime(long microseconds);
+
 /** time() answers this from now on, until the next Reset; -1 is a clock that fails. */
 void SetTime(time_t now);
 

@@ -1,3 +1,4 @@
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include "fuse_conf.h"
@@ -42,6 +43,16 @@ void CheckPackages(std::vector<std::string>& missing) {
     }
 }
 
+/** Without it the library mounts nothing; one that others may change it does not run. */
+void CheckHelper(const std::string& helper, std::vector<std::string>& missing) {
+    struct stat info {};
+    if (stat(helper.c_str(), &info) != 0 || access(helper.c_str(), X_OK) != 0) {
+        missing.push_back(helper + " is missing; it comes with the library.");
+    } else if ((info.st_mode & (S_IWGRP | S_IWOTH)) != 0) {
+        missing.push_back(helper + " may be changed by others than its owner.");
+    }
+}
+
 std::string Join(const std::vector<std::string>& words) {
     std::string text;
     for (const std::string& word : words) {
@@ -76,6 +87,7 @@ void CheckFiles(const HostSources& sources, std::vector<std::string>& missing) {
 std::vector<std::string> CheckHost(const HostSources& sources) {
     std::vector<std::string> missing;
     CheckPackages(missing);
+    CheckHelper(sources.helper, missing);
     for (const HostFolder& folder : HostFolders()) {
         if (!IsFolderReady(folder)) {
             missing.push_back(std::string(folder.path) +

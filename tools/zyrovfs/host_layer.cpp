@@ -112,9 +112,10 @@ bool IsRoot(std::vector<std::string>& problems) {
 HostSources HostSources::Of(const std::string& build) {
     if (build.empty()) {
         const std::string here = ProgramFolder();
-        return {here + "/" ZYROVFS_LAUNCHER, here + "/" ZYROVFS_MOUNTS};
+        return {here + "/" ZYROVFS_LAUNCHER, here + "/" ZYROVFS_MOUNTS, here + "/" ZYROVFS_HELPER};
     }
-    return {build + "/platform/host/gvfsd-fuse-launcher", build + "/platform/host/mounts"};
+    return {build + "/platform/host/gvfsd-fuse-launcher", build + "/platform/host/mounts",
+            build + "/libexec/zyrovfs/zyrovfs-helper"};
 }
 
 const std::vector<HostFolder>& HostFolders() {

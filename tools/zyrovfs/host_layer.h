@@ -16,6 +16,7 @@ namespace tool {
 struct HostSources {
     std::string launcher;
     std::string mounts;  ///< folder of catalogue files
+    std::string helper;  ///< the library's, which stays where it is
 
     /** Those of a build tree, or the installed ones for an empty `build`. */
     static HostSources Of(const std::string& build);

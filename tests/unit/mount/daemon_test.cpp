@@ -86,7 +86,7 @@ TEST_P(EveryDaemon, WaitsThreeSecondsForTheStartAndNotForOneThatLives) {
 TEST_P(EveryDaemon, LivingProcessOfRightNameAndUserIsLeftAlone) {
     const LiveProcess daemon(row().daemon->process, kUser);
     WritePidFile(std::to_string(daemon.pid()) + "\n");
-    setenv("DBUS_SESSION_BUS_ADDRESS", "unix:path=/known", 1);
+    Write(paths::DbusAddress(kUser), "unix:path=/known\n");
     EXPECT_FALSE(row().check_died());
     EXPECT_TRUE(row().init());
     EXPECT_EQ(Starts(row().daemon->process), 0);
@@ -246,7 +246,7 @@ TEST_P(EveryDaemon, StartsUnderAServiceThatHasItsChildrenCollected) {
 
 TEST_P(EveryDaemon, AnotherProcessMayStartItWhileTheLockIsWaitedFor) {
     const LiveProcess winner(row().daemon->process, kUser);
-    setenv("DBUS_SESSION_BUS_ADDRESS", "unix:path=/known", 1);
+    Write(paths::DbusAddress(kUser), "unix:path=/known\n");
     auto lock = std::make_unique<ForeignLock>(LOCK_SH);
     seams::OnMicroSleep([&] {
         WritePidFile(std::to_string(winner.pid()) + "\n");

@@ -8,6 +8,7 @@
 #include "support/seams.h"
 #include "support/stranger.h"
 #include "zyrovfs/error.h"
+#include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 #include "zyrovfs/vfs.h"
 
@@ -159,11 +160,29 @@ TEST_F(Bus, LivingBusGivesItsAddressFromTheFile) {
     EXPECT_EQ(Starts("dbus-daemon"), 0);
 }
 
-TEST_F(Bus, AddressThatIsKnownIsNotReadAgain) {
+TEST_F(Bus, AddressThatTheProcessWasToldServesWithoutAFile) {
     BusLives();
-    setenv("DBUS_SESSION_BUS_ADDRESS", "unix:path=/known", 1);
+    ASSERT_TRUE(InitEnv("4001", "unix:path=/known"));
     EXPECT_TRUE(DBUS::Init());
     EXPECT_EQ(EnvAddress(), "unix:path=/known");
+}
+
+TEST_F(Bus, AddressThatItWasToldForAnotherUserDoesNot) {
+    BusLives();
+    ASSERT_TRUE(InitEnv("4002", "unix:path=/known"));
+    setenv("ZYROVFS_UID", "4001", 1);
+    EXPECT_FALSE(DBUS::Init());
+    EXPECT_EQ(GetError(), VFS_ERR_DBUS_ADDRESS);
+}
+
+TEST_F(Bus, AddressInTheEnvironmentThatNobodyToldNeverWins) {
+    BusLives();
+    setenv("DBUS_SESSION_BUS_ADDRESS", "unix:path=/tmp/trap", 1);
+    EXPECT_FALSE(DBUS::Init()) << "who listens there would be given the user's passwords";
+    EXPECT_EQ(GetError(), VFS_ERR_DBUS_ADDRESS);
+    Write(paths::DbusAddress(kUser), "unix:path=/from-file\n");
+    EXPECT_TRUE(DBUS::Init());
+    EXPECT_EQ(EnvAddress(), "unix:path=/from-file");
 }
 
 TEST_F(Bus, MissingAddressFileOfALivingBusIsADBusAddressFailure) {
@@ -206,7 +225,7 @@ TEST_F(Bus, PidThatAStrangerPlantedStartsABusOfTheUsersOwn) {
 
 TEST_F(Bus, InitTakesOneLevelFromTheLockOfItsCaller) {
     BusLives();
-    setenv("DBUS_SESSION_BUS_ADDRESS", "unix:path=/known", 1);
+    Write(paths::DbusAddress(kUser), "unix:path=/known\n");
     ASSERT_TRUE(Utils::LockMnt(true));
     EXPECT_FALSE(LockIsFree());
     EXPECT_TRUE(DBUS::Init());

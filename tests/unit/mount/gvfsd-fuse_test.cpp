@@ -1,5 +1,6 @@
 // Launch of the fuse daemon and repair of its mount point. What it shares: daemon_test.cpp.
 #include <gmock/gmock.h>
+#include <grp.h>
 #include <gtest/gtest.h>
 #include <zosplatform/error.h>
 
@@ -110,7 +111,7 @@ TEST_F(Fuse, LaunchThatFailsIsNotRepeated) {
 }
 
 TEST_F(Fuse, HelperThatCannotBecomeTheUserIsALaunchThatFails) {
-    for (const char* call : {"seteuid", "setregid", "setreuid"}) {
+    for (const char* call : {"setregid", "setreuid"}) {
         seams::WatchChildren();
         BreakUmount();
         seams::FailIdentity(call, EPERM);
@@ -162,10 +163,11 @@ TEST_F(Fuse, RepairThatCannotBecomeRootRunsNothing) {
     BreakUmount();
     InFreshProcess([] {
         seams::WatchChildren();
-        ASSERT_EQ(setresuid(kUser, kUser, 0), 0);
-        seams::FailIdentity("setreuid(0, 0)", EPERM);
+        ASSERT_EQ(setgroups(0, nullptr), 0);
+        ASSERT_EQ(setresgid(100, 100, 100), 0);
+        ASSERT_EQ(setresuid(kUser, kUser, kUser), 0);
         EXPECT_FALSE(GVFSD_FUSE::Init());
-        EXPECT_TRUE(seams::LoggedPart("Failed to set uid 4001 0 0, ")) << seams::LogDump();
+        EXPECT_TRUE(seams::LoggedPart("Failed to set uid 4001 4001 4001, ")) << seams::LogDump();
     });
     EXPECT_EQ(Report("umount"), "");
 }

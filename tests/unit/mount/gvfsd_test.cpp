@@ -23,8 +23,7 @@ TEST_F(Gvfsd, ReplacesAnotherOneAndStartsNoFuseDaemon) {
 }
 
 TEST_F(Gvfsd, FindsTheBusOfTheUser) {
-    setenv("DBUS_SESSION_BUS_ADDRESS", kAddress, 1);
-    setenv("XDG_RUNTIME_DIR", "/var/tmp/user/4001", 1);
+    Write(paths::DbusAddress(kUser), std::string(kAddress) + "\n");
     ASSERT_TRUE(GVFSD::Init());
     ASSERT_TRUE(Started("gvfsd"));
     const std::string env = Report("gvfsd", "env");

@@ -6,6 +6,7 @@
 #include <clocale>
 
 #include "core/identity.h"
+#include "mount/init_global.h"
 #include "support/fake_daemons.h"
 #include "support/seams.h"
 #include "zyrovfs/error.h"
@@ -114,11 +115,40 @@ TEST_F(Global, SecondCallIsTrueWithoutASystemCallHoweverTheFirstLeftTheDaemons) 
     });
 }
 
-TEST_F(Global, ReadinessForOneUserCountsForAnother) {
+TEST_F(Global, ReadinessForOneUserIsNoneForAnother) {
     InFreshProcess([] {
         ASSERT_TRUE(InitGlobal(kUser, false));
+        ASSERT_TRUE(Started("dbus-daemon"));
         EXPECT_TRUE(InitGlobal(kUser + 1, false));
-        EXPECT_EQ(Env("ZYROVFS_UID"), "4001") << "one process, one user";
+        EXPECT_EQ(Env("ZYROVFS_UID"), "4002");
+        EXPECT_EQ(Env("XDG_RUNTIME_DIR"), "/var/tmp/user/4002");
+        EXPECT_TRUE(std::filesystem::exists(paths::DbusPid(kUser + 1))) << "a chain of its own";
+    });
+}
+
+TEST_F(Global, ReadinessEndsWhenTheProcessTurnsToAnotherUser) {
+    InFreshProcess([] {
+        ASSERT_TRUE(InitGlobal(kUser, false));
+        ASSERT_TRUE(InitGlobal(kUser + 1, true)) << "as a clean-up does";
+        EXPECT_EQ(Env("ZYROVFS_UID"), "4002");
+        EXPECT_TRUE(InitGlobal(kUser, false));
+        EXPECT_EQ(Env("ZYROVFS_UID"), "4001");
+        EXPECT_EQ(Env("XDG_RUNTIME_DIR"), "/var/tmp/user/4001");
+    });
+}
+
+TEST_F(Global, MountOfAReadyProcessStartsWhatHasDiedSince) {
+    InFreshProcess([] {
+        ASSERT_TRUE(InitForMount(kUser));
+        ASSERT_TRUE(Started("gvfsd"));
+        kill(std::stoi(Read(paths::GvfsdPid(kUser))), SIGKILL);
+        ASSERT_TRUE(Eventually([] { return GVFSD::CheckDaemonDied(); }));
+        EXPECT_TRUE(InitGlobal(kUser, false));
+        EXPECT_EQ(Starts("gvfsd"), 1) << "readiness is not looked at";
+        EXPECT_TRUE(InitForMount(kUser));
+        EXPECT_TRUE(Eventually([] { return Starts("gvfsd") == 2; }));
+        EXPECT_EQ(Starts("dbus-daemon"), 1);
+        EXPECT_EQ(Starts("gvfsd-fuse"), 1);
     });
 }
 

@@ -129,6 +129,16 @@ TEST_F(MountLock, WaitForAnotherProcessEndsAfter2200PausesOf50Milliseconds) {
     }
 }
 
+/** On a busy machine each pause takes longer, and the wait as a whole must not. */
+TEST_F(MountLock, WaitForAnotherProcessEndsAfter110SecondsHoweverLongThePausesTake) {
+    MakeFile();
+    OtherProcess holder([] { return HoldFile(LOCK_EX); });
+    ASSERT_TRUE(holder.ok());
+    seams::OnMicroSleep([] { seams::PassTime(950000); });
+    EXPECT_FALSE(LockMnt(true));
+    EXPECT_EQ(seams::MicroSleeps().size(), 110U);
+}
+
 TEST_F(MountLock, ExclusiveWaitsForTheSharedLockOfAnotherProcess) {
     MakeFile();
     OtherProcess holder([] { return HoldFile(LOCK_SH); });

@@ -353,13 +353,9 @@ TEST_F(Mount, WithAnEmptyMountPathEndsTheChildAndLeavesTheCellUnchanged) {
 class KilledAfterReport : public Mount {
   protected:
     void Reports(const std::string& text) {
-        Script().on_mount = [this, text](GMountOperation*) {
-            for (const int fd : mounting::OpenDescriptors()) {
-                struct stat info {};
-                if (open_.count(fd) == 0 && fstat(fd, &info) == 0 && S_ISFIFO(info.st_mode) &&
-                    write(fd, text.data(), text.size()) > 0) {
-                    scripted::TheSeen().mark = 1;
-                }
+        Script().on_mount = [text](GMountOperation*) {
+            if (write(STDOUT_FILENO, text.data(), text.size()) > 0) {
+                scripted::TheSeen().mark = 1;
             }
             kill(getpid(), SIGKILL);
         };
@@ -420,14 +416,35 @@ TEST_F(Mount, CollectsItsChildUnderAServiceThatIgnoresChildren) {
     EXPECT_TRUE(mounting::Sigchld::HasNoCldWait());
 }
 
-TEST_F(Mount, WhoseChildSomebodyElseCollectsCountsAsSuccess) {
-    const mounting::Sigchld reaping(SIG_IGN, 0);
+/** What a service may do about its children: the status is lost to whoever waits for it. */
+class MountOfAService : public Mount, public testing::WithParamInterface<void (*)(int)> {};
+
+void CollectAll(int) {
+    const int saved = errno;
+    while (waitpid(-1, nullptr, WNOHANG) > 0) {
+    }
+    errno = saved;
+}
+
+TEST_P(MountOfAService, IsJudgedByWhatTheHelperHasSaid) {
+    const mounting::Sigchld collecting(GetParam(), 0);
     ReportsPath("/remote");
     Fails(scripted::Failure(G_IO_ERROR_PENDING));
+    EXPECT_FALSE(session_.Mount());
+    EXPECT_EQ(GetError(), VFS_ERR_MOUNT_PENDING);
+    Fails({});
     EXPECT_TRUE(session_.Mount());
     EXPECT_EQ(session_.GetPath(), "remote");
+}
+
+TEST_P(MountOfAService, WhoseHelperIsKilledIsFalse) {
+    const mounting::Sigchld collecting(GetParam(), 0);
+    Script().on_mount = [](GMountOperation*) { kill(getpid(), SIGKILL); };
+    EXPECT_FALSE(session_.Mount());
     EXPECT_EQ(GetError(), VFS_ERR_NONE);
 }
+
+INSTANTIATE_TEST_SUITE_P(Children, MountOfAService, testing::Values(SIG_IGN, CollectAll));
 
 TEST_F(Mount, WaitsThroughSignals) {
     struct sigaction action {};

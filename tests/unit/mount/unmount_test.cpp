@@ -142,10 +142,12 @@ TEST_F(UnMount, CollectsItsChildUnderAServiceThatIgnoresChildren) {
     EXPECT_TRUE(mounting::Sigchld::HasNoCldWait());
 }
 
-TEST_F(UnMount, WhoseChildSomebodyElseCollectsIsTrue) {
-    const mounting::Sigchld reaping(SIG_IGN, 0);
-    session_.SetURI("nonsense");
+TEST_F(UnMount, WhoseChildSomebodyElseCollectsIsJudgedByWhatTheHelperHasSaid) {
+    const mounting::Sigchld ignoring(SIG_IGN, 0);
     EXPECT_TRUE(session_.UnMount());
+    session_.SetURI("");
+    EXPECT_FALSE(session_.UnMount());
+    EXPECT_EQ(GetError(), VFS_ERR_BAD_PARAM);
 }
 
 TEST_F(UnMount, WithoutAChildIsFalseWithoutACode) {

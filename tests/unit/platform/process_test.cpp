@@ -8,7 +8,9 @@
 #include <climits>
 #include <csignal>
 #include <cstring>
+#include <future>
 #include <memory>
+#include <thread>
 
 #include "support/scratch.h"
 
@@ -115,6 +117,22 @@ TEST(ProcAlive, NumbersThatAreNoProcessAreNot) {
     for (const pid_t pid : {0, -1, INT_MIN, INT_MAX}) {
         EXPECT_EQ(YLIBCProcAlive(pid), 0) << pid;
     }
+}
+
+/** A pid that was read from a file may be a thread's number by now, of any process. */
+TEST(ProcAlive, AThreadIsNoProcess) {
+    std::promise<pid_t> number;
+    std::promise<void> end;
+    std::thread thread([&] {
+        number.set_value(gettid());
+        end.get_future().wait();
+    });
+    const pid_t tid = number.get_future().get();
+    EXPECT_NE(tid, getpid());
+    EXPECT_EQ(YLIBCProcAlive(tid), 0);
+    EXPECT_EQ(YLIBCProcGetByPid(tid), nullptr);
+    end.set_value();
+    thread.join();
 }
 
 TEST(ProcGetByPid, GivesTheKernelsNameAndTheEffectiveUser) {

@@ -6,6 +6,7 @@
 
 #include <filesystem>
 
+#include "core/identity.h"
 #include "core/paths.h"
 #include "support/fake_daemons.h"
 #include "support/fake_location.h"
@@ -194,6 +195,54 @@ TEST_F(DeleteUserTest, EveryConnectionOfALivingChainIsUnmounted) {
     EXPECT_EQ(fake_location::Calls(),
               (Calls{"find ftp://amy@nas.example", "find sftp://amy@nas.example:22"}));
     EXPECT_FALSE(exists(kConnect));
+}
+
+/** A service that is one user by its effective id while it cleans up behind another. */
+class DeleteUserOfAService : public DeleteUserTest {
+  protected:
+    void SetUp() override {
+        DeleteUserTest::SetUp();
+        ASSERT_EQ(seteuid(kUser + 7), 0);
+    }
+    void TearDown() override {
+        EXPECT_EQ(geteuid(), kUser + 7) << "it is the caller again";
+        ASSERT_EQ(seteuid(0), 0);
+    }
+    /** Steps of the test that only root may do. */
+    template <typename Step>
+    static auto AsRoot(Step step) {
+        const EffectiveUid root(0);
+        return step();
+    }
+};
+
+TEST_F(DeleteUserOfAService, WaitsForTheLockOfTheUserWhoGoes) {
+    const auto lock = AsRoot([] { return std::make_unique<fakes::ForeignLock>(); });
+    EXPECT_TRUE(Delete(Users({kUser}), true, true));
+    EXPECT_TRUE(AsRoot([] { return exists(kConnect); })) << "the caller's own lock was taken";
+    EXPECT_FALSE(AsRoot([] { return exists(paths::MountLock(kUser + 7)); }));
+}
+
+TEST_F(DeleteUserOfAService, SeesThatUsersDaemonsAndUnmountsThatUsersServers) {
+    auto chain = AsRoot([] { return std::make_unique<LiveChain>(); });
+    EXPECT_TRUE(Delete(Users({kUser}), false, true)) << seams::LogDump();
+    EXPECT_EQ(fake_location::Calls(),
+              (Calls{"find ftp://amy@nas.example", "find sftp://amy@nas.example:22"}));
+    EXPECT_TRUE(AsRoot([] { return exists(paths::RuntimeDir(kUser)); })) << "the chain lives";
+    AsRoot([&] {
+        chain.reset();  // which ends processes of that user
+        return true;
+    });
+}
+
+TEST_F(DeleteUserTest, ProcessWithoutRootTouchesNobodyElse) {
+    fakes::InFreshProcess([] {
+        ASSERT_EQ(setresuid(kUser + 7, kUser + 7, kUser + 7), 0);
+        EXPECT_TRUE(Delete(Users({kUser}), true, true));
+        EXPECT_TRUE(seams::LoggedPart("Failed to clean up behind user(4001) as 4008"))
+            << seams::LogDump();
+        EXPECT_TRUE(executions.empty());
+    });
 }
 
 TEST_F(DeleteUserTest, MountsAreLookedForOnTheUsersOwnBus) {
