@@ -1,6 +1,6 @@
-// 1,000 changes over TLS by the flat functions that backends call, each of which makes a driver from
-// the stored profile, against one libcurl handle that is reused for the same requests; and a few
-// with no connection kept:
+// 1,000 changes over TLS by the flat functions that backends call, each of which makes a driver
+// from the stored profile, against one libcurl handle that is reused for the same requests; and a
+// few with no connection kept:
 //   bench_fresh_drivers [ROUNDS [CALLS]]
 // CPU is that of the calling thread; the simulated service has threads of its own.
 #include <curl/curl.h>

@@ -146,9 +146,12 @@ bool fromString(Json::Value& value, const std::string& text) {
 std::string toString(const Json::Value& value) {
     static thread_local const std::unique_ptr<Json::StreamWriter> writer(
         WriterRules().newStreamWriter());
-    std::ostringstream text;
-    writer->write(value, &text);
-    return text.str();
+    static thread_local std::ostringstream stream;
+    stream.str("");
+    writer->write(value, &stream);
+    std::string text = stream.str();
+    stream.str("");
+    return text;
 }
 
 std::string toAscii(const Json::Value& value) {

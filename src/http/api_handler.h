@@ -176,6 +176,7 @@ class APIHandler {
     bool BuildHeaderParam(curl_slist** list);
 
   private:
+    bool LacksHandle() const;
     HandleKey ServiceKey() const;
     void TakeHandle(HandleKey key);
     bool ChooseConnections();
@@ -203,7 +204,7 @@ class APIHandler {
     bool CanStartOver();
     void AdaptTo(CURLcode code, int failed);
 
-    CURL* curl_;
+    CURL* curl_;  ///< null until it is needed for the first time
     std::string response_;
     std::string spare_text_;  // no longer used; keeps the layout
     Json::Value request_;

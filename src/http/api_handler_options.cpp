@@ -250,7 +250,7 @@ bool APIHandler::SetNoBody(bool on) {
 }
 
 bool APIHandler::SetShareCurlHandler(void* share) {
-    if (curl_ == nullptr || share == nullptr) {
+    if (GetCurlHandler() == nullptr || share == nullptr) {
         LOG_ERROR("curl handler or share handler is null");
         return false;
     }
