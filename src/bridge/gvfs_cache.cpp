@@ -37,7 +37,9 @@ std::string FullPath(const std::string& dir, const char* name) {
 
 bool AddEntry(ZYROCloud_Cache& cache, const char* dir, UniqueFileInfo info) {
     ZYROCloud_CacheKey path{FullPath(dir, InfoName(info.get()))};
-    cache.absent.erase(path);
+    if (!cache.absent.empty()) {
+        cache.absent.erase(path);
+    }
     _ZYROCloud_CacheEntry* const entry = FindKey(cache.entries, path);
     const int64_t now = time(nullptr);
     if (entry == nullptr) {
