@@ -61,10 +61,6 @@ void APIHandler::TakeHandle(HandleKey key) {
     curl_ = loan_.curl;
 }
 
-bool APIHandler::LacksHandle() const {
-    return curl_ == nullptr || HandlePool::Instance().IsInherited(loan_);
-}
-
 CURL* APIHandler::GetCurlHandler() {
     if (LacksHandle()) {
         TakeHandle(handle_key::ForServices(share_));

@@ -176,7 +176,9 @@ class APIHandler {
     bool BuildHeaderParam(curl_slist** list);
 
   private:
-    bool LacksHandle() const;
+    bool LacksHandle() const {
+        return curl_ == nullptr || HandlePool::Instance().IsInherited(loan_);
+    }
     HandleKey ServiceKey() const;
     void TakeHandle(HandleKey key);
     bool ChooseConnections();

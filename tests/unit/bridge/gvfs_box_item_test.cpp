@@ -152,8 +152,7 @@ TEST_F(BoxItem, WithoutAnIdHasNoneOfItsKindEither) {
 
 TEST_F(BoxItem, WithMembersOfAnyTypeIsReadAsFarAsItCanBe) {
     ExpectReadWithMembersOfAnyType(
-        File(),
-        {"type", "id", "name", "size", "created_at", "modified_at", "parent", "owned_by"},
+        File(), {"type", "id", "name", "size", "created_at", "modified_at", "parent", "owned_by"},
         [](const Json::Value& item, ItemRecord& out) { return BoxRecord(item, kAmy, out); });
 }
 

@@ -223,8 +223,7 @@ TEST_P(FlowList, GivesTheCallbackARecordOfItsOwnToChange) {
         g_file_info_remove_attribute(info, "id::file");
         g_file_info_set_size(info, 99);
     };
-    ASSERT_EQ(
-        rig->List(server_id.c_str(), cache, rig->Top().c_str(), change, nullptr, &err), 1);
+    ASSERT_EQ(rig->List(server_id.c_str(), cache, rig->Top().c_str(), change, nullptr, &err), 1);
     GFileInfo* const cached = Cached(Shown("/a.txt"));
     ASSERT_NE(cached, nullptr);
     EXPECT_NE(IdOf(cached), "");

@@ -63,8 +63,7 @@ TEST(OneDriveItem, ThatIsNullIsNone) {
 
 TEST(OneDriveItem, WithMembersOfAnyTypeIsReadAsFarAsItCanBe) {
     ExpectReadWithMembersOfAnyType(
-        Item(),
-        {"type", "id", "name", "size", "parent_id", "link", "created_time", "updated_time"},
+        Item(), {"type", "id", "name", "size", "parent_id", "link", "created_time", "updated_time"},
         OneDriveRecord);
 }
 
