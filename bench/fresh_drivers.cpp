@@ -4,7 +4,6 @@
 //   bench_fresh_drivers [ROUNDS [CALLS]]
 // CPU is that of the calling thread; the simulated service has threads of its own.
 #include <curl/curl.h>
-#include <json/value.h>
 #include <sys/resource.h>
 
 #include <algorithm>
@@ -23,7 +22,6 @@
 namespace {
 
 using bench::TlsBox;
-namespace Server = ZYROVFS::Server;
 
 /** What three calls change: each takes a file of its own. */
 struct Target {
@@ -38,26 +36,6 @@ using Change = std::function<bool(const Target&)>;
 [[noreturn]] void Fail(const std::string& text) {
     std::fprintf(stderr, "%s, code %d\n", text.c_str(), ZYROVFS::GetError());
     std::exit(1);
-}
-
-/** The connection as it stands in the user's file. */
-void StoreProfile(const std::string& token) {
-    Json::Value profile;
-    profile["protocol"] = "box";
-    profile["email"] = "amy@example.com";
-    profile["alias"] = "box";
-    profile["client_id"] = "client";
-    profile["account_info"] = "{\"id\":\"1\"}";
-    profile["path"] = "/tmp";  // of its mount, which is not looked up then
-    profile["expire_time"] = "";
-    profile["access_token"] = bench::Enciphered(token);
-    profile["refresh_token"] = bench::Enciphered("refresh");
-    Json::Value document;
-    document["servers"][TlsBox::kServerId] = profile;
-    if (!Server::CfgAccess(bench::kUid, Server::VFS_CONFIG_CONNECT, Server::VFS_CONFIG_WRITE,
-                           document)) {
-        Fail("the profile cannot be stored");
-    }
 }
 
 bool ByFreshDrivers(const Target& target) {
@@ -202,7 +180,9 @@ int main(int argc, char** argv) {
     const int rounds = argc > 1 ? std::atoi(argv[1]) : 9;
     const size_t calls = argc > 2 ? std::strtoul(argv[2], nullptr, 10) : 999;
     TlsBox box;
-    StoreProfile(box.Token());
+    if (!bench::StoreCloud(TlsBox::kServerId, "box", box.Token())) {
+        Fail("the profile cannot be stored");
+    }
     setenv("ZYROVFS_UID", std::to_string(bench::kUid).c_str(), 1);
     ZYROCloud_Cloud_InitCurlGlobal();
     std::vector<Cost> fresh, bare, unkept;
