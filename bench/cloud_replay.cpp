@@ -4,6 +4,7 @@
 #include <json/reader.h>
 #include <netinet/in.h>
 #include <netinet/tcp.h>
+#include <poll.h>
 #include <strings.h>
 #include <sys/socket.h>
 #include <unistd.h>
@@ -83,34 +84,55 @@ Replay::~Replay() {
 }
 
 void Replay::Serve() {
-    for (int fd = accept(listener_, nullptr, nullptr); fd >= 0;
-         fd = accept(listener_, nullptr, nullptr)) {
+    std::vector<Connection> open;
+    for (;;) {
+        std::vector<pollfd> waiting{{listener_, POLLIN, 0}};
+        for (const Connection& each : open) {
+            waiting.push_back({each.fd, POLLIN, 0});
+        }
+        Check(poll(waiting.data(), waiting.size(), -1) > 0, "poll");
+        for (size_t i = open.size(); i > 0; --i) {
+            if (waiting[i].revents != 0 && !Converse(open[i - 1])) {
+                close(open[i - 1].fd);
+                open.erase(open.begin() + static_cast<std::ptrdiff_t>(i - 1));
+            }
+        }
+        if (waiting[0].revents == 0) {
+            continue;
+        }
+        const int fd = accept(listener_, nullptr, nullptr);
+        if (fd < 0) {
+            break;
+        }
         const int on = 1;
         setsockopt(fd, IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);
-        Converse(fd);
-        close(fd);
+        open.push_back({fd, ""});
+    }
+    for (const Connection& each : open) {
+        close(each.fd);
     }
 }
 
-void Replay::Converse(int fd) {
-    std::string request;
+bool Replay::Converse(Connection& connection) {
     char buffer[4096];
-    for (ssize_t n = read(fd, buffer, sizeof buffer); n > 0; n = read(fd, buffer, sizeof buffer)) {
-        request.append(buffer, static_cast<size_t>(n));
-        const size_t end = request.find("\r\n\r\n");
-        if (end == std::string::npos ||
-            request.size() - end - 4 < BodySize(request.substr(0, end + 2))) {
-            continue;
-        }
-        const std::string& body =
-            Answer(request.substr(0, request.find(" HTTP/")), request.substr(end + 4));
-        if (!SendAll(fd, "HTTP/1.1 200 OK\r\nContent-Type: application/json\r\nContent-Length: " +
-                             std::to_string(body.size()) + "\r\n\r\n") ||
-            !SendAll(fd, body)) {
-            return;
-        }
-        request.clear();
+    const ssize_t n = read(connection.fd, buffer, sizeof buffer);
+    if (n <= 0) {
+        return false;
     }
+    std::string& request = connection.request;
+    request.append(buffer, static_cast<size_t>(n));
+    const size_t end = request.find("\r\n\r\n");
+    if (end == std::string::npos ||
+        request.size() - end - 4 < BodySize(request.substr(0, end + 2))) {
+        return true;
+    }
+    const std::string& body =
+        Answer(request.substr(0, request.find(" HTTP/")), request.substr(end + 4));
+    request.clear();
+    return SendAll(connection.fd,
+                   "HTTP/1.1 200 OK\r\nContent-Type: application/json\r\nContent-Length: " +
+                       std::to_string(body.size()) + "\r\n\r\n") &&
+           SendAll(connection.fd, body);
 }
 
 const std::string& Replay::Answer(const std::string& request_line, const std::string& body) {

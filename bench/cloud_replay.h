@@ -21,7 +21,7 @@ struct Exchange {
     std::string answer;
 };
 
-/** Serves on loopback, one connection after the other. */
+/** Serves on loopback, in one thread of its own. */
 class Replay {
   public:
     /** Asks `upstream` for what it does not know yet. */
@@ -35,8 +35,13 @@ class Replay {
     const std::deque<Exchange>& Exchanges() const { return exchanges_; }
 
   private:
+    struct Connection {
+        int fd;
+        std::string request;  ///< as far as it has come
+    };
     void Serve();
-    void Converse(int fd);
+    /** Reads what has come and answers a whole request; false when the connection has ended. */
+    bool Converse(Connection& connection);
     const std::string& Answer(const std::string& request_line, const std::string& body);
 
     const std::string upstream_;

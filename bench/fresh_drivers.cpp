@@ -1,10 +1,9 @@
-// 1,000 changes over TLS by a driver that is made for each from the stored profile, as backends do,
-// against one libcurl handle that is reused for the same requests; the same with the profile in
-// memory, which leaves out the files; and a few with no connection kept:
+// 1,000 changes over TLS by the flat functions that backends call, each of which makes a driver
+// from the stored profile, against one libcurl handle that is reused for the same requests; and a
+// few with no connection kept:
 //   bench_fresh_drivers [ROUNDS [CALLS]]
 // CPU is that of the calling thread; the simulated service has threads of its own.
 #include <curl/curl.h>
-#include <json/value.h>
 #include <sys/resource.h>
 
 #include <algorithm>
@@ -12,22 +11,17 @@
 #include <cstdio>
 #include <cstdlib>
 #include <functional>
-#include <memory>
 #include <string>
 #include <vector>
 
+#include "profiles.h"
 #include "tls_box.h"
-#include "zyrovfs/cloud_utils.h"
 #include "zyrovfs/error.h"
-#include "zyrovfs/server.h"
+#include "zyrovfs/zyrocloud.h"
 
 namespace {
 
 using bench::TlsBox;
-using ZYROCloud::Cloud;
-namespace Server = ZYROVFS::Server;
-
-constexpr unsigned kUid = 4001;
 
 /** What three calls change: each takes a file of its own. */
 struct Target {
@@ -44,67 +38,19 @@ using Change = std::function<bool(const Target&)>;
     std::exit(1);
 }
 
-/** The connection as it stands in the user's file. */
-void StoreProfile(const std::string& token) {
-    const auto enciphered = [](const std::string& text) -> std::string {
-        char buffer[4096] = "";
-        return Server::SzEncrypt(text.c_str(), buffer, sizeof buffer) != 0 ? buffer : "";
-    };
-    Json::Value profile;
-    profile["protocol"] = "box";
-    profile["email"] = "amy@example.com";
-    profile["alias"] = "box";
-    profile["client_id"] = "client";
-    profile["account_info"] = "{\"id\":\"1\"}";
-    profile["path"] = "/tmp";  // of its mount, which is not looked up then
-    profile["expire_time"] = "";
-    profile["access_token"] = enciphered(token);
-    profile["refresh_token"] = enciphered("refresh");
-    Json::Value document;
-    document["servers"][TlsBox::kServerId] = profile;
-    if (!Server::CfgAccess(kUid, Server::VFS_CONFIG_CONNECT, Server::VFS_CONFIG_WRITE, document)) {
-        Fail("the profile cannot be stored");
-    }
-}
-
-using Make = std::function<Cloud*()>;
-
-Cloud* FromFile() {
-    return ZYROCloud::Utils::CreateCloudByServerID(kUid, TlsBox::kServerId,
-                                                   Server::VFS_CONFIG_CONNECT);
-}
-
-Make FromMemory(const std::string& token) {
-    Json::Value profile;
-    profile["access_token"] = token;
-    profile["server_id"] = TlsBox::kServerId;
-    return [profile] {
-        return ZYROCloud::Utils::CreateCloudByConfig(ZYROCloud::CLOUD_TYPE_BOX, kUid, profile);
-    };
-}
-
-bool WithDriver(const Make& make, const std::function<bool(Cloud&)>& call) {
-    const std::unique_ptr<Cloud> driver(make());
-    if (driver == nullptr) {
-        Fail("no driver");
-    }
-    return call(*driver);
-}
-
-bool ByFreshDrivers(const Make& make, const Target& target) {
+bool ByFreshDrivers(const Target& target) {
+    const char* const id = TlsBox::kServerId;
     const std::string file = "files/" + target.file;
-    const auto create = [&](Cloud& driver) {
-        return driver.CreateFolder("folders/0", target.folder, Json::objectValue);
-    };
-    const auto rename = [&](Cloud& driver) { return driver.Rename(file, target.name); };
-    const auto remove = [&](Cloud& driver) { return driver.Delete(file); };
-    return WithDriver(make, create) && WithDriver(make, rename) && WithDriver(make, remove);
+    int err = 0;
+    return ZYROCloud_Cloud_CreateFolder(id, "", "folders/0", target.folder.c_str(), &err) != 0 &&
+           ZYROCloud_Cloud_Rename(id, "", file.c_str(), target.name.c_str(), &err) != 0 &&
+           ZYROCloud_Cloud_Delete(id, "", file.c_str(), &err) != 0;
 }
 
 bool WithoutKeptConnections(const Target& target) {
-    const bool done = ByFreshDrivers(FromFile, target);
-    Cloud::CleanupCurlGlobal();
-    Cloud::InitCurlGlobal();
+    const bool done = ByFreshDrivers(target);
+    ZYROCloud_Cloud_CleanupCurlGlobal();
+    ZYROCloud_Cloud_InitCurlGlobal();
     return done;
 }
 
@@ -234,25 +180,22 @@ int main(int argc, char** argv) {
     const int rounds = argc > 1 ? std::atoi(argv[1]) : 9;
     const size_t calls = argc > 2 ? std::strtoul(argv[2], nullptr, 10) : 999;
     TlsBox box;
-    StoreProfile(box.Token());
-    Cloud::InitCurlGlobal();
-    const Make from_memory = FromMemory(box.Token());
-    std::vector<Cost> file, memory, bare, unkept;
+    if (!bench::StoreCloud(TlsBox::kServerId, "box", box.Token())) {
+        Fail("the profile cannot be stored");
+    }
+    setenv("ZYROVFS_UID", std::to_string(bench::kUid).c_str(), 1);
+    ZYROCloud_Cloud_InitCurlGlobal();
+    std::vector<Cost> fresh, bare, unkept;
     for (int i = 0; i < rounds; ++i) {
         Bare handle(box);
-        file.push_back(
-            Measure(box, calls, [](const Target& t) { return ByFreshDrivers(FromFile, t); }));
+        fresh.push_back(Measure(box, calls, ByFreshDrivers));
         bare.push_back(Measure(box, calls, [&](const Target& t) { return handle.Make(t); }));
-        memory.push_back(
-            Measure(box, calls, [&](const Target& t) { return ByFreshDrivers(from_memory, t); }));
         unkept.push_back(Measure(box, kUnkept, WithoutKeptConnections));
     }
-    Print("profile from its file", file, calls);
-    Print("profile in memory", memory, calls);
+    Print("fresh drivers", fresh, calls);
     Print("one reused handle", bare, calls);
     Print("no connection kept", unkept, kUnkept);
-    std::printf("  fresh drivers against one reused handle: cpu %.2f, profile in memory %.2f\n",
-                Ratio(file, bare), Ratio(memory, bare));
-    Cloud::CleanupCurlGlobal();
+    std::printf("  fresh drivers against one reused handle: cpu %.2f\n", Ratio(fresh, bare));
+    ZYROCloud_Cloud_CleanupCurlGlobal();
     return 0;
 }

@@ -24,7 +24,6 @@ long PeakOf(long items, List list) {
 
 bool Measure(const bench::Service& service, unsigned items) {
     const bench::RecordedListing listing(service, items);
-    // The recorded pages are served to one connection at a time, which a driver keeps.
     auto driver = listing.MakeDriver();
     const long bare = PeakOf(items, [&] {
         Json::Value out;

@@ -1,20 +1,14 @@
 #include "gvfs_services.h"
 
-#include <json/writer.h>
-
 #include <cstdio>
 #include <cstdlib>
-#include <filesystem>
-#include <fstream>
 #include <map>
 
-#include "zyrovfs/server.h"
+#include "profiles.h"
 
 namespace bench {
 namespace {
 
-constexpr const char* kUid = "4001";
-constexpr const char* kConnections = "/var/tmp/zyrovfs/4001";
 constexpr const char* kUnused = "";
 
 const Backend kBackends[] = {
@@ -54,15 +48,6 @@ const Backend kBackends[] = {
      }},
 };
 
-std::string Enciphered(const std::string& plain) {
-    char out[4096] = "";
-    if (ZYROVFS::Server::SzEncrypt(plain.c_str(), out, sizeof out) == 0) {
-        std::fprintf(stderr, "no enciphered token\n");
-        std::exit(1);
-    }
-    return out;
-}
-
 }  // namespace
 
 const Backend& FindBackend(const std::string& service) {
@@ -89,20 +74,12 @@ std::string ServerId(const Service& service) {
 }
 
 void Connect(const Service& service, const Access& access) {
-    setenv("ZYROVFS_UID", kUid, 1);
+    setenv("ZYROVFS_UID", std::to_string(kUid).c_str(), 1);
     SetHosts(service, access.hosts);
-    Json::Value document;
-    Json::Value& profile = document["servers"][ServerId(service)];
-    profile["protocol"] = service.name;
-    profile["alias"] = profile["email"] = "amy@example.com";
-    profile["client_id"] = "client";
-    profile["account_info"] = "{}";
-    profile["path"] = "/tmp";
-    profile["expire_time"] = "4000000000";
-    profile["access_token"] = Enciphered(access.token);
-    profile["refresh_token"] = Enciphered("refresh");
-    std::filesystem::create_directories(kConnections);
-    std::ofstream(std::string(kConnections) + "/connect.conf") << document;
+    if (!StoreCloud(ServerId(service), service.name, access.token)) {
+        std::fprintf(stderr, "no connection stored\n");
+        std::exit(1);
+    }
 }
 
 void Connect(const Service& service, const RecordedListing& listing) {

@@ -1,4 +1,5 @@
-/** Profiles for benchmarks: FTP servers as a user would have saved them. */
+/** Profiles for benchmarks: FTP servers as a user would have saved them, and a cloud's connection.
+ */
 #ifndef ZYROVFS_BENCH_PROFILES_H
 #define ZYROVFS_BENCH_PROFILES_H
 
@@ -47,6 +48,23 @@ inline void Fill(int count) {
         document["servers"][Id(i)] = Profile(i, password);
     }
     CfgAccess(kUid, VFS_CONFIG_SERVER, VFS_CONFIG_WRITE, document);
+}
+
+/** Stores the user's one connection, to a cloud. Its mount is not looked up. */
+inline bool StoreCloud(const std::string& id, const std::string& protocol,
+                       const std::string& token) {
+    using namespace ZYROVFS::Server;
+    Json::Value document;
+    Json::Value& profile = document["servers"][id];
+    profile["protocol"] = protocol;
+    profile["alias"] = profile["email"] = "amy@example.com";
+    profile["client_id"] = "client";
+    profile["account_info"] = "{\"id\":\"1\"}";
+    profile["path"] = "/tmp";
+    profile["expire_time"] = "4000000000";
+    profile["access_token"] = Enciphered(token);
+    profile["refresh_token"] = Enciphered("refresh");
+    return CfgAccess(kUid, VFS_CONFIG_CONNECT, VFS_CONFIG_WRITE, document);
 }
 
 }  // namespace bench

@@ -51,9 +51,9 @@ typedef struct ZYROCloud_RootAtime {
 } ZYROCloud_RootAtime;
 
 /**
- * Told of each item of a listing, in the service's order, on the thread that lists. `info` is valid
- * during the call; who keeps it takes a reference. The cache is locked meanwhile: the callback may
- * use it, and must not wait for another thread that does.
+ * Told of each item of a listing, in the service's order, on the thread that lists. `info` is a
+ * copy of what the cache has, valid during the call; who keeps it takes a reference. The cache is
+ * locked meanwhile: the callback may use it, and must not wait for another thread that does.
  */
 typedef void (*ZYROCloud_ListCallback)(GFileInfo* info, void* user_data);
 

@@ -53,6 +53,15 @@ void SetGFileInfo(GFileInfo** info, const char* id, bool is_dir, const char* dis
     }
 }
 
+UniqueFileInfo NewGFileInfo() {
+    static GFileInfo* const model = [] {
+        GFileInfo* info = g_file_info_new();
+        SetGFileInfo(&info, "", false, "", "", 0, {}, {}, {}, {}, nullptr);
+        return info;
+    }();
+    return UniqueFileInfo(g_file_info_dup(model));
+}
+
 const char* InfoName(GFileInfo* info) {
     return info == nullptr
                ? nullptr

@@ -26,6 +26,10 @@ void SetGFileInfo(GFileInfo** info, const char* id, bool is_dir, const char* dis
                   const char* name, long long size, const timeval& modified, const timeval& access,
                   const timeval& changed, const timeval& created, const char* description);
 
+/** An empty record, as far as SetGFileInfo leaves nothing out: what it sets is there already, and a
+ * copy of that is faster made than a record that grows. */
+UniqueFileInfo NewGFileInfo();
+
 /** Null when the record has none, or is null. GIO's own getters complain of that in the log. */
 const char* InfoName(GFileInfo* info);
 const char* InfoDisplayName(GFileInfo* info);

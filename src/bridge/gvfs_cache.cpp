@@ -5,6 +5,7 @@
 #include <ctime>
 #include <new>
 #include <string>
+#include <utility>
 
 namespace ZYROCloud {
 
@@ -32,30 +33,23 @@ std::string FullPath(const std::string& dir, const char* name) {
     return (dir == "/" ? dir : dir + "/") + name;
 }
 
-/** Whether the entry is a new one. */
-bool StoreEntry(ZYROCloud_Cache& cache, const ZYROCloud_CacheKey& path, GFileInfo* info) {
+}  // namespace
+
+bool AddEntry(ZYROCloud_Cache& cache, const char* dir, UniqueFileInfo info) {
+    ZYROCloud_CacheKey path{FullPath(dir, InfoName(info.get()))};
+    if (!cache.absent.empty()) {
+        cache.absent.erase(path);
+    }
     _ZYROCloud_CacheEntry* const entry = FindKey(cache.entries, path);
     const int64_t now = time(nullptr);
     if (entry == nullptr) {
-        cache.entries.emplace(path,
-                              _ZYROCloud_CacheEntry{UniqueFileInfo(g_file_info_dup(info)), now});
+        cache.entries.emplace(std::move(path), _ZYROCloud_CacheEntry{std::move(info), now});
         return true;
     }
-    // A record that came from Entry_Get would be emptied by being copied into itself.
-    if (info != entry->info.get()) {
-        g_file_info_copy_into(info, entry->info.get());
-    }
+    // The record stays the same, for those who have it from Entry_Get.
+    g_file_info_copy_into(info.get(), entry->info.get());
     entry->stamp = now;
     return false;
-}
-
-}  // namespace
-
-bool AddEntry(ZYROCloud_Cache& cache, const char* dir, GFileInfo* info) {
-    const ZYROCloud_CacheKey path{FullPath(dir, InfoName(info))};
-    const bool is_new = StoreEntry(cache, path, info);
-    cache.absent.erase(path);
-    return is_new;
 }
 
 uint64_t CacheClock() {
@@ -139,7 +133,7 @@ int ZYROCloud_Cache_Entry_SetMTime(ZYROCloud_Cache* cache, const char* path, lon
 
 int ZYROCloud_Cache_Entry_Add(ZYROCloud_Cache* cache, const char* dir, GFileInfo* info) {
     return WithCache(cache, dir != nullptr && InfoName(info) != nullptr, [&] {
-        if (AddEntry(*cache, dir, info)) {
+        if (AddEntry(*cache, dir, UniqueFileInfo(g_file_info_dup(info)))) {
             // A new entry ends a hold of the caller, too. Last: others may come in from here on.
             cache->lock.unlock();
         }

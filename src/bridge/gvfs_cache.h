@@ -51,11 +51,11 @@ inline uint32_t CacheAge(uint64_t now, uint64_t stamp) {
 }
 
 /**
- * Stores a copy of a record that has a name, and takes a mark of absence away; true for a new
- * entry. Under the lock. Entry_Add without its unlock: who fills a listing keeps others out until
+ * Stores a record that has a name, and takes a mark of absence away; true for a new entry. Under
+ * the lock. Entry_Add without its copy and its unlock: who fills a listing keeps others out until
  * it is whole.
  */
-bool AddEntry(ZYROCloud_Cache& cache, const char* dir, GFileInfo* info);
+bool AddEntry(ZYROCloud_Cache& cache, const char* dir, UniqueFileInfo info);
 
 /** Removes the listing of a directory and all below it that listings name. Under the lock. */
 void RemoveListing(ZYROCloud_Cache& cache, ZYROCloud_CacheKey dir);

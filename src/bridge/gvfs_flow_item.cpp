@@ -84,7 +84,7 @@ bool HasFitName(const ItemRecord& record, const char* path, SourceLine at) {
 }
 
 UniqueFileInfo ToFileInfo(const ItemRecord& record) {
-    UniqueFileInfo info(g_file_info_new());
+    UniqueFileInfo info = NewGFileInfo();
     GFileInfo* filled = info.get();
     const char* description = record.description.empty() ? nullptr : record.description.c_str();
     SetGFileInfo(&filled, record.id.c_str(), record.is_dir, record.display_name.c_str(),

@@ -50,11 +50,13 @@ bool Ask(const ListCall& call, Cloud& cloud, const ListRules& rules, std::string
 }
 
 void Add(const ListCall& call, const ItemRecord& record) {
-    const UniqueFileInfo info = ToFileInfo(record);
-    AddEntry(*call.cache, call.path, info.get());
+    UniqueFileInfo info = ToFileInfo(record);
+    // Callbacks change what they get: gvfs takes away what its client did not ask for.
+    const UniqueFileInfo shown(call.callback == nullptr ? nullptr : g_file_info_dup(info.get()));
     ZYROCloud_Cache_List_Add(call.cache, call.path, record.keeps_display_name, info.get());
+    AddEntry(*call.cache, call.path, std::move(info));
     if (call.callback != nullptr) {
-        call.callback(info.get(), call.user_data);
+        call.callback(shown.get(), call.user_data);
     }
 }
 

@@ -67,7 +67,7 @@ int ZYROCloud_Cloud_OneDrive_GetRoot(const char* server_id, ZYROCloud_Cache* cac
             return false;
         }
         const CacheHold hold(cache);
-        AddEntry(*cache, "/", info.get());
+        AddEntry(*cache, "/", UniqueFileInfo(g_file_info_dup(info.get())));
         if (callback != nullptr) {
             callback(info.get(), user_data);
         }

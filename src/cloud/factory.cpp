@@ -5,6 +5,7 @@
 #include "cloud/dropbox/dropbox.h"
 #include "cloud/gdrive/gdrive.h"
 #include "cloud/onedrive/onedrive.h"
+#include "cloud/stored_profile.h"
 #include "cloud/vfs/vfs_cloud.h"
 #include "core/log.h"
 #include "zyrovfs/cloud_utils.h"
@@ -56,14 +57,13 @@ Cloud* CreateCloudByConfig(_tag_cloud_type type, unsigned int uid, const Json::V
 Cloud* CreateCloudByServerID(unsigned int uid, const std::string& server_id,
                              Server::VFS_CONFIG_MODE mode) {
     const _tag_cloud_type type = GetCloudTypeFromURI(server_id);
-    Json::Value profile;
-    if (!Server::Get(uid, mode, server_id.c_str(), true, false, profile) || !profile.isObject()) {
+    const Json::Value* profile = StoredProfile(uid, server_id, mode);
+    if (profile == nullptr) {
         LOG_ERROR("Failed to get config by serverID:%s, from mode:%d", server_id.c_str(),
                   static_cast<int>(mode));
         return nullptr;
     }
-    profile["server_id"] = server_id;
-    return CreateCloudByConfig(type, uid, profile);
+    return CreateCloudByConfig(type, uid, *profile);
 }
 
 Cloud* CreateCloudByURI(unsigned int uid, const std::string& uri, Server::VFS_CONFIG_MODE mode) {

@@ -9,6 +9,7 @@
 
 #include "cloud/service_document.h"
 #include "core/entry_name.h"
+#include "core/file_memo.h"
 #include "core/json.h"
 #include "core/log.h"
 #include "core/owned_folder.h"
@@ -128,9 +129,18 @@ bool TakeDomain(std::string& domain) {
     return domain.size() > 1 && domain.front() == '.' && domain[1] != ':' && IsAuthority(domain);
 }
 
+/** As it is now: each request asks for an address, and reading takes longer than the question. */
+const Json::Value& Document() {
+    static thread_local FileMemo<Json::Value> documents;
+    const auto read = [](Json::Value& document) {
+        return service_document::Read(document) == service_document::State::kRead;
+    };
+    const Json::Value* document = documents.Get(paths::kServiceConfig, "", read);
+    return document == nullptr ? Json::Value::nullSingleton() : *document;
+}
+
 std::string Configured(const Host& host, bool (*take)(std::string&)) {
-    Json::Value document;
-    service_document::Read(document);
+    const Json::Value& document = Document();
     const Json::Value& hosts = Member(document, service_document::kHosts);
     const Json::Value& value = Member(hosts, host.name);
     if (value.isNull() && (hosts.isNull() || hosts.isObject())) {
@@ -146,9 +156,7 @@ std::string Configured(const Host& host, bool (*take)(std::string&)) {
 
 /** The clients of a service, null when there are none. */
 Json::Value ClientsOf(const std::string& service) {
-    Json::Value document;
-    service_document::Read(document);
-    return Member(Member(document, service_document::kClients), service);
+    return Member(Member(Document(), service_document::kClients), service);
 }
 
 }  // namespace

@@ -12,8 +12,8 @@ namespace ZYROCloud {
 
 /**
  * Base addresses, scheme and authority without a slash at the end; the services' public ones unless
- * the document's "hosts" has another under the function's name. Read anew on each call: a driver
- * lives for a few requests, and the document is short.
+ * the document's "hosts" has another under the function's name. A change of the document counts
+ * from the next call on.
  */
 std::string BoxApiHost();
 std::string BoxUploadHost();

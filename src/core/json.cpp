@@ -50,7 +50,9 @@ const Json::StreamWriterBuilder& WriterRules() {
 
 bool Parse(const char* begin, const char* end, Json::Value& value) {
     try {
-        const std::unique_ptr<Json::CharReader> reader(ReaderRules().newCharReader());
+        // Making a reader, or a writer below, costs more than most texts do.
+        static thread_local const std::unique_ptr<Json::CharReader> reader(
+            ReaderRules().newCharReader());
         if (reader->parse(begin, end, &value, nullptr)) {
             return true;
         }
@@ -142,12 +144,14 @@ bool fromString(Json::Value& value, const std::string& text) {
 }
 
 std::string toString(const Json::Value& value) {
-    // Making a writer costs more than most texts do.
     static thread_local const std::unique_ptr<Json::StreamWriter> writer(
         WriterRules().newStreamWriter());
-    std::ostringstream text;
-    writer->write(value, &text);
-    return text.str();
+    static thread_local std::ostringstream stream;
+    stream.str("");
+    writer->write(value, &stream);
+    std::string text = stream.str();
+    stream.str("");
+    return text;
 }
 
 std::string toAscii(const Json::Value& value) {

@@ -39,9 +39,7 @@ APIHandler::APIHandler(CURLSH* share)
     : curl_(nullptr),
       request_(Json::objectValue),
       response_header_(Json::objectValue),
-      share_(share) {
-    TakeHandle(ServiceKey());
-}
+      share_(share) {}
 
 APIHandler::~APIHandler() {
     HandlePool::Instance().GiveBack(std::move(loan_));
@@ -64,17 +62,19 @@ void APIHandler::TakeHandle(HandleKey key) {
 }
 
 CURL* APIHandler::GetCurlHandler() {
-    if (curl_ != nullptr && HandlePool::Instance().IsInherited(loan_)) {
+    if (LacksHandle()) {
         TakeHandle(handle_key::ForServices(share_));
     }
     return curl_;
 }
 
 bool APIHandler::Init() {
-    if (GetCurlHandler() == nullptr) {
-        TakeHandle(ServiceKey());
+    // What a request may use is looked up once.
+    if (LacksHandle()) {
+        TakeHandle(handle_key::ForServices(share_));
+    } else {
+        wanted_ = ServiceKey();
     }
-    wanted_ = ServiceKey();
     Reset();
     return SetBasicOpt();
 }

@@ -191,6 +191,9 @@ class APIHandler {
     bool BuildHeaderParam(curl_slist** list);
 
   private:
+    bool LacksHandle() const {
+        return curl_ == nullptr || HandlePool::Instance().IsInherited(loan_);
+    }
     HandleKey ServiceKey() const;
     void TakeHandle(HandleKey key);
     bool ChooseConnections();
@@ -220,7 +223,7 @@ class APIHandler {
     bool CanStartOver();
     void AdaptTo(CURLcode code, int failed);
 
-    CURL* curl_;
+    CURL* curl_;  ///< null until it is needed for the first time
     std::string response_;
     std::string spare_text_;  // no longer used; keeps the layout
     Json::Value request_;

@@ -263,7 +263,7 @@ bool APIHandler::SetNoBody(bool on) {
 }
 
 bool APIHandler::SetShareCurlHandler(void* share) {
-    if (curl_ == nullptr || share == nullptr) {
+    if (GetCurlHandler() == nullptr || share == nullptr) {
         LOG_ERROR("curl handler or share handler is null");
         return false;
     }

@@ -1,13 +1,13 @@
 #include "http/handle_key.h"
 
 #include <openssl/evp.h>
-#include <sys/stat.h>
 
 #include <cstdlib>
 #include <initializer_list>
 #include <stdexcept>
 #include <tuple>
 
+#include "core/file_memo.h"
 #include "core/paths.h"
 #include "zyrovfs/global.h"
 
@@ -24,18 +24,19 @@ constexpr const char* kProxyVariables[] = {"http_proxy", "https_proxy", "HTTPS_P
                                            "ftp_proxy",  "FTP_PROXY",   "all_proxy",
                                            "ALL_PROXY",  "no_proxy",    "NO_PROXY"};
 
-/** Changes with the contents: files of this kind are replaced or written, never edited unseen. */
+/** Changes with the contents. */
 std::string Identity(const std::string& path) {
-    struct stat info {};
-    if (stat(path.c_str(), &info) != 0) {
+    FileIdentity file;
+    if (!Identify(path, file)) {
         return path + " missing";
     }
     std::string text = path;
     for (const auto number :
-         {static_cast<long long>(info.st_dev), static_cast<long long>(info.st_ino),
-          static_cast<long long>(info.st_size), static_cast<long long>(info.st_mtim.tv_sec),
-          static_cast<long long>(info.st_mtim.tv_nsec), static_cast<long long>(info.st_ctim.tv_sec),
-          static_cast<long long>(info.st_ctim.tv_nsec)}) {
+         {static_cast<long long>(file.device), static_cast<long long>(file.inode),
+          static_cast<long long>(file.size), static_cast<long long>(file.modified.tv_sec),
+          static_cast<long long>(file.modified.tv_nsec),
+          static_cast<long long>(file.changed.tv_sec),
+          static_cast<long long>(file.changed.tv_nsec)}) {
         text += ' ' + std::to_string(number);
     }
     return text;

@@ -132,6 +132,10 @@ bool MoveEntry(unsigned int uid, VFS_CONFIG_MODE mode, const std::string& from,
 
 }  // namespace
 
+std::string DocumentPath(unsigned int uid, VFS_CONFIG_MODE mode) {
+    return PlaceOf(uid, mode).Path();
+}
+
 bool CfgCheckPath(unsigned int uid, VFS_CONFIG_MODE mode) {
     return NoThrow(VFS_ERR_FAILED,
                    [&] { return static_cast<bool>(OpenFolder(uid, PlaceOf(uid, mode))); });
@@ -142,7 +146,7 @@ bool CfgGetPath(unsigned int uid, VFS_CONFIG_MODE mode, std::string& path) {
         if (!CfgCheckPath(uid, mode)) {
             return false;
         }
-        path = PlaceOf(uid, mode).Path();
+        path = DocumentPath(uid, mode);
         return true;
     });
 }

@@ -1,12 +1,18 @@
-/** Reading the document of a profile file, whatever stands in it. */
+/** The document of a profile file: where it is, and what stands in it, whatever that may be. */
 #ifndef ZYROVFS_SERVER_CONFIG_DOCUMENT_H
 #define ZYROVFS_SERVER_CONFIG_DOCUMENT_H
 
 #include <json/value.h>
 
 #include <cstring>
+#include <string>
+
+#include "zyrovfs/server.h"
 
 namespace ZYROVFS::Server {
+
+/** The path of a user's document, which may be missing. */
+std::string DocumentPath(unsigned int uid, VFS_CONFIG_MODE mode);
 
 /** The profiles by server id; null, and so without members, when the document has no such object.
  */

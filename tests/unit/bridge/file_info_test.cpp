@@ -2,8 +2,11 @@
 
 #include <gmock/gmock.h>
 
+#include <algorithm>
+#include <memory>
 #include <set>
 #include <string>
+#include <vector>
 
 namespace ZYROCloud {
 namespace {
@@ -82,6 +85,38 @@ TEST(SetGFileInfo, NoRecordIsNoHarm) {
     SetGFileInfo(nullptr, "1", false, "n", "n", 0, {}, {}, {}, {}, nullptr);
     SetGFileInfo(&none, "1", false, "n", "n", 0, {}, {}, {}, {}, nullptr);
     EXPECT_EQ(none, nullptr);
+}
+
+std::vector<std::string> Attributes(GFileInfo* info) {
+    std::vector<std::string> found;
+    char** names = g_file_info_list_attributes(info, nullptr);
+    for (char** name = names; *name != nullptr; ++name) {
+        const std::unique_ptr<char, ZYROVFS::FreeWith<g_free>> value(
+            g_file_info_get_attribute_as_string(info, *name));
+        found.push_back(std::string(*name) + "=" + value.get());
+    }
+    g_strfreev(names);
+    std::sort(found.begin(), found.end());
+    return found;
+}
+
+TEST(NewGFileInfo, WhenFilledIsWhatAnEmptyRecordBecomes) {
+    for (const char* description : {static_cast<const char*>(nullptr), "text"}) {
+        const UniqueFileInfo empty(g_file_info_new());
+        const UniqueFileInfo full = NewGFileInfo();
+        for (GFileInfo* info : {empty.get(), full.get()}) {
+            SetGFileInfo(&info, "id", true, "shown", "name", 7, {1, 2}, {3, 4}, {5, 6}, {7, 8},
+                         description);
+        }
+        EXPECT_EQ(Attributes(full.get()), Attributes(empty.get()));
+        EXPECT_GT(Attributes(full.get()).size(), 15U);
+    }
+}
+
+TEST(NewGFileInfo, IsAnotherOneEachTime) {
+    const UniqueFileInfo first = NewGFileInfo();
+    g_file_info_set_name(first.get(), "first");
+    EXPECT_STREQ(InfoName(NewGFileInfo().get()), "");
 }
 
 TEST(FileInfoTexts, OfARecordWithoutThemOrNoneAreNoTexts) {

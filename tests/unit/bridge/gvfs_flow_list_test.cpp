@@ -217,6 +217,19 @@ TEST_P(FlowList, TellsWhoCallsBackAndUsesTheCacheMeanwhile) {
     EXPECT_NE(Cached("/elsewhere/a.txt"), nullptr);
 }
 
+TEST_P(FlowList, GivesTheCallbackARecordOfItsOwnToChange) {
+    amy.AddPath("/a.txt", "text");
+    const auto change = [](GFileInfo* info, void*) {
+        g_file_info_remove_attribute(info, "id::file");
+        g_file_info_set_size(info, 99);
+    };
+    ASSERT_EQ(rig->List(server_id.c_str(), cache, rig->Top().c_str(), change, nullptr, &err), 1);
+    GFileInfo* const cached = Cached(Shown("/a.txt"));
+    ASSERT_NE(cached, nullptr);
+    EXPECT_NE(IdOf(cached), "");
+    EXPECT_EQ(g_file_info_get_size(cached), 4);
+}
+
 TEST_P(FlowList, NeedsNeitherACallbackNorAPlaceForTheError) {
     amy.AddPath("/a.txt", "a");
     const char* const top = rig->Top() == "/" ? "/" : "/My Drive";

@@ -47,6 +47,40 @@ class FlowThreads : public EachBackend {
         return told;
     }
 
+    /** What a listing by any thread tells of a file. */
+    ZYROCloud::UniqueFileInfo Find(const std::string& name) {
+        struct Search {
+            const std::string& name;
+            GFileInfo* found;
+        } search{name, nullptr};
+        const auto compare = [](GFileInfo* info, void* user_data) {
+            auto& wanted = *static_cast<Search*>(user_data);
+            if (wanted.name == g_file_info_get_name(info)) {
+                wanted.found = static_cast<GFileInfo*>(g_object_ref(info));
+            }
+        };
+        int error = kUntouched;
+        rig->List(server_id.c_str(), cache, rig->Top().c_str(), compare, &search, &error);
+        EXPECT_NE(search.found, nullptr) << name << " " << error;
+        return ZYROCloud::UniqueFileInfo(search.found);
+    }
+
+    /** The contents of a file, read by any thread. */
+    std::string Contents(GFileInfo* info) {
+        const UniqueHandle handle(
+            ZYROCloud_Cloud_Handle_New(server_id.c_str(), IdOf(info).c_str(), info));
+        std::string all;
+        std::string piece(65, '\0');
+        int error = kUntouched;
+        for (long long got = 1; got > 0;) {
+            char* dest = piece.data();
+            got = rig->Read(handle.get(), &dest, 64, &error);
+            all.append(piece, 0, static_cast<size_t>(std::max(got, 0LL)));
+        }
+        EXPECT_EQ(error, kUntouched);
+        return all;
+    }
+
     std::vector<std::string> names;
 };
 
@@ -99,6 +133,35 @@ TEST_P(FlowThreads, ThatReadTwoFilesEachGetTheirOwnBytes) {
         EXPECT_EQ(error, kUntouched);
     };
     Together({[&] { read(first, 101); }, [&] { read(second, 102); }});
+}
+
+// Fresh drivers for all of it, handles of the pool, and the profile under them changing its file.
+TEST_P(FlowThreads, ThatListRenameReadAndDeleteWhileTheConnectionIsRewrittenGetAlong) {
+    const std::string path = profiles::File(profiles::VFS_CONFIG_CONNECT);
+    const Json::Value document = Object(profiles::Text(path));
+    const auto rewrite = [&] {
+        for (int i = 0; i < 5 * kRounds; ++i) {
+            EXPECT_TRUE(json::toFile(document, path, 0600));
+        }
+    };
+    const auto work = [&](int number) {
+        std::string name = names[static_cast<size_t>(number)];
+        int error = kUntouched;
+        for (int i = 0; i < kRounds; ++i) {
+            const std::string id = IdOf(Find(name).get());
+            name = std::to_string(i) + " " + names[static_cast<size_t>(number)];
+            EXPECT_EQ(ZYROCloud_Cloud_Rename(server_id.c_str(), kUnused, id.c_str(), name.c_str(),
+                                             &error),
+                      1);
+            EXPECT_EQ(Contents(Find(name).get()),
+                      std::string(static_cast<size_t>(100 + number), 'a'));
+        }
+        const std::string id = IdOf(Find(name).get());
+        EXPECT_EQ(ZYROCloud_Cloud_Delete(server_id.c_str(), kUnused, id.c_str(), &error), 1);
+        EXPECT_EQ(error, kUntouched);
+    };
+    Together({rewrite, [&] { work(0); }, [&] { work(1); }, [&] { work(2); }, [&] { work(3); }});
+    EXPECT_EQ(ListNames().size(), names.size() - 4);
 }
 
 }  // namespace

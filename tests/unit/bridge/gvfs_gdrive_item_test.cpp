@@ -1,15 +1,11 @@
 #include "bridge/gvfs_gdrive_item.h"
 
-#include <gmock/gmock.h>
-
-#include "core/json.h"
 #include "support/seams.h"
+#include "unit/bridge/item_fixture.h"
 #include "zyrovfs/zyrocloud.h"
 
 namespace ZYROCloud::gvfs {
 namespace {
-
-using ZYROVFS::json::fromString;
 
 constexpr const char* kDocument = "application/vnd.google-apps.document";
 constexpr const char* kFolder = "application/vnd.google-apps.folder";
@@ -36,12 +32,6 @@ ItemRecord Converted(const Json::Value& item, const IsTaken& is_taken = Free) {
     ItemRecord record;
     EXPECT_TRUE(GoogleRecord(item, is_taken, record));
     return record;
-}
-
-Json::Value Parsed(const std::string& text) {
-    Json::Value value;
-    EXPECT_TRUE(fromString(value, text)) << text;
-    return value;
 }
 
 TEST(GooglePath, StandsForWhatItsFirstNameSays) {
