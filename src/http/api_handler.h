@@ -26,6 +26,10 @@
 #include "http/handle_pool.h"
 #include "zyrovfs/cloud.h"
 
+namespace ZYROVFS {
+struct ServerTrust;
+}
+
 namespace ZYROCloud {
 
 /** What libcurl calls to go back in the bytes to send: CURL_SEEKFUNC_... */
@@ -188,8 +192,8 @@ class APIHandler {
                 ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
     bool SetMember(const char* key, const Json::Value& object);
     bool AddMember(const char* key, const std::string& name, const Json::Value& value);
-    char* KeepText(ZYROVFS::UniqueCString text);
-    void UsePinnedCertificate(const std::string& path);
+    char* KeepText(const std::string& text);
+    void UsePinnedCertificate(const ZYROVFS::ServerTrust& trust);
     std::string LoggableUrl() const;
     bool SetHeaders(curl_slist** list);
     bool SetTarget();
