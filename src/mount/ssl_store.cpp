@@ -11,6 +11,7 @@
 #include "core/paths.h"
 #include "mount/curl.h"
 #include "mount/mkdir.h"
+#include "mount/server_uri.h"
 #include "mount/ssl_verify.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
@@ -70,7 +71,7 @@ OwnedFolder OpenSslFolder(uid_t uid) {
 }
 
 bool Locate(const char* given, Location& location) {
-    const std::string url = WebUrl(given);
+    const std::string url = WithoutUser(ReadableUri(WebUrl(given)));
     std::string name;
     if (!ServerFileName(url, name)) {
         return Fail(VFS_ERR_HOST_UNREACHABLE);

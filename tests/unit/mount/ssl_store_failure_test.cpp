@@ -254,6 +254,16 @@ TEST_F(SslPeer, TheUserIsLeftOutOfTheAddress) {
     EXPECT_EQ(requests[1].headers.count("authorization"), 0U);
 }
 
+TEST_F(SslPeer, AccountsWithReservedCharactersDoNotLeadToAnotherServer) {
+    const tls::TlsServer server(signed_);
+    const std::string at = "@localhost:" + std::to_string(server.Port());
+    for (const std::string account : {"a@b", "a/b", "a?b", "a#b"}) {
+        const Answer answer = Ask("davs://" + account + at);
+        EXPECT_TRUE(answer.ok) << account << answer;
+    }
+    EXPECT_EQ(Names().size(), 1U);
+}
+
 TEST_F(SslPeer, PathsWithSpacesUtf8AndPercentSignsReachTheServer) {
     const tls::TlsServer server(signed_);
     const Answer answer = Ask(Davs(server, "/my files/\xC3\xA9t\xC3\xA9/100%/a?b#c"));
