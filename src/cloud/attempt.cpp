@@ -2,6 +2,7 @@
 
 #include <unistd.h>
 
+#include "cloud/guard.h"
 #include "core/json.h"
 #include "core/log.h"
 #include "http/api_handler.h"
@@ -82,7 +83,8 @@ class Attempts {
 }  // namespace
 
 bool RunAttempts(Cloud& cloud, const AttemptPlan& plan, SourceLine at) {
-    return Attempts(cloud, plan, at).Run();
+    const Json::Value before = cloud.GetError();
+    return Conclude(cloud, Attempts(cloud, plan, at).Run(), before);
 }
 
 NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured) {

@@ -73,8 +73,8 @@ struct AttemptPlan {
 constexpr const char* kRequestFailed = "Failed to process curl %s, err:%s";
 constexpr const char* kNoAttemptLeft = "Retry times reach max times, %s, err: %s";
 
-/** True when one attempt succeeded. False leaves the cause in the driver's record. The log lines
- * are those of the caller. */
+/** True when one attempt succeeded; those before it leave nothing in the driver's record. False
+ * leaves the cause there. The log lines are those of the caller. */
 bool RunAttempts(Cloud& cloud, const AttemptPlan& plan,
                  ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
 

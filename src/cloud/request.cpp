@@ -118,7 +118,6 @@ bool Request::Describe(APIHandler& api) {
 
 bool Request::Process() {
     APIHandler* api = cloud_.GetAPIHandler();
-    before_ = cloud_.GetError();
     if (rules_.renews_token ? cloud_.DoAPIRequest(retries_) : api->Process(retries_)) {
         return true;
     }
@@ -133,9 +132,7 @@ bool Request::Refused() {
         }
         // What was got round is no failure of the whole. That an item was gone stays for callers to
         // read.
-        if (spared_ == VFS_ERR_CONFLICT) {
-            cloud_.SetError(before_);
-        }
+        stays_ = spared_ == VFS_ERR_NOT_FOUND;
         return true;
     }
     LOG_ERROR_AT(at_, "Failed to process curl %s, err:%s", url_.c_str(),
@@ -143,19 +140,22 @@ bool Request::Refused() {
     return false;
 }
 
+template <typename Body>
+bool Request::End(Body body) {
+    const Json::Value before = cloud_.GetError();
+    stays_ = false;
+    const bool done = Barrier(cloud_, body, at_);
+    return stays_ ? done : Conclude(cloud_, done, before);
+}
+
 bool Request::Send() {
-    return Guard(
-        cloud_, [this] { return Prepare() && (Process() || Refused()); }, at_);
+    return End([this] { return Prepare() && (Process() || Refused()); });
 }
 
 bool Request::Send(Json::Value& answer) {
-    return Guard(
-        cloud_,
-        [&] {
-            return Prepare() &&
-                   (rules_.repeats_bad_answer ? AskForAnswer(answer) : TakeAnswer(answer));
-        },
-        at_);
+    return End([&] {
+        return Prepare() && (rules_.repeats_bad_answer ? AskForAnswer(answer) : TakeAnswer(answer));
+    });
 }
 
 bool Request::TakeAnswer(Json::Value& answer) {

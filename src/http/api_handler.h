@@ -123,6 +123,7 @@ class APIHandler {
     /** The body comes from the read function. `mute` throws the answer's body away. */
     bool SetUploadOpt(bool mute);
     bool SetUploadSize(long long size);
+    /** Both empty: nobody, which at an FTP server is a guest. */
     bool SetUserPwOpt(const std::string& user, const std::string& password);
     /** FTP commands to send before the transfer; `*commands` stays the caller's and must outlive
      * Process. The text is not read. */
