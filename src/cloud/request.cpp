@@ -140,20 +140,20 @@ bool Request::Refused() {
     return false;
 }
 
-template <typename Body>
-bool Request::End(Body body) {
+template <typename Steps>
+bool Request::Conclude(Steps steps) {
     const Json::Value before = cloud_.GetError();
     stays_ = false;
-    const bool done = Barrier(cloud_, body, at_);
-    return stays_ ? done : Conclude(cloud_, done, before);
+    const bool done = Barrier(cloud_, steps, at_);
+    return stays_ ? done : ZYROCloud::Conclude(cloud_, done, before);
 }
 
 bool Request::Send() {
-    return End([this] { return Prepare() && (Process() || Refused()); });
+    return Conclude([this] { return Prepare() && (Process() || Refused()); });
 }
 
 bool Request::Send(Json::Value& answer) {
-    return End([&] {
+    return Conclude([&] {
         return Prepare() && (rules_.repeats_bad_answer ? AskForAnswer(answer) : TakeAnswer(answer));
     });
 }

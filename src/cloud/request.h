@@ -77,8 +77,8 @@ class Request {
     bool Describe(APIHandler& api);
     bool Process();
     bool Refused();
-    template <typename Body>
-    bool End(Body body);
+    template <typename Steps>
+    bool Conclude(Steps steps);
     bool TakeAnswer(Json::Value& answer);
     bool AskForAnswer(Json::Value& answer);
 

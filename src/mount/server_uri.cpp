@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <cctype>
-#include <cstdio>
 #include <cstring>
 
 #include "mount/glib_handle.h"
@@ -39,18 +38,25 @@ size_t UserLength(const std::string& text) {
     return at == std::string::npos ? 0 : at;
 }
 
+const char* EscapeOf(char reserved) {
+    switch (reserved) {
+        case '@':
+            return "%40";
+        case '/':
+            return "%2F";
+        case '?':
+            return "%3F";
+        default:
+            return "%23";  // '#'
+    }
+}
+
 }  // namespace
 
 std::string EscapeUser(const std::string& user) {
-    std::string escaped;
-    for (const char c : user) {
-        if (strchr(kReserved, c) != nullptr && c != '\0') {
-            char code[4];
-            snprintf(code, sizeof code, "%%%02X", static_cast<unsigned>(c));
-            escaped += code;
-        } else {
-            escaped += c;
-        }
+    std::string escaped = user;
+    for (size_t at = 0; (at = escaped.find_first_of(kReserved, at)) != std::string::npos;) {
+        escaped.replace(at, 1, EscapeOf(escaped[at]));
     }
     return escaped;
 }

@@ -117,6 +117,26 @@ TEST_F(Trust, APinOfOneUserIsNoPinOfAnother) {
     }
 }
 
+TEST_F(Trust, ALinkThatWasRemovedOrBecameAPinEndsTheTrust) {
+    const tls::TlsServer server(Open(signed_));
+    for (const std::string& text : {std::string(), tls::Make({}).certificate}) {
+        const size_t before = server.Requests().size();
+        fs::create_directories(folder_);
+        fs::create_symlink(paths::kCaBundle, File(server));
+        APIHandler api(share_);
+        EXPECT_TRUE(Fetch(api, server)) << seams::LogDump();
+        EXPECT_TRUE(Fetch(server));
+        unlink(File(server).c_str());
+        if (!text.empty()) {
+            Save(server, text);
+        }
+        EXPECT_FALSE(Fetch(api, server));
+        EXPECT_FALSE(Fetch(server));
+        EXPECT_EQ(server.Requests().size(), before + 2);
+        unlink(File(server).c_str());
+    }
+}
+
 TEST_F(Trust, APinnedServerIsNotTrustedByTheServices) {
     const tls::TlsServer server(Open(own_));
     Save(server, own_.certificate);
