@@ -239,7 +239,7 @@ CURLcode CheckCtxFn(CURL* curl, void* ctx, void* data) noexcept try {
     if (!redirected) {
         handshakes.asked = peer;
     }
-    handshakes.check.led_on = redirected && !(peer == handshakes.asked);
+    handshakes.check.led_on = redirected && (peer.host.empty() || !(peer == handshakes.asked));
     return handshakes.check.led_on ? handshakes.CheckOther(curl, ssl, peer)
                                    : handshakes.CheckAsked(curl, ssl);
 } catch (const std::exception&) {

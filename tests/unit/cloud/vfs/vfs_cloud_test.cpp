@@ -410,7 +410,7 @@ TEST_F(VfsCloud, WithoutATransferNothingHappensAndWrongValuesAreAFailure) {
     VFSCloud cloud(kUser, Profile("dav"));
     EXPECT_FALSE(cloud.UploadProcess(nullptr, Meta("dav://x/a")));
     EXPECT_FALSE(cloud.DownloadProcess(nullptr, Meta("dav://x/a")));
-    EXPECT_EQ(cloud.GetErrorCode(), VFS_ERR_NONE);
+    EXPECT_EQ(cloud.GetErrorCode(), VFS_ERR_CLOUD_FAILED);
     for (const char* text : {"[]", "7", R"({"url":{}})", R"({"url":[1]})", "{}"}) {
         Json::Value meta;
         ASSERT_TRUE(json::fromString(meta, text));
