@@ -46,6 +46,10 @@ TEST_P(AccountName, ConnectsTransfersAndIsForgotten) {
         << cloud->GetError().toStyledString();
     EXPECT_EQ(machine::Read(kRemote + "new.txt"), "from amy");
 
+    const machine::Outcome told =
+        machine::Run(BuildDir() + "/tools/zyrovfs/zyrovfs cat '" + id + "/told.txt' --user amy");
+    EXPECT_EQ(told.output, "told") << told.status;
+
     EXPECT_TRUE(Server::Delete(kAmy, Server::VFS_CONFIG_CONNECT, id.c_str()))
         << GetErrorName(GetError());
     EXPECT_FALSE(fs::exists(record["path"].asString() + "/told.txt"));
