@@ -84,7 +84,11 @@ class Attempts {
 
 bool RunAttempts(Cloud& cloud, const AttemptPlan& plan, SourceLine at) {
     const Json::Value before = cloud.GetError();
-    return Conclude(cloud, Attempts(cloud, plan, at).Run(), before);
+    const bool done = Attempts(cloud, plan, at).Run();
+    if (!done && cloud.GetErrorCode() == VFS_ERR_NONE) {
+        cloud.SetError(plan.unexplained, "");
+    }
+    return Conclude(cloud, done, before);
 }
 
 NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured) {

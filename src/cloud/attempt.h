@@ -58,6 +58,8 @@ struct AttemptPlan {
 
     CopyError copy = CopyError::kBeforeCancelTest;
     bool cancel_test_after = true;
+    /** The code of a failure for which neither the driver nor its handler has one. */
+    __tag_vfs_err_ unexplained = ZYROVFS::VFS_ERR_CLOUD_FAILED;
     /** Number that the log gives the first attempt. */
     int first_number = 0;
     /** "Retry Download": the log line adds number and limit. */
