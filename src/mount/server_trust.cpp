@@ -94,12 +94,19 @@ bool ReadTrust(const std::string& file, ServerTrust& trust) {
 
 ServerTrust TrustOfServer(uid_t user, const std::string& name) {
     const OwnedFolder folder = OwnedFolder::Open(paths::SslDir(user), user);
+    const std::string entry = folder ? SavedEntry(folder, name) : name;
     ServerTrust trust;
-    trust.file = paths::SslDir(user) + "/" + (folder ? SavedEntry(folder, name) : name);
-    if (Utils::isTrustRootCA(trust.file.c_str())) {
-        trust.kind = ServerTrust::kBundle;  // libcurl reads the bundle by itself
+    trust.file = paths::SslDir(user) + "/" + entry;
+    std::string target;
+    if (!folder || !IsSaved(folder, entry)) {
+        LOG_ERROR("Failed to open [%s], nothing is saved", trust.file.c_str());
+    } else if (folder.ReadLink(entry, target)) {
+        trust.kind = target == paths::kCaBundle ? ServerTrust::kBundle : ServerTrust::kUndecided;
+    } else if (folder.Read(entry, kCertFileLimit, trust.certificate)) {
+        trust.kind = ServerTrust::kPinned;
+        trust.certificate.resize(strlen(trust.certificate.c_str()));  // who uses it reads so far
     } else {
-        ReadTrust(trust.file, trust);
+        LOG_ERROR("Failed to open [%s], %m", trust.file.c_str());
     }
     return trust;
 }
