@@ -144,7 +144,11 @@ class ZYROVFS_API Cloud {
     void SetError(const Json::Value& error);
     void SetError(__tag_vfs_err_ code, const std::string& msg);
     Json::Value GetError() const;
-    /** VFS_ERR_NONE for a new driver; nothing clears the code between operations. */
+    /**
+     * VFS_ERR_NONE for a new driver. An operation that fails sets a code; one that succeeds leaves
+     * what was there before it, since nothing clears the code between operations. Delete of what
+     * was gone already may answer true and leave VFS_ERR_NOT_FOUND.
+     */
     __tag_vfs_err_ GetErrorCode() const;
     /** The code as a value of GIOErrorEnum. */
     int GetGIOError() const;

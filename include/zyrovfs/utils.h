@@ -99,7 +99,8 @@ ZYROVFS_API bool ParseDropboxTimeToEcho(const std::string& text, long& seconds);
 ZYROVFS_API std::string DecodeURI(const char* text);
 
 /**
- * Server id (scheme, user, host, port) and what stands behind it. The second is cut at the length
+ * Server id (scheme, user, host, port) and what stands behind it. The user may have an '@' in it; a
+ * '/', '?' or '#' only where nothing stands behind. The second is cut at the length
  * of the first, so `uri` must begin with exactly that text: escapes in user or host shift the cut.
  */
 ZYROVFS_API bool GetURIParts(const char* uri, std::string& base, std::string& rest);
@@ -114,13 +115,16 @@ ZYROVFS_API bool ConvDavProtocol(const std::string& in, std::string& out);
 
 /**
  * Decides whether the certificate of a dav:// or davs:// server is trusted: by the user's saved
- * copy, or by the CA bundle. `force` saves the certificate that the server shows now. False leaves
+ * copy, or by the CA bundle. `force` saves the certificate that the server shows now. What the
+ * server answers behind the handshake, a refused password for one, does not matter. One to which it
+ * leads is checked for itself, and nothing is saved for it. False leaves
  * VFS_ERR_CERT_UNTRUSTED with the certificate in the error detail, VFS_ERR_HOST_UNREACHABLE,
  * VFS_ERR_ACCESS_DENIED or VFS_ERR_FAILED.
  */
 ZYROVFS_API bool SSLVerifyPeer(const char* user, const char* password, const char* url, bool force);
 
-/** One check against `certPath` (a saved certificate, or the CA bundle). Codes as SSLVerifyPeer. */
+/** One check against `certPath` (a saved certificate, or the CA bundle), whatever was checked
+ * before. Codes as SSLVerifyPeer. */
 ZYROVFS_API bool VerifyCert(const char* user, const char* password, const char* url,
                             const char* certPath);
 

@@ -1,5 +1,6 @@
 #include <gio/gio.h>
 
+#include <algorithm>
 #include <array>
 #include <cstdlib>
 #include <cstring>
@@ -128,13 +129,38 @@ std::optional<std::string> LookUp(const char* url) {
     return std::nullopt;
 }
 
-/** As the variable has it, percent escapes included: so it may be put into a URL again. */
-std::string FindAuth() {
-    for (const auto& variables : {kSchemes[0].variables, kSchemes[2].variables, kAllSchemes}) {
-        const Uri uri = ParseProxy(ProxyUrl(variables).c_str());
+/** The proxy that this thread was told of last; "" for none and for a direct connection. */
+thread_local std::string last_address;
+
+struct Proxy {
+    std::string address;
+    std::string auth;  ///< as the variable has it, escapes included: it may be put into a URL again
+};
+
+std::vector<Proxy> AllProxies() {
+    std::vector<Proxy> proxies;
+    for (const auto& variables :
+         {kSchemes[0].variables, kSchemes[2].variables, kSchemes[4].variables, kAllSchemes}) {
+        const std::string url = ProxyUrl(variables);
+        const std::string address = url.empty() ? "" : AddressOf(url.c_str()).value_or("");
+        const Uri uri = ParseProxy(url.c_str());
         const char* auth = uri ? g_uri_get_userinfo(uri.get()) : nullptr;
-        if (auth != nullptr && *auth != '\0') {
-            return auth;
+        if (!address.empty()) {
+            proxies.push_back({address, auth == nullptr ? "" : auth});
+        }
+    }
+    return proxies;
+}
+
+/** Where there are several proxies, each gets its own: the caller has asked for an address. */
+std::string FindAuth() {
+    const std::vector<Proxy> proxies = AllProxies();
+    const bool only_one = std::all_of(proxies.begin(), proxies.end(), [&](const Proxy& each) {
+        return each.address == proxies[0].address;
+    });
+    for (const Proxy& proxy : proxies) {
+        if (!proxy.auth.empty() && (only_one || proxy.address == last_address)) {
+            return proxy.auth;
         }
     }
     return {};
@@ -164,6 +190,7 @@ int ZYROProxyGetAddrByUrl(const char* url, char* address, int size) {
             SET_PLATFORM_ERROR(ZOS_ERR_BAD_FORMAT);
             return 0;
         }
+        last_address = *found;
         return Deliver(*found, address, size);
     });
 }

@@ -2,6 +2,7 @@
 
 #include <unistd.h>
 
+#include "cloud/guard.h"
 #include "core/json.h"
 #include "core/log.h"
 #include "core/loggable_url.h"
@@ -83,7 +84,12 @@ class Attempts {
 }  // namespace
 
 bool RunAttempts(Cloud& cloud, const AttemptPlan& plan, SourceLine at) {
-    return Attempts(cloud, plan, at).Run();
+    const Json::Value before = cloud.GetError();
+    const bool done = Attempts(cloud, plan, at).Run();
+    if (!done && cloud.GetErrorCode() == VFS_ERR_NONE) {
+        cloud.SetError(plan.unexplained, "");
+    }
+    return Conclude(cloud, done, before);
 }
 
 NextStep JudgeUpload(Cloud& cloud, const XferContext& context, bool cured) {

@@ -58,6 +58,8 @@ struct AttemptPlan {
 
     CopyError copy = CopyError::kBeforeCancelTest;
     bool cancel_test_after = true;
+    /** The code of a failure for which neither the driver nor its handler has one. */
+    __tag_vfs_err_ unexplained = ZYROVFS::VFS_ERR_CLOUD_FAILED;
     /** Number that the log gives the first attempt. */
     int first_number = 0;
     /** "Retry Download": the log line adds number and limit. */
@@ -73,8 +75,8 @@ struct AttemptPlan {
 constexpr const char* kRequestFailed = "Failed to process curl %s, err:%s";
 constexpr const char* kNoAttemptLeft = "Retry times reach max times, %s, err: %s";
 
-/** True when one attempt succeeded. False leaves the cause in the driver's record. The log lines
- * are those of the caller. */
+/** True when one attempt succeeded; those before it leave nothing in the driver's record. False
+ * leaves the cause there. The log lines are those of the caller. */
 bool RunAttempts(Cloud& cloud, const AttemptPlan& plan,
                  ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
 

@@ -8,6 +8,7 @@
 #include "cloud/stored_profile.h"
 #include "cloud/vfs/vfs_cloud.h"
 #include "core/log.h"
+#include "server/location_id.h"
 #include "zyrovfs/cloud_utils.h"
 
 namespace ZYROCloud::Utils {
@@ -72,7 +73,7 @@ Cloud* CreateCloudByURI(unsigned int uid, const std::string& uri, Server::VFS_CO
         LOG_ERROR("Failed to get serverID from %s", uri.c_str());
         return nullptr;
     }
-    return CreateCloudByServerID(uid, uri.substr(0, uri.find('/', scheme + strlen("://"))), mode);
+    return CreateCloudByServerID(uid, Server::IdOfLocation(uid, mode, uri), mode);
 }
 
 }  // namespace ZYROCloud::Utils

@@ -119,7 +119,6 @@ bool Request::Describe(APIHandler& api) {
 
 bool Request::Process() {
     APIHandler* api = cloud_.GetAPIHandler();
-    before_ = cloud_.GetError();
     if (rules_.renews_token ? cloud_.DoAPIRequest(retries_) : api->Process(retries_)) {
         return true;
     }
@@ -134,9 +133,7 @@ bool Request::Refused() {
         }
         // What was got round is no failure of the whole. That an item was gone stays for callers to
         // read.
-        if (spared_ == VFS_ERR_CONFLICT) {
-            cloud_.SetError(before_);
-        }
+        stays_ = spared_ == VFS_ERR_NOT_FOUND;
         return true;
     }
     LOG_ERROR_AT(at_, "Failed to process curl %s, err:%s", LoggableUrl(url_).c_str(),
@@ -144,19 +141,22 @@ bool Request::Refused() {
     return false;
 }
 
+template <typename Steps>
+bool Request::Conclude(Steps steps) {
+    const Json::Value before = cloud_.GetError();
+    stays_ = false;
+    const bool done = Barrier(cloud_, steps, at_);
+    return stays_ ? done : ZYROCloud::Conclude(cloud_, done, before);
+}
+
 bool Request::Send() {
-    return Guard(
-        cloud_, [this] { return Prepare() && (Process() || Refused()); }, at_);
+    return Conclude([this] { return Prepare() && (Process() || Refused()); });
 }
 
 bool Request::Send(Json::Value& answer) {
-    return Guard(
-        cloud_,
-        [&] {
-            return Prepare() &&
-                   (rules_.repeats_bad_answer ? AskForAnswer(answer) : TakeAnswer(answer));
-        },
-        at_);
+    return Conclude([&] {
+        return Prepare() && (rules_.repeats_bad_answer ? AskForAnswer(answer) : TakeAnswer(answer));
+    });
 }
 
 bool Request::TakeAnswer(Json::Value& answer) {

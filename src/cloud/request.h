@@ -54,7 +54,8 @@ class Request {
      * for later requests. */
     Request& FailOnError();
     /** The request that fails with `code` is not lost: `way_out` gives its result, and no line is
-     * logged. The driver's record is that failure when it is called. */
+     * logged. The driver's record is that failure when it is called; behind a success it is gone,
+     * but for VFS_ERR_NOT_FOUND. */
     Request& Unless(__tag_vfs_err_ code, std::function<bool()> way_out);
     /** The log line for an answer that is no JSON, in place of the usual one. */
     Request& BadAnswer(const char* text);
@@ -76,6 +77,8 @@ class Request {
     bool Describe(APIHandler& api);
     bool Process();
     bool Refused();
+    template <typename Steps>
+    bool Conclude(Steps steps);
     bool TakeAnswer(Json::Value& answer);
     bool AskForAnswer(Json::Value& answer);
 
@@ -89,7 +92,7 @@ class Request {
     Json::Value headers_, query_, body_;
     bool has_body_ = false;
     __tag_vfs_err_ spared_ = ZYROVFS::VFS_ERR_NONE;
-    Json::Value before_;  ///< the driver's record in front of the request
+    bool stays_ = false;  ///< the failure that was got round, in the driver's record
     std::function<bool()> way_out_;
     const char* bad_answer_ = nullptr;
 };

@@ -35,20 +35,6 @@ constexpr __tag_vfs_err_ kFinal[] = {
     VFS_ERR_RATE_LIMITED, VFS_ERR_PERMISSION_DENIED, VFS_ERR_NOT_FOUND,
 };
 
-/**
- * What a driver ends with becomes what a transfer ends with. A failure has a code, though some of a
- * driver's steps set none; a success has none of its own: what the driver overcame on the way, such
- * as a token that had ended, is no failure.
- */
-bool Finish(Cloud& cloud, bool done, const Json::Value& before) {
-    if (done) {
-        cloud.SetError(before);
-    } else if (cloud.GetErrorCode() == VFS_ERR_NONE) {
-        cloud.SetError(VFS_ERR_CLOUD_FAILED, "");
-    }
-    return done;
-}
-
 /** A transfer's own context for `body`, which answers bool; false when there is no memory for it.
  */
 template <typename Body>
@@ -64,8 +50,7 @@ bool WithContext(Cloud* cloud, Body body, SourceLine at = SourceLine::Here()) {
                 cloud->SetError(VFS_ERR_CLOUD_FAILED, "");
                 return false;
             }
-            const Json::Value before = cloud->GetError();
-            return Finish(*cloud, body(*context), before);
+            return body(*context);
         },
         at);
 }

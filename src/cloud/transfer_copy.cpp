@@ -149,9 +149,6 @@ bool Report(Side& side, const char* text, SourceLine at = SourceLine::Here()) {
     if (side.done) {
         return true;
     }
-    if (side.cloud->GetErrorCode() == VFS_ERR_NONE) {
-        side.cloud->SetError(VFS_ERR_CLOUD_FAILED, "");  // failed before there was a request
-    }
     SetPlatformErrorFromCode(side.cloud->GetErrorCode());
     LOG_ERROR_AT(at, text, json::toString(side.cloud->GetError()).c_str(), YLIBCErrGet());
     return false;
@@ -169,7 +166,7 @@ bool CopyBoth(Cloud& src, Cloud& dst, const std::string& src_uri, const std::str
     src.GetMetaDataByURI(src_uri, source.meta, "Download");
     const SlotInUse slot;
     if (!RunBoth(source, target)) {
-        return false;
+        return Conclude(dst, false, Json::Value());
     }
     if (IsAllTaken(source, target)) {
         SetPlatformErr(0);
@@ -186,11 +183,11 @@ bool Cloud::CopyFile(Cloud* src, Cloud* dst, const std::string& src_uri, const s
                      SpeedCallback speed) {
     if (src == nullptr || dst == nullptr || src == dst) {
         LOG_ERROR("A copy needs two drivers");
-        return false;
+        return dst != nullptr && Conclude(*dst, false, Json::Value());
     }
     BeginTransfer(static_cast<unsigned long long>(size), {progress, cancel, speed});
     transfer.watched_pid = getpid();
-    return Guard(*dst, [&] { return CopyBoth(*src, *dst, src_uri, dst_uri, size); });
+    return Barrier(*dst, [&] { return CopyBoth(*src, *dst, src_uri, dst_uri, size); });
 }
 
 }  // namespace ZYROCloud

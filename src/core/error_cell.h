@@ -25,6 +25,27 @@ inline void SetPlatformErr(unsigned int code, SourceLine at = SourceLine::Here()
     YLIBCErrSetEx(code, at.file, at.line);
 }
 
+/** Puts code and place of the cell back at the end of a scope, for what leaves no failure there. */
+class ErrorCellKept {
+  public:
+    ErrorCellKept() = default;
+    ErrorCellKept(const ErrorCellKept&) = delete;
+    ErrorCellKept& operator=(const ErrorCellKept&) = delete;
+    ~ErrorCellKept() {
+        if (armed_) {
+            VFSSetErrEx(code_, file_, line_);
+        }
+    }
+    /** What the scope has set stays. */
+    void Dismiss() { armed_ = false; }
+
+  private:
+    const __tag_vfs_err_ code_ = GetError();
+    const char* const file_ = GetErrorFile();
+    const int line_ = GetErrorLine();
+    bool armed_ = true;
+};
+
 }  // namespace ZYROVFS
 
 #endif

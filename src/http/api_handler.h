@@ -27,6 +27,10 @@
 #include "http/handle_pool.h"
 #include "zyrovfs/cloud.h"
 
+namespace ZYROVFS {
+struct ServerTrust;
+}
+
 namespace ZYROCloud {
 
 /** Bytes of an answer that is kept in memory. The longest that services give are pages of listings,
@@ -133,6 +137,7 @@ class APIHandler {
     /** The body comes from the read function. `mute` throws the answer's body away. */
     bool SetUploadOpt(bool mute);
     bool SetUploadSize(long long size);
+    /** Both empty: nobody, which at an FTP server is a guest. */
     bool SetUserPwOpt(const std::string& user, const std::string& password);
     /** FTP commands to send before the transfer; `*commands` stays the caller's and must outlive
      * Process. The text is not read. */
@@ -206,8 +211,8 @@ class APIHandler {
                 ZYROVFS::SourceLine at = ZYROVFS::SourceLine::Here());
     bool SetMember(const char* key, const Json::Value& object);
     bool AddMember(const char* key, const std::string& name, const Json::Value& value);
-    char* KeepText(ZYROVFS::UniqueCString text);
-    void UsePinnedCertificate(const std::string& path);
+    char* KeepText(const std::string& text);
+    void UsePinnedCertificate(const ZYROVFS::ServerTrust& trust);
     std::string ShownUrl() const;
     bool SetHeaders(curl_slist** list);
     bool SetTarget();

@@ -235,9 +235,13 @@ bool APIHandler::SetUploadSize(long long size) {
 
 bool APIHandler::SetUserPwOpt(const std::string& user, const std::string& password) {
     wanted_.credentials = handle_key::Credentials(user, password);
+    // An empty user would be sent as one.
+    const bool guest = user.empty() && password.empty();
+    const char* const name = guest ? nullptr : user.c_str();
+    const char* const secret = guest ? nullptr : password.c_str();
     return Accept(curl_easy_setopt(curl_, CURLOPT_HTTPAUTH, kAuthMethods), "http auth") &&
-           Accept(curl_easy_setopt(curl_, CURLOPT_USERNAME, user.c_str()), "user name") &&
-           Accept(curl_easy_setopt(curl_, CURLOPT_PASSWORD, password.c_str()), "password");
+           Accept(curl_easy_setopt(curl_, CURLOPT_USERNAME, name), "user name") &&
+           Accept(curl_easy_setopt(curl_, CURLOPT_PASSWORD, secret), "password");
 }
 
 bool APIHandler::SetCodePage(const std::string&, curl_slist** commands) {

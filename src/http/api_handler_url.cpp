@@ -8,6 +8,7 @@
 #include "core/paths.h"
 #include "http/api_handler.h"
 #include "mount/known_hosts.h"
+#include "mount/server_trust.h"
 #include "mount/ssl_verify.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
@@ -41,10 +42,15 @@ bool IsDavs(const std::string& url) {
     return url.find("davs://") != std::string::npos;
 }
 
-/** Where the certificate of a URL's host would be saved. The URL has a scheme. */
-std::string CertificatePath(const std::string& url) {
-    const size_t begin = url.find(kSchemeEnd) + strlen(kSchemeEnd);
-    return paths::SslDir(GetActorUID()) + "/" + url.substr(begin, url.find('/', begin) - begin);
+/** How the acting user trusts the server of a URL. The URL has a scheme. */
+ServerTrust TrustOf(const std::string& url) {
+    std::string name;
+    return ServerFileName(url, name) ? TrustOfServer(GetActorUID(), name) : ServerTrust();
+}
+
+std::string PinOf(const ServerTrust& trust) {
+    const bool pinned = trust.kind == ServerTrust::kPinned;
+    return handle_key::Pin(trust.file, pinned ? trust.certificate.c_str() : nullptr);
 }
 
 /** What a file protocol's URL decides of a key. */
@@ -80,25 +86,24 @@ bool APIHandler::SetURL(const std::string& url, bool need_escape) {
     return true;
 }
 
-/** The one that connections of this handle may check against already, if the text is the same. */
-char* APIHandler::KeepText(UniqueCString text) {
-    if (text == nullptr) {
-        return nullptr;
-    }
+/** The copy that connections of this handle may check against already, if the text is the same. */
+char* APIHandler::KeepText(const std::string& text) {
     for (const UniqueCString& kept : loan_.texts) {
-        if (strcmp(kept.get(), text.get()) == 0) {
+        if (text == kept.get()) {
             return kept.get();
         }
     }
-    loan_.texts.push_back(std::move(text));
+    loan_.texts.emplace_back(strdup(text.c_str()));
     return loan_.texts.back().get();
 }
 
-void APIHandler::UsePinnedCertificate(const std::string& path) {
-    cert_data_ = KeepText(UniqueCString(Utils::GetCertData(path.c_str())));
-    wanted_.trust = handle_key::Pin(path, cert_data_);
+void APIHandler::UsePinnedCertificate(const ServerTrust& trust) {
+    cert_data_ = trust.kind == ServerTrust::kPinned ? KeepText(trust.certificate) : nullptr;
+    wanted_.trust = PinOf(trust);
     Logged(curl_easy_setopt(curl_, CURLOPT_SSL_VERIFYPEER, 0L));
     Logged(curl_easy_setopt(curl_, CURLOPT_SSL_VERIFYHOST, 0L));
+    // A server to which this one leads must show the same certificate: only the owner of its key
+    // can.
     Logged(curl_easy_setopt(curl_, CURLOPT_SSL_CTX_FUNCTION, &Utils::VerifyCertCtxFn));
     // Without a certificate the check refuses every server.
     Logged(curl_easy_setopt(curl_, CURLOPT_SSL_CTX_DATA, cert_data_));
@@ -109,13 +114,13 @@ bool APIHandler::SetSSLOpt(const std::string& url) {
         ParseCurlError(CURLE_OK);
         return false;
     }
-    const std::string path = CertificatePath(url);
-    if (Utils::isTrustRootCA(path.c_str())) {
+    const ServerTrust trust = TrustOf(url);
+    if (trust.kind == ServerTrust::kBundle) {
         Logged(curl_easy_setopt(curl_, CURLOPT_SSL_VERIFYPEER, 1L));
         Logged(curl_easy_setopt(curl_, CURLOPT_SSL_VERIFYHOST, 2L));
         Logged(curl_easy_setopt(curl_, CURLOPT_CAPATH, paths::kCaBundle));
     } else {
-        UsePinnedCertificate(path);
+        UsePinnedCertificate(trust);
     }
     // The wrong way round; no caller looks at it, and none may begin to.
     return !Logged(
@@ -153,10 +158,9 @@ void APIHandler::ExpectVFSURL(const std::string& url, const std::string& user,
                               const std::string& password) {
     HandleKey key = handle_key::ForServices(share_);
     if (IsDavs(url)) {
-        const std::string path = CertificatePath(url);
-        if (!Utils::isTrustRootCA(path.c_str())) {
-            const UniqueCString text(Utils::GetCertData(path.c_str()));
-            key.trust = handle_key::Pin(path, text.get());
+        const ServerTrust trust = TrustOf(url);
+        if (trust.kind != ServerTrust::kBundle) {
+            key.trust = PinOf(trust);
         }
     }
     SetRoute(url, key);

@@ -38,9 +38,9 @@ bool SetCurlVerification(CURL* curl, bool on);
 bool SetCurlTarget(CURL* curl, const char* user, const char* password, const std::string& url);
 
 /**
- * Runs the conversation; a name that does not resolve is tried once more over IPv4. False leaves
- * VFS_ERR_CERT_UNTRUSTED with the certificate as detail, VFS_ERR_HOST_UNREACHABLE,
- * VFS_ERR_ACCESS_DENIED or VFS_ERR_FAILED. `url` is for the log.
+ * Runs the conversation, whose success is any answer; a name that does not resolve is tried once
+ * more over IPv4. False leaves VFS_ERR_CERT_UNTRUSTED with the certificate as detail,
+ * VFS_ERR_HOST_UNREACHABLE, VFS_ERR_ACCESS_DENIED or VFS_ERR_FAILED. `url` is for the log.
  */
 bool PerformCurl(CURL* curl, const std::string& url);
 

@@ -113,7 +113,7 @@ bool MountLocked(VFS& session) {
 }
 
 bool MountSession(VFS& session) {
-    const std::string uri = session.GetFullURI();
+    const std::string uri = ReadableFullUri(session);
     if (Contains(uri, "davs://") &&
         !Utils::SSLVerifyPeer(session.GetUser().c_str(), session.GetPass().c_str(), uri.c_str(),
                               session.GetForce())) {

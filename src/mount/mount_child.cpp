@@ -11,6 +11,7 @@
 #include "core/log.h"
 #include "mount/glib_handle.h"
 #include "mount/helper.h"
+#include "mount/server_uri.h"
 #include "mount/vfs_question.h"
 #include "mount/vfs_result.h"
 #include "zyrovfs/utils.h"
@@ -33,7 +34,7 @@ void MountLocation(VFS& session) {
         return;
     }
     GFile* file =
-        NewLocation(session.GetFullURI(), session.GetUser(), "", VFS_ERR_HOST_UNREACHABLE);
+        NewLocation(ReadableFullUri(session), session.GetUser(), "", VFS_ERR_HOST_UNREACHABLE);
     if (file == nullptr) {
         return;
     }
@@ -99,9 +100,14 @@ std::unique_ptr<VFSMountOperaion> NewMountOperaion(VFS& session, SourceLine at) 
     return mount;
 }
 
+std::string ReadableFullUri(const VFS& session) {
+    const std::string uri = session.GetURI();
+    return ReadableUri(uri) + session.GetFullURI().substr(uri.size());
+}
+
 GFile* NewLocation(const std::string& uri, const std::string& user, const std::string& path,
                    __tag_vfs_err_ bad_uri, SourceLine at) {
-    const UniqueSoupUri parsed(soup_uri_new(uri.c_str()));
+    const UniqueSoupUri parsed(soup_uri_new(ReadableUri(uri).c_str()));
     if (parsed == nullptr) {
         LOG_ERROR_AT(at, "Wrong uri, %s", uri.c_str());
         SetErr(bad_uri, at);
@@ -113,8 +119,7 @@ GFile* NewLocation(const std::string& uri, const std::string& user, const std::s
     if (!path.empty()) {
         soup_uri_set_path(parsed.get(), (path[0] == '/' ? path : "/" + path).c_str());
     }
-    const UniqueGText text(soup_uri_to_string(parsed.get(), FALSE));
-    const std::string location = Utils::DecodeURI(text.get());
+    const std::string location = GioUri(parsed.get());
     GFile* file = g_file_new_for_commandline_arg(location.c_str());
     if (file == nullptr) {
         SetErr(VFS_ERR_INVALID_SERVER, at);

@@ -30,6 +30,9 @@ void RestoreSession(const Json::Value& request, VFS& session);
 std::unique_ptr<VFSMountOperaion> NewMountOperaion(VFS& session,
                                                    SourceLine at = SourceLine::Here());
 
+/** The session's URI and path as a URI that reads as it is meant. */
+std::string ReadableFullUri(const VFS& session);
+
 /**
  * The location of `uri` with `user` (and `path`, unless empty) put in, as GIO takes it. Null after
  * setting `bad_uri` for a URI that cannot be parsed, or VFS_ERR_INVALID_SERVER.

@@ -2,6 +2,7 @@
 
 #include "core/log.h"
 #include "mount/glib_handle.h"
+#include "mount/server_uri.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
 
@@ -14,7 +15,7 @@ UniqueSoupUri Parse(const char* text, SourceLine at = SourceLine::Here()) {
         LOG_ERROR_AT(at, "Wrong parameters");
         return nullptr;
     }
-    UniqueSoupUri uri(soup_uri_new(text));
+    UniqueSoupUri uri(soup_uri_new(ReadableUri(text).c_str()));
     if (uri == nullptr || uri->scheme == nullptr) {
         LOG_ERROR_AT(at, "Wrong uri, %s", text);
         return nullptr;

@@ -1,19 +1,18 @@
 #include <openssl/bio.h>
 #include <openssl/pem.h>
-#include <openssl/ssl.h>
-#include <openssl/x509_vfy.h>
-#include <strings.h>
 #include <sys/stat.h>
 
 #include <cerrno>
-#include <cstring>
 
 #include "core/entry_name.h"
+#include "core/error_cell.h"
 #include "core/no_throw.h"
 #include "core/owned_folder.h"
 #include "core/paths.h"
 #include "mount/curl.h"
 #include "mount/mkdir.h"
+#include "mount/server_uri.h"
+#include "mount/ssl_verify.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
 
@@ -21,10 +20,6 @@ namespace ZYROVFS {
 namespace {
 
 using UniqueBio = std::unique_ptr<BIO, FreeWith<BIO_free_all>>;
-
-// The callback of a handshake has no argument of its own, so it finds its orders here.
-std::string _strCertPath;
-bool save_failed = false;
 
 /** Folder and file of a server, and the address to ask, without the user. */
 struct Location {
@@ -60,35 +55,6 @@ bool SavePem(X509* certificate, const std::string& path) {
     return true;
 }
 
-/** Called for each certificate of the chain, the server's own last: that one stays. The handshake
- * goes on in any case; whether the certificate is good is for the user to say. */
-int SaveCertificate(int, X509_STORE_CTX* store) noexcept {
-    try {
-        save_failed = !SavePem(X509_STORE_CTX_get_current_cert(store), _strCertPath);
-    } catch (const std::exception& e) {
-        LOG_ERROR("Unexpected failure, %s", e.what());
-        save_failed = true;
-    }
-    return 1;
-}
-
-CURLcode SaverCtxFn(CURL*, void* ctx, void* path) noexcept try {
-    if (path == nullptr) {
-        LOG_ERROR("No cert path");
-        return static_cast<CURLcode>(51);
-    }
-    if (ctx == nullptr) {
-        return CURLE_SSL_CERTPROBLEM;
-    }
-    _strCertPath = static_cast<const char*>(path);
-    auto* ssl = static_cast<SSL_CTX*>(ctx);
-    SSL_CTX_set_verify_depth(ssl, 1);
-    SSL_CTX_set_verify(ssl, SSL_VERIFY_PEER, SaveCertificate);
-    return CURLE_OK;
-} catch (const std::exception&) {
-    return CURLE_OUT_OF_MEMORY;
-}
-
 /** The folder above is that of the user's profiles, which a user who never saved one does not have
  * yet. */
 OwnedFolder OpenSslFolder(uid_t uid) {
@@ -104,23 +70,10 @@ OwnedFolder OpenSslFolder(uid_t uid) {
     return folder;
 }
 
-/** dav is http under another name. */
-std::string WebUrl(const char* url) {
-    static constexpr const char* kSchemes[][2] = {{"dav://", "http://"}, {"davs://", "https://"}};
-    for (const auto& [dav, http] : kSchemes) {
-        if (strncasecmp(url, dav, strlen(dav)) == 0) {
-            return http + std::string(url + strlen(dav));
-        }
-    }
-    return url;
-}
-
 bool Locate(const char* given, Location& location) {
-    const std::string url = WebUrl(given);
-    std::string host;
-    // The host is a file name from here on, and an escaped slash in it has been decoded.
-    if (!Utils::GetHostWithPort(url.c_str(), host) || host.find('/') != std::string::npos) {
-        LOG_ERROR("Failed to get host from %s", url.c_str());
+    const std::string url = WithoutUser(ReadableUri(WebUrl(given)));
+    std::string name;
+    if (!ServerFileName(url, name)) {
         return Fail(VFS_ERR_HOST_UNREACHABLE);
     }
     const std::string path = paths::SslDir(GetActorUID());
@@ -137,11 +90,12 @@ bool Locate(const char* given, Location& location) {
         return Fail(VFS_ERR_HOST_UNREACHABLE);
     }
     location.url = base + rest;
-    location.name = host;
-    location.file = path + "/" + host;
+    location.name = name;
+    location.file = path + "/" + name;
     return true;
 }
 
+/** The new copy stands under the one name that is looked for first. */
 bool Download(const char* user, const char* password, const Location& location) {
     if (!Utils::DownloadCert(user, password, location.url.c_str(), location.file.c_str())) {
         LOG_ERROR("Failed to download cert %s", location.url.c_str());
@@ -150,41 +104,32 @@ bool Download(const char* user, const char* password, const Location& location) 
     return true;
 }
 
-/** Whether something stands in the file's place that can say whom to trust: a file, or a link to
- * the bundle. What else a FIFO or a link may be for, it is no certificate. */
-bool HasSavedFile(const Location& location) {
-    struct stat info {};
-    std::string target;
-    if (!location.folder.Stat(location.name, info)) {
-        return false;
-    }
-    if (S_ISLNK(info.st_mode)) {
-        return location.folder.ReadLink(location.name, target) && target == paths::kCaBundle;
-    }
-    return S_ISREG(info.st_mode) || S_ISDIR(info.st_mode);
-}
-
 /** What the user's own file says. One that no longer fits the server is removed: the certificate
  * was renewed, and what was trusted is gone. */
 Verdict AskSavedFile(const char* user, const char* password, const Location& location) {
-    if (!HasSavedFile(location)) {
+    const std::string entry = SavedEntry(location.folder, location.name);
+    if (!IsSaved(location.folder, entry)) {
         return Verdict::kUntrusted;
     }
-    if (Utils::VerifyCert(user, password, location.url.c_str(), location.file.c_str())) {
+    const std::string file = SplitPath(location.file).folder + "/" + entry;
+    ServerCheck check;
+    if (!ReadTrust(file, check.trust)) {
+        Fail(VFS_ERR_FAILED);
+    } else if (CheckServer(user, password, location.url, check)) {
         return Verdict::kTrusted;
     }
-    if (GetError() != VFS_ERR_CERT_UNTRUSTED) {
-        LOG_ERROR("Failed to verify cert %s by %s", location.url.c_str(), location.file.c_str());
+    if (GetError() != VFS_ERR_CERT_UNTRUSTED || check.led_on) {
+        LOG_ERROR("Failed to verify cert %s by %s", location.url.c_str(), file.c_str());
         return Verdict::kFailed;
     }
-    if (!location.folder.Remove(location.name)) {
-        LOG_ERROR("Failed to unlink %s, %m", location.file.c_str());
+    if (!RemoveSaved(location.folder, location.name)) {
+        LOG_ERROR("Failed to unlink %s, %m", file.c_str());
     }
     return Verdict::kUntrusted;
 }
 
 bool LinkToBundle(const Location& location) {
-    if (HasSavedFile(location)) {
+    if (IsSaved(location.folder, SavedEntry(location.folder, location.name))) {
         return true;
     }
     location.folder.Remove(location.name);  // what is no certificate
@@ -220,17 +165,13 @@ bool Utils::DownloadCert(const char* user, const char* password, const char* url
         return Fail(VFS_ERR_BAD_PARAM);
     }
     return NoThrow(VFS_ERR_FAILED, [&] {
-        const UniqueCurl curl = NewCurl();
-        save_failed = false;
-        if (curl == nullptr || !SetCurlVerification(curl.get(), false) ||
-            !SetCurlOption(curl.get(), CURLOPT_SSL_CTX_FUNCTION, &SaverCtxFn) ||
-            !SetCurlOption(curl.get(), CURLOPT_SSL_CTX_DATA, const_cast<char*>(certPath)) ||
-            !SetCurlTarget(curl.get(), user, password, url) || !PerformCurl(curl.get(), url)) {
+        ServerCheck check;
+        check.save = [certPath](X509* certificate) { return SavePem(certificate, certPath); };
+        // The user has decided about this server; those to which it leads are another matter.
+        if (!CheckServer(user, password, url, check) && !check.led_on) {
             return false;
         }
-        const EntryPath place = SplitPath(certPath);
-        struct stat info {};
-        if (save_failed || !OwnedFolder::Open(place.folder, GetActorUID()).Stat(place.name, info)) {
+        if (!check.saved) {
             LOG_ERROR("Failed to save cert %s", certPath);
             return Fail(VFS_ERR_FAILED);
         }
@@ -243,7 +184,14 @@ bool Utils::SSLVerifyPeer(const char* user, const char* password, const char* ur
         LOG_ERROR("Bad Parameters: szURL is null");
         return Fail(VFS_ERR_BAD_PARAM);
     }
-    return NoThrow(VFS_ERR_FAILED, [&] { return VerifyPeer(user, password, url, force); });
+    return NoThrow(VFS_ERR_FAILED, [&] {
+        ErrorCellKept kept;  // a copy that no longer fits is no failure where the bundle trusts
+        if (VerifyPeer(user, password, url, force)) {
+            return true;
+        }
+        kept.Dismiss();
+        return false;
+    });
 }
 
 }  // namespace ZYROVFS

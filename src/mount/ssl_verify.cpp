@@ -1,6 +1,5 @@
 #include "mount/ssl_verify.h"
 
-#include <fcntl.h>
 #include <openssl/bio.h>
 #include <openssl/err.h>
 #include <openssl/evp.h>
@@ -8,17 +7,12 @@
 #include <openssl/ssl.h>
 #include <openssl/x509.h>
 #include <openssl/x509_vfy.h>
-#include <sys/stat.h>
+#include <strings.h>
 
-#include <atomic>
-#include <cerrno>
-#include <cstdlib>
 #include <cstring>
+#include <list>
 
-#include "core/entry_name.h"
-#include "core/fd_io.h"
 #include "core/no_throw.h"
-#include "core/owned_folder.h"
 #include "core/paths.h"
 #include "mount/cert_info.h"
 #include "mount/curl.h"
@@ -30,15 +24,6 @@ namespace {
 
 using UniqueX509 = std::unique_ptr<X509, FreeWith<X509_free>>;
 using UniqueBio = std::unique_ptr<BIO, FreeWith<BIO_free_all>>;
-
-/**
- * The chain flag: set by the first check against the CA bundle and never cleared. Drivers of this
- * process install VerifyCertCtxFn long after that check, and rely on it staying in force.
- */
-std::atomic<bool> check_chain{false};
-
-/** Far above any bundle. The folder belongs to the user, who may put anything there. */
-constexpr size_t kCertFileLimit = 16 * 1024 * 1024;
 
 struct Digest {
     unsigned char bytes[EVP_MAX_MD_SIZE];
@@ -113,13 +98,10 @@ class ErrorsOfItsOwn {
     ~ErrorsOfItsOwn() { ERR_pop_to_mark(); }
 };
 
-int CheckCertificate(X509_STORE_CTX* store, void* saved) noexcept try {
+int CheckCopy(X509_STORE_CTX* store, void* saved) noexcept try {
     const ErrorsOfItsOwn errors;
     X509* peer = X509_STORE_CTX_get0_cert(store);
     KeepCertificate(peer);
-    if (check_chain) {
-        return X509_verify_cert(store);
-    }
     if (IsSavedCertificate(peer, static_cast<const char*>(saved))) {
         return 1;
     }
@@ -128,6 +110,31 @@ int CheckCertificate(X509_STORE_CTX* store, void* saved) noexcept try {
 } catch (const std::exception& e) {
     LOG_ERROR("Unexpected failure, %s", e.what());
     return 0;
+}
+
+int CheckChain(X509_STORE_CTX* store, void*) noexcept try {
+    const ErrorsOfItsOwn errors;
+    KeepCertificate(X509_STORE_CTX_get0_cert(store));
+    return X509_verify_cert(store);
+} catch (const std::exception& e) {
+    LOG_ERROR("Unexpected failure, %s", e.what());
+    return 0;
+}
+
+/** The handshake goes on in any case: the user has said yes. */
+int SaveCopy(X509_STORE_CTX* store, void* data) noexcept try {
+    const ErrorsOfItsOwn errors;
+    auto& check = *static_cast<ServerCheck*>(data);
+    check.saved = check.save(X509_STORE_CTX_get0_cert(store));
+    return 1;
+} catch (const std::exception& e) {
+    LOG_ERROR("Unexpected failure, %s", e.what());
+    return 1;
+}
+
+void Install(SSL_CTX* ssl, int (*check)(X509_STORE_CTX*, void*), void* data) {
+    SSL_CTX_set_verify(ssl, SSL_VERIFY_PEER | SSL_VERIFY_FAIL_IF_NO_PEER_CERT, nullptr);
+    SSL_CTX_set_cert_verify_callback(ssl, check, data);
 }
 
 /** libcurl leaves the store empty where its own check is off; a chain needs roots to end in. */
@@ -139,72 +146,132 @@ void LoadRoots(SSL_CTX* ssl) {
     }
 }
 
-bool SetTrust(CURL* curl, const char* cert_path, char* saved) {
-    return SetCurlVerification(curl, Utils::isTrustRootCA(cert_path)) &&
-           SetCurlOption(curl, CURLOPT_SSL_CTX_FUNCTION, &Utils::VerifyCertCtxFn) &&
-           SetCurlOption(curl, CURLOPT_SSL_CTX_DATA, saved) &&
-           SetCurlOption(curl, CURLOPT_SSLVERSION, static_cast<long>(CURL_SSLVERSION_TLSv1));
+/** A server as libcurl reads its URL: what is checked must be what it connects to. */
+struct Peer {
+    std::string host;  ///< an IPv6 address without its brackets
+    std::string port;
+
+    bool operator==(const Peer& other) const {
+        return strcasecmp(host.c_str(), other.host.c_str()) == 0 && port == other.port;
+    }
+};
+
+std::string PartOf(CURLU* url, CURLUPart part) {
+    char* text = nullptr;
+    curl_url_get(url, part, &text, CURLU_DEFAULT_PORT);
+    const std::unique_ptr<char, FreeWith<curl_free>> owned(text);
+    return text == nullptr ? "" : text;
+}
+
+/** The one that a handle is about to shake hands with. */
+Peer CurrentPeer(CURL* curl) {
+    const char* text = nullptr;
+    curl_easy_getinfo(curl, CURLINFO_EFFECTIVE_URL, &text);
+    const std::unique_ptr<CURLU, FreeWith<curl_url_cleanup>> url(curl_url());
+    if (url == nullptr || text == nullptr ||
+        curl_url_set(url.get(), CURLUPART_URL, text, CURLU_NON_SUPPORT_SCHEME) != CURLUE_OK) {
+        return {};
+    }
+    std::string host = PartOf(url.get(), CURLUPART_HOST);
+    if (host.size() > 2 && host.front() == '[') {
+        host = host.substr(1, host.size() - 2);
+    }
+    return {host, PartOf(url.get(), CURLUPART_PORT)};
+}
+
+bool IsRedirected(CURL* curl) {
+    long redirects = 0;
+    return curl_easy_getinfo(curl, CURLINFO_REDIRECT_COUNT, &redirects) != CURLE_OK ||
+           redirects != 0;
+}
+
+/** One conversation: the server asked for, and those to which it leads. */
+struct Handshakes {
+    ServerCheck& check;
+    Peer asked;
+    std::list<std::string> pins;  ///< of the others, for as long as the handle
+
+    CURLcode CheckAsked(CURL* curl, SSL_CTX* ssl);
+    CURLcode CheckOther(CURL* curl, SSL_CTX* ssl, const Peer& peer);
+};
+
+CURLcode Handshakes::CheckAsked(CURL* curl, SSL_CTX* ssl) {
+    if (check.save) {
+        SSL_CTX_set_verify_depth(ssl, 1);
+        Install(ssl, SaveCopy, &check);
+        return CURLE_OK;
+    }
+    if (check.trust.kind == ServerTrust::kBundle) {
+        LoadRoots(ssl);
+        Install(ssl, CheckChain, nullptr);
+        return CURLE_OK;
+    }
+    return Utils::VerifyCertCtxFn(curl, ssl, check.trust.certificate.data());
+}
+
+/** As it would be checked if it had been asked for. libcurl looks at names in one conversation for
+ * all servers or for none, so a name is looked at here, too. */
+CURLcode Handshakes::CheckOther(CURL* curl, SSL_CTX* ssl, const Peer& peer) {
+    const ServerTrust trust = TrustOfServer(GetActorUID(), peer.host + ":" + peer.port);
+    if (trust.kind == ServerTrust::kPinned) {
+        pins.push_back(trust.certificate);
+        return Utils::VerifyCertCtxFn(curl, ssl, pins.back().data());
+    }
+    X509_VERIFY_PARAM* param = SSL_CTX_get0_param(ssl);
+    if (peer.host.empty() ||
+        (X509_VERIFY_PARAM_set1_ip_asc(param, peer.host.c_str()) != 1 &&
+         X509_VERIFY_PARAM_set1_host(param, peer.host.c_str(), peer.host.size()) != 1)) {
+        return CURLE_PEER_FAILED_VERIFICATION;
+    }
+    LoadRoots(ssl);
+    Install(ssl, CheckChain, nullptr);
+    return CURLE_OK;
+}
+
+CURLcode CheckCtxFn(CURL* curl, void* ctx, void* data) noexcept try {
+    if (ctx == nullptr) {
+        return CURLE_SSL_CERTPROBLEM;
+    }
+    auto* ssl = static_cast<SSL_CTX*>(ctx);
+    auto& handshakes = *static_cast<Handshakes*>(data);
+    const Peer peer = CurrentPeer(curl);
+    const bool redirected = IsRedirected(curl);
+    if (!redirected) {
+        handshakes.asked = peer;
+    }
+    handshakes.check.led_on = redirected && (peer.host.empty() || !(peer == handshakes.asked));
+    return handshakes.check.led_on ? handshakes.CheckOther(curl, ssl, peer)
+                                   : handshakes.CheckAsked(curl, ssl);
+} catch (const std::exception&) {
+    return CURLE_OUT_OF_MEMORY;
 }
 
 }  // namespace
-
-bool Utils::isTrustRootCA(const char* path) {
-    if (path == nullptr) {
-        return false;
-    }
-    const EntryPath place = SplitPath(path);
-    const OwnedFolder folder = OwnedFolder::Open(place.folder, GetActorUID());
-    struct stat info {};
-    if (!folder.Stat(place.name, info)) {
-        return false;
-    }
-    if (S_ISREG(info.st_mode)) {
-        return strcmp(path, paths::kCaBundle) == 0;
-    }
-    std::string target;
-    return S_ISLNK(info.st_mode) && folder.ReadLink(place.name, target) &&
-           target == paths::kCaBundle;
-}
-
-char* Utils::GetCertData(const char* path) {
-    if (path == nullptr) {
-        errno = EINVAL;
-        LOG_ERROR("Failed to open [%s], %m", "");
-        return nullptr;
-    }
-    // The one link that means something is read as what it means.
-    const EntryPath place = SplitPath(isTrustRootCA(path) ? paths::kCaBundle : path);
-    const OwnedFolder folder = OwnedFolder::Open(place.folder, GetActorUID());
-    const UniqueFd fd = folder.OpenFile(place.name, O_RDONLY);
-    if (!fd && errno != EISDIR) {
-        LOG_ERROR("Failed to open [%s], %m", path);
-        return nullptr;
-    }
-    std::string text;
-    UniqueCString data(fd && ReadUpTo(fd.Get(), kCertFileLimit, text)
-                           ? static_cast<char*>(calloc(text.size() + 1, 1))
-                           : nullptr);
-    if (data == nullptr) {
-        LOG_ERROR("Failed to read data, %m");
-        return nullptr;
-    }
-    text.copy(data.get(), text.size());
-    return data.release();
-}
 
 CURLcode Utils::VerifyCertCtxFn(CURL*, void* ctx, void* data) noexcept {
     if (ctx == nullptr) {
         return CURLE_SSL_CERTPROBLEM;
     }
     auto* ssl = static_cast<SSL_CTX*>(ctx);
-    if (check_chain) {
-        LoadRoots(ssl);
-    } else {
-        SSL_CTX_set_verify_depth(ssl, 1);
-    }
-    SSL_CTX_set_verify(ssl, SSL_VERIFY_PEER | SSL_VERIFY_FAIL_IF_NO_PEER_CERT, nullptr);
-    SSL_CTX_set_cert_verify_callback(ssl, CheckCertificate, data);
+    SSL_CTX_set_verify_depth(ssl, 1);
+    Install(ssl, CheckCopy, data);
     return CURLE_OK;
+}
+
+bool CheckServer(const char* user, const char* password, const std::string& url,
+                 ServerCheck& check) {
+    KeepCertificate(nullptr);  // never tell the user of another server's certificate
+    curl_global_init(CURL_GLOBAL_DEFAULT);
+    Handshakes handshakes{check, {}, {}};  // outlive the handle that points to them
+    const UniqueCurl curl = NewCurl();
+    return curl != nullptr &&
+           SetCurlVerification(curl.get(),
+                               !check.save && check.trust.kind == ServerTrust::kBundle) &&
+           SetCurlOption(curl.get(), CURLOPT_SSL_CTX_FUNCTION, &CheckCtxFn) &&
+           SetCurlOption(curl.get(), CURLOPT_SSL_CTX_DATA, &handshakes) &&
+           SetCurlOption(curl.get(), CURLOPT_SSLVERSION,
+                         static_cast<long>(CURL_SSLVERSION_TLSv1)) &&
+           SetCurlTarget(curl.get(), user, password, url) && PerformCurl(curl.get(), url);
 }
 
 bool Utils::VerifyCert(const char* user, const char* password, const char* url,
@@ -214,22 +281,9 @@ bool Utils::VerifyCert(const char* user, const char* password, const char* url,
         return Fail(VFS_ERR_BAD_PARAM);
     }
     return NoThrow(VFS_ERR_FAILED, [&] {
-        KeepCertificate(nullptr);  // never tell the user of another server's certificate
-        curl_global_init(CURL_GLOBAL_DEFAULT);
-        UniqueCString saved;  // outlives the handle that points to it
-        const UniqueCurl curl = NewCurl();
-        if (curl == nullptr) {
-            return false;
-        }
-        if (isTrustRootCA(certPath)) {
-            check_chain = true;
-        }
-        saved.reset(GetCertData(certPath));
-        if (saved == nullptr) {
-            return Fail(VFS_ERR_FAILED);
-        }
-        return SetTrust(curl.get(), certPath, saved.get()) &&
-               SetCurlTarget(curl.get(), user, password, url) && PerformCurl(curl.get(), url);
+        ServerCheck check;
+        return ReadTrust(certPath, check.trust) ? CheckServer(user, password, url, check)
+                                                : Fail(VFS_ERR_FAILED);
     });
 }
 

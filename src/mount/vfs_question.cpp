@@ -12,6 +12,7 @@
 #include "core/error_cell.h"
 #include "core/log.h"
 #include "core/paths.h"
+#include "mount/server_trust.h"
 #include "mount/vfs_private.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/utils.h"
@@ -54,11 +55,10 @@ bool GiveCodePage(const PasswordQuestion& question) {
 bool GiveCaFile(const PasswordQuestion& question) {
     constexpr size_t kUriAt = sizeof "ca file path:" - 1;
     const bool has_uri = strlen(question.message) > kUriAt;
-    std::string host;
-    Utils::GetHostWithPort(has_uri ? question.message + kUriAt : "", host);
-    const std::string saved = paths::SslDir(GetActorUID()) + "/" + host;
-    g_mount_operation_set_domain(question.operation,
-                                 Utils::isTrustRootCA(saved.c_str()) ? paths::kCaBundle : "");
+    std::string name;
+    const bool by_bundle = ServerFileName(has_uri ? question.message + kUriAt : "", name) &&
+                           TrustOfServer(GetActorUID(), name).kind == ServerTrust::kBundle;
+    g_mount_operation_set_domain(question.operation, by_bundle ? paths::kCaBundle : "");
     return true;
 }
 

@@ -5,6 +5,7 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "core/error_cell.h"
 #include "core/identity.h"
 #include "core/no_throw.h"
 #include "policy/belonging.h"
@@ -17,20 +18,6 @@ namespace {
 /** The one user who never gets in unless as an administrator, not even to shared links. */
 constexpr unsigned int kRefusedUid = 1025;
 constexpr char kSharing[] = "sharing";
-
-/** These questions leave no failure code, whatever the policy file is like. */
-class ErrorCellKept {
-  public:
-    ErrorCellKept() : code_(GetError()), file_(GetErrorFile()), line_(GetErrorLine()) {}
-    ErrorCellKept(const ErrorCellKept&) = delete;
-    ErrorCellKept& operator=(const ErrorCellKept&) = delete;
-    ~ErrorCellKept() { VFSSetErrEx(code_, file_, line_); }
-
-  private:
-    __tag_vfs_err_ code_;
-    const char* file_;
-    int line_;
-};
 
 bool IsConsulted(_VFS_USER_CONFIG_ config) {
     return (config.flags & VFS_USER_CONFIG_CONSULT) != 0;
@@ -121,7 +108,7 @@ PermissionDecision Decide(unsigned int uid, _VFS_USER_CONFIG_ config, const char
 /** Memory that runs out is a no as well. */
 template <typename Question>
 PermissionDecision Ask(Question question) {
-    const ErrorCellKept kept;
+    const ErrorCellKept kept;  // whatever the policy file is like
     // A policy that cannot be read leaves its reader at root; a question changes nobody's identity.
     const EffectiveUid caller(geteuid());
     PermissionDecision decision = No(PERMISSION_NOT_ENABLED);

@@ -12,7 +12,9 @@
 #include "mount/glib_handle.h"
 #include "mount/helper.h"
 #include "mount/run_as_user.h"
+#include "mount/server_uri.h"
 #include "server/helper_program.h"
+#include "server/location_id.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
@@ -41,10 +43,9 @@ bool Connect(std::string& id) {
 }
 
 /** The connection's local path, if it is recorded with one. */
-bool RecordedPath(const std::string& id, std::string& path) {
+bool RecordedPath(const char* uri, std::string& id, std::string& rest, std::string& path) {
     Json::Value record;
-    if (!Server::CfgGetByID(GetActorUID(), Server::VFS_CONFIG_CONNECT, id.c_str(), record) ||
-        !record.isMember("path")) {
+    if (!Server::FindConnection(uri, id, rest, record) || !record.isMember("path")) {
         return false;
     }
     path = record["path"].asString();
@@ -83,7 +84,7 @@ std::string ToCodepage(const char* path, const char* codepage) {
 }
 
 bool AskGio(const char* uri, std::string& full) {
-    const UniqueObject<GFile> file(g_file_new_for_commandline_arg(uri));
+    const UniqueObject<GFile> file(g_file_new_for_commandline_arg(ReadableUri(uri).c_str()));
     const UniqueGText path(file ? g_file_get_path(file.get()) : nullptr);
     if (!path) {
         return false;
@@ -105,10 +106,13 @@ void AskGioJob(const Json::Value& request) {
 }
 
 bool LookUp(const Json::Value& request) {
+    const std::string id = request["id"].asString();
     const std::string remote = request["remote"].asString();
-    const std::string uri = request["id"].asString() + (remote.empty() ? "" : "/" + remote);
+    const std::string behind = remote.empty() ? "" : "/" + remote;
+    const std::string uri = id + behind;
     std::string full;
-    if (!AskGio(uri.c_str(), full) && !GetFullPathByConfig(uri.c_str(), full)) {
+    if (!AskGio((ReadableUri(id) + behind).c_str(), full) &&
+        !GetFullPathByConfig(uri.c_str(), full)) {
         LOG_ERROR("Failed to get full path, %s", uri.c_str());
         return false;
     }
@@ -177,7 +181,7 @@ bool GetPasswordByConfig(const char* uri, std::string& out) {
             return false;
         }
         Json::Value record;
-        if (!Server::CfgGetByID(GetActorUID(), Server::VFS_CONFIG_CONNECT, base.c_str(), record)) {
+        if (!Server::FindConnection(uri, base, rest, record)) {
             LOG_ERROR("Wrong parameters, %s, %s, %u", uri, base.c_str(), GetActorUID());
             return false;
         }
@@ -192,12 +196,12 @@ bool GetFullPathByConfig(const char* uri, std::string& base, std::string& rest, 
             return false;
         }
         std::string path;
-        if (!RecordedPath(base, path)) {
+        if (!RecordedPath(uri, base, rest, path)) {
             if (!Connect(base)) {
                 LOG_ERROR("Failed to add connection from server ID: %s", base.c_str());
                 return false;
             }
-            if (!RecordedPath(base, path)) {
+            if (!RecordedPath(uri, base, rest, path)) {
                 LOG_ERROR("Wrong parameters, %s, %s, %u", uri, base.c_str(), GetActorUID());
                 return false;
             }

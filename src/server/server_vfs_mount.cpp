@@ -10,6 +10,7 @@
 #include "core/paths.h"
 #include "mount/init_global.h"
 #include "mount/known_hosts.h"
+#include "mount/server_trust.h"
 #include "server/server_account.h"
 #include "server/server_vfs.h"
 #include "zyrovfs/utils.h"
@@ -36,20 +37,14 @@ void ForgetHostKey(unsigned int uid, const std::string& id) {
 }
 
 void ForgetCertificate(unsigned int uid, const std::string& id) {
-    std::string host;
-    if (!Utils::GetHostWithPort(id.c_str(), host)) {
-        return;
-    }
-    const std::string certificate = paths::SslDir(uid) + "/" + host;
-    // The host is the user's text and this runs as root: it must not lead out of the folder.
-    if (host.find('/') != std::string::npos) {
-        errno = EINVAL;
-        LOG_ERROR("Failed to unlink %s, %m", certificate.c_str());
+    std::string name;
+    if (!ServerFileName(id, name)) {
+        LOG_ERROR("Failed to unlink the certificate of %s", id.c_str());
         return;
     }
     const OwnedFolder folder = OwnedFolder::Open(paths::SslDir(uid), uid);
-    if (folder && !folder.Remove(host) && errno != ENOENT) {
-        LOG_ERROR("Failed to unlink %s, %m", certificate.c_str());
+    if (folder && !RemoveSaved(folder, name)) {
+        LOG_ERROR("Failed to unlink %s/%s, %m", paths::SslDir(uid).c_str(), name.c_str());
     }
 }
 

@@ -8,6 +8,8 @@
 #include "core/log.h"
 #include "core/no_throw.h"
 #include "mount/glib_handle.h"
+#include "mount/server_uri.h"
+#include "server/location_id.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
@@ -17,7 +19,7 @@ namespace {
 
 /** The user of a URI, decoded; a URI without one leaves `user` alone. */
 void TakeUser(const char* uri, std::string& user) {
-    const UniqueSoupUri parsed(soup_uri_new(uri));
+    const UniqueSoupUri parsed(soup_uri_new(ReadableUri(uri).c_str()));
     const char* text = parsed ? soup_uri_get_user(parsed.get()) : nullptr;
     if (text != nullptr) {
         user = Utils::DecodeURI(text);
@@ -60,15 +62,19 @@ bool GetUserAndURI(const char* uri, std::string& user, std::string& outURI) {
         std::string id;
         std::string behind;
         std::string base;
-        if (!Utils::GetURIParts(uri, id, behind) || !Utils::GetBaseURI(uri, base, false)) {
+        if (!Utils::GetURIParts(uri, id, behind)) {
             return false;
         }
         TakeUser(uri, user);
         Json::Value connection;
-        if (!CfgGetByID(GetActorUID(), VFS_CONFIG_CONNECT, id.c_str(), connection)) {
+        if (!FindConnection(uri, id, behind, connection)) {
             LOG_ERROR("Failed to get %s config, uid %u", id.c_str(), GetActorUID());
             return false;
         }
+        if (!Utils::GetBaseURI(id.c_str(), base, false)) {
+            return false;
+        }
+        TakeUser(id.c_str(), user);
         AppendRemotePath(connection, base);
         outURI = base + behind;
         return true;

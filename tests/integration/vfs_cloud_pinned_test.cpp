@@ -1,9 +1,10 @@
-// Transfers with a davs server whose certificate nobody but this user trusts, one program after the
-// other: a process that has once checked a certificate by the CA bundle goes on asking for that.
+// Transfers with a davs server whose certificate nobody but this user trusts.
 #include <gtest/gtest.h>
 
 #include <filesystem>
+#include <fstream>
 
+#include "support/tls_server.h"
 #include "support/vfs_cloud_remote.h"
 
 namespace {
@@ -89,6 +90,36 @@ TEST_F(PinnedCertificate, ThatTheUserTrustsIsEnoughUntilItIsRenewed) {
     SelfSign();
     EXPECT_EQ(Download("pinned.bin", bytes.size()), kRefused);
     EXPECT_EQ(LocalFile::Bytes(), "");
+}
+
+/** Another server, which the bundle knows. */
+tls::Identity Office(tls::Identity& authority) {
+    authority = tls::MakeAuthority("Office CA");
+    std::ofstream("/etc/ssl/certs/ca-certificates.crt", std::ios::app) << authority.certificate;
+    return tls::Make({}, &authority);
+}
+
+TEST_F(PinnedCertificate, IsStillTheOneThatCountsBehindACheckByTheBundle) {
+    ASSERT_EQ(Trust(), kDone);
+    const std::string bytes = Noise(1000, 6);
+    tls::Identity authority;
+    const tls::TlsServer other(Office(authority));
+    const std::string url = "davs://localhost:" + std::to_string(other.Port()) + "/";
+    const auto behind_the_check = [&](Cloud* cloud) {
+        const LocalFile file(bytes);
+        return Utils::SSLVerifyPeer(nullptr, nullptr, url.c_str(), false) &&
+               Cloud::UploadFile(cloud, std::string(kConnection) + "/behind.bin", file.Fd(),
+                                 static_cast<long long>(bytes.size()), nullptr, nullptr, nullptr);
+    };
+    EXPECT_EQ(With(behind_the_check), kDone);
+    EXPECT_TRUE(machine::Read(kRemote + "behind.bin") == bytes);
+    // Now somebody else answers, with a certificate of that authority.
+    const tls::Identity impostor = tls::Make({}, &authority);
+    std::ofstream("/srv/tls/server.pem") << impostor.key << impostor.certificate;
+    machine::Remote("restart dav");
+    fs::remove(kRemote + "behind.bin");
+    EXPECT_EQ(With(behind_the_check), kRefused);
+    EXPECT_FALSE(fs::exists(kRemote + "behind.bin"));
 }
 
 }  // namespace

@@ -2,6 +2,7 @@
 #ifndef ZYROVFS_TESTS_MACHINE_H
 #define ZYROVFS_TESTS_MACHINE_H
 
+#include <gtest/gtest.h>
 #include <sys/wait.h>
 
 #include <array>
@@ -36,6 +37,8 @@ inline Outcome Run(const std::string& command) {
         output.append(buffer.data(), n);
     }
     const int status = pclose(pipe);
+    // What the command line tool says of a failure that has no code: none may end so.
+    EXPECT_EQ(output.find("No cause was given"), std::string::npos) << command << "\n" << output;
     return {WIFEXITED(status) ? WEXITSTATUS(status) : -1, output};
 }
 

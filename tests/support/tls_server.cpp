@@ -25,31 +25,44 @@ namespace {
     throw std::runtime_error("test server: " + step);
 }
 
-sockaddr_in Loopback(int port) {
-    sockaddr_in address{};
-    address.sin_family = AF_INET;
-    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-    address.sin_port = htons(static_cast<uint16_t>(port));
+union Address {
+    sockaddr any;
+    sockaddr_in v4;
+    sockaddr_in6 v6;
+};
+
+Address Loopback(int port, bool ipv6) {
+    Address address{};
+    if (ipv6) {
+        address.v6.sin6_family = AF_INET6;
+        address.v6.sin6_addr = in6addr_loopback;
+        address.v6.sin6_port = htons(static_cast<uint16_t>(port));
+    } else {
+        address.v4.sin_family = AF_INET;
+        address.v4.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+        address.v4.sin_port = htons(static_cast<uint16_t>(port));
+    }
     return address;
 }
 
-int Bind(int port) {
-    const int fd = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+int Bind(int port, bool ipv6) {
+    const Address address = Loopback(port, ipv6);
+    const int fd = socket(address.any.sa_family, SOCK_STREAM | SOCK_CLOEXEC, 0);
     const int on = 1;
     setsockopt(fd, SOL_SOCKET, SO_REUSEADDR, &on, sizeof on);
-    const sockaddr_in address = Loopback(port);
-    if (bind(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
+    if (bind(fd, &address.any, ipv6 ? sizeof address.v6 : sizeof address.v4) != 0) {
         close(fd);
         Die("bind");
     }
     return fd;
 }
 
+/** It stands at the same place in the addresses of both families. */
 int PortOf(int fd) {
-    sockaddr_in address{};
+    Address address{};
     socklen_t length = sizeof address;
-    getsockname(fd, reinterpret_cast<sockaddr*>(&address), &length);
-    return ntohs(address.sin_port);
+    getsockname(fd, &address.any, &length);
+    return ntohs(address.v4.sin_port);
 }
 
 SSL_CTX* NewContext(const Identity& identity) {
@@ -245,7 +258,7 @@ ServerOptions TlsServer::With(const Identity& identity) {
 }
 
 void TlsServer::Start() {
-    const int listener = Bind(port_ != 0 ? port_ : options_.port);
+    const int listener = Bind(port_ != 0 ? port_ : options_.port, options_.ipv6);
     port_ = PortOf(listener);
     listen(listener, 16);
     pid_ = fork();
@@ -272,7 +285,8 @@ void TlsServer::Restart(const Identity& identity) {
 
 std::string TlsServer::Url(const std::string& path) const {
     const char* scheme = options_.identity.certificate.empty() ? "http" : "https";
-    return std::string(scheme) + "://localhost:" + std::to_string(port_) + path;
+    const char* host = options_.ipv6 ? "[::1]" : "localhost";
+    return std::string(scheme) + "://" + host + ":" + std::to_string(port_) + path;
 }
 
 std::vector<Request> TlsServer::Requests() const {
@@ -298,7 +312,7 @@ std::vector<Request> TlsServer::Requests() const {
 }
 
 int RefusedPort() {
-    const int fd = Bind(0);
+    const int fd = Bind(0, false);
     const int port = PortOf(fd);
     close(fd);
     return port;

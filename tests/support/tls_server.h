@@ -43,6 +43,7 @@ struct ServerOptions {
     std::function<Response(const Request&)> answer = [](const Request&) { return Response(); };
     Manner manner = Manner::kServe;
     int port = 0;  ///< 0: any that is free
+    bool ipv6 = false;
 };
 
 class TlsServer {
@@ -54,7 +55,7 @@ class TlsServer {
     ~TlsServer();
 
     int Port() const { return port_; }
-    /** "https://localhost:PORT" and the path. */
+    /** "https://localhost:PORT", or "[::1]" in its place, and the path. */
     std::string Url(const std::string& path = "/") const;
 
     /** All requests so far, in order. */

@@ -75,13 +75,13 @@ inline constexpr Location kDav = {"dav", "127.0.0.1", 8080, "", VFS_ERR_PERMISSI
 inline constexpr Location kDavs = {"davs", "localhost", 8443, "", VFS_ERR_PERMISSION_DENIED};
 inline constexpr Location kSftp = {"sftp", "127.0.0.1", 2222, "srv/remote", VFS_ERR_UNKNOWN};
 
-inline std::string Connect(const Location& l) {
+inline std::string Connect(const Location& l, const std::string& account = "remo") {
     Json::Value profile;
     profile["protocol"] = l.protocol;
     profile["hostname"] = l.host;
     profile["port"] = l.port;
     profile["alias"] = std::string("My ") + l.protocol;
-    profile["account"] = "remo";
+    profile["account"] = account;
     profile["password"] = kPassword;
     profile["codepage"] = "UTF-8";
     profile["uri_path"] = l.uri_path;

@@ -62,12 +62,17 @@ std::string NameOf(const std::string& path) {
 std::unique_ptr<ZYROCloud::Cloud> OpenLocation(unsigned int uid, const std::string& uri,
                                                std::string& problem) {
     const std::string id = ServerIdOf(uri);
+    // An account with a '/' in its name makes the id longer; the library finds its end.
+    const bool may_be_longer = uri.find('@', id.size()) != std::string::npos;
     for (const Server::VFS_CONFIG_MODE mode :
          {Server::VFS_CONFIG_CONNECT, Server::VFS_CONFIG_SERVER}) {
         Json::Value record;
-        if (Server::CfgGetByID(uid, mode, id.c_str(), record)) {
-            std::unique_ptr<ZYROCloud::Cloud> cloud(
-                ZYROCloud::Utils::CreateCloudByURI(uid, uri, mode));
+        const bool known = Server::CfgGetByID(uid, mode, id.c_str(), record);
+        if (!known && !may_be_longer) {
+            continue;
+        }
+        std::unique_ptr<ZYROCloud::Cloud> cloud(ZYROCloud::Utils::CreateCloudByURI(uid, uri, mode));
+        if (known || cloud != nullptr) {
             problem = cloud ? "" : "There is no driver for " + id + "; the system log tells why.";
             return cloud;
         }

@@ -9,7 +9,10 @@ extern "C" {
 /** Proxy for a URL as "host:port", "" for a direct connection. 1 on success, else 0 or less. */
 int ZYROProxyGetAddrByUrl(const char* url, char* address, int size);
 
-/** Proxy credentials as "user:password", "" for none. 1 on success. */
+/**
+ * Credentials as "user:password", "" for none, of the proxy that the calling thread was told of
+ * last; it need not have asked where the machine has only one. 1 on success.
+ */
 int ZYROProxyGetAuth(char* auth, int size);
 
 /** "PRODUCT/version (kernel)". 0 on success, -1 when the buffer is too small. */

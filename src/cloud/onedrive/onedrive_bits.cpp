@@ -209,14 +209,9 @@ class Fragments {
         plan.refused = kRefused;
         plan.exhausted = kNoAttemptLeft;
         plan.what = &url_;
-        if (RunAttempts(drive_, plan)) {
-            return true;
-        }
-        if (drive_.GetErrorCode() == VFS_ERR_NONE) {
-            // The handler, whose error counts, knows of none behind a status below 400.
-            drive_.SetError(VFS_ERR_TRANSFER_ABORTED, "");
-        }
-        return false;
+        // The handler, whose error counts, knows of none behind a status below 400.
+        plan.unexplained = VFS_ERR_TRANSFER_ABORTED;
+        return RunAttempts(drive_, plan);
     }
 
     bool SendOnce(long long length) {

@@ -25,6 +25,7 @@ namespace {
 
 constexpr int kUploadRetries = 3;
 constexpr const char* kUtf8 = "UTF-8";
+constexpr const char* kAnonymous = "anonymous";
 /** A refusal of what stands behind an asterisk is ignored. */
 constexpr const char* kUtf8Command = "*OPTS UTF8 ON";
 constexpr size_t kDescriptionSize = 32;
@@ -79,7 +80,8 @@ bool VFSCloud::GetMetaDataByURI(const std::string& uri, Json::Value& out, const 
         }
         out["url"] = url;
         if (api != nullptr) {
-            api->ExpectVFSURL(url, account_, password_);
+            const Login login = LogInAs();
+            api->ExpectVFSURL(url, login.user, login.password);
         }
         return true;
     });
@@ -143,9 +145,17 @@ bool VFSCloud::isSetFTPEPSV(const std::string&) {
              json::toInt64(Json::Value(text), description) && description == kNoExtendedPassive);
 }
 
+/** libcurl knows how a guest logs in at an FTP server; an empty user is none that a server knows.
+ */
+VFSCloud::Login VFSCloud::LogInAs() const {
+    const bool guest = password_.empty() && (account_.empty() || account_ == kAnonymous);
+    return guest && StartsWithCaseless(protocol_, "ftp") ? Login() : Login{account_, password_};
+}
+
 bool VFSCloud::Prepare(XferData* xfer) {
+    const Login login = LogInAs();
     const bool ready = api != nullptr && api->Init() && InitXferData(xfer) &&
-                       api->SetUserPwOpt(account_, password_);
+                       api->SetUserPwOpt(login.user, login.password);
     return ready || FailLocally();
 }
 

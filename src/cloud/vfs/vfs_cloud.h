@@ -47,6 +47,10 @@ class VFSCloud : public Cloud {
 
   private:
     bool Prepare(XferData* xfer);
+    struct Login {
+        std::string user, password;
+    };
+    Login LogInAs() const;
     bool SetUpFTP(const std::string& url, curl_slist** commands);
     bool Send(const std::string& url);
     bool Receive(XferData* xfer, const std::string& url);

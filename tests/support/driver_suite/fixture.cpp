@@ -4,6 +4,7 @@
 
 #include "core/json.h"
 #include "core/paths.h"
+#include "support/checked_driver.h"
 #include "support/driver_suite.h"
 #include "support/seams.h"
 #include "support/token_profile.h"
@@ -128,8 +129,10 @@ bool DriverTest::Run(Op op) {
             return cloud->CreateFolder(Id("/docs"), "new", no_params);
         case Op::kRename:
             return cloud->Rename(Id("/docs/a.txt"), "b.txt");
-        case Op::kMove:
-            return rig->MoveInto(*cloud, "/docs/a.txt", "/target");
+        case Op::kMove: {
+            const checked_driver::Transfer move(*cloud, "Move by ids");
+            return move.End(rig->MoveInto(*cloud, "/docs/a.txt", "/target"));
+        }
         case Op::kCopy:
             return cloud->Copy("/docs/a.txt", "/target/a.txt");
         case Op::kDelete:
@@ -156,8 +159,9 @@ size_t DriverTest::Count(Op op) const {
 }
 
 bool DriverTest::Upload(Source& source, const std::string& path) {
-    return Cloud::UploadFile(cloud.get(), Uri(path), source.file.Get(), source.size, User::Progress,
-                             User::Cancel, nullptr);
+    const checked_driver::Transfer transfer(*cloud, "UploadFile");
+    return transfer.End(Cloud::UploadFile(cloud.get(), Uri(path), source.file.Get(), source.size,
+                                          User::Progress, User::Cancel, nullptr));
 }
 
 bool DriverTest::Upload(const std::string& text, const std::string& path) {
@@ -167,8 +171,9 @@ bool DriverTest::Upload(const std::string& text, const std::string& path) {
 
 bool DriverTest::Download(const std::string& path, long long size) {
     received.Clear();
-    return Cloud::DownloadFile(cloud.get(), Uri(path), received.file.Get(), size, User::Progress,
-                               User::Cancel, nullptr);
+    const checked_driver::Transfer transfer(*cloud, "DownloadFile");
+    return transfer.End(Cloud::DownloadFile(cloud.get(), Uri(path), received.file.Get(), size,
+                                            User::Progress, User::Cancel, nullptr));
 }
 
 std::string DriverTest::SumOf(const std::string& path) {

@@ -5,6 +5,7 @@
 #include <memory>
 #include <string>
 
+#include "support/checked_driver.h"
 #include "support/driver_suite.h"
 
 namespace driver_suite {
@@ -14,7 +15,7 @@ class RigOf : public Rig {
   public:
     cloudsim::Service& Sim() override { return sim_; }
     std::unique_ptr<PublicCloud> NewDriver(unsigned uid, const Json::Value& profile) override {
-        return std::make_unique<Driver>(uid, profile);
+        return std::make_unique<checked_driver::Checked<Driver>>(uid, profile);
     }
     std::string ItemName(const Json::Value& item) override { return item["name"].asString(); }
 

@@ -54,7 +54,16 @@ TEST_F(Attempts, TheErrorIsCopiedBeforeOrBehindTheTestForACancel) {
     GenericDownload(never);
     never.plan.copy = CopyError::kNever;
     EXPECT_FALSE(never.Go());
-    EXPECT_EQ(never.cloud.GetErrorCode(), VFS_ERR_NONE);
+    EXPECT_EQ(never.cloud.GetErrorCode(), VFS_ERR_CLOUD_FAILED) << "a failure has a code";
+}
+
+TEST_F(Attempts, ASuccessLeavesTheRecordAsItWasBefore) {
+    Transfer again({kBusy, kDone});
+    BoxUpload(again);
+    again.cloud.SetError(VFS_ERR_NOT_FOUND, "before");
+    EXPECT_TRUE(again.Go());
+    EXPECT_EQ(again.cloud.GetErrorCode(), VFS_ERR_NOT_FOUND);
+    EXPECT_EQ(again.cloud.GetError()["msg"], "before");
 }
 
 class TokenlessDriver : public bare::Driver<PublicCloud> {

@@ -1,4 +1,6 @@
 // No connection and no TLS session outlives the trust that it was made with.
+#include <functional>
+
 #include "unit/http/curl_seam.h"
 #include "unit/http/http_fixture.h"
 #include "unit/mount/ssl_fixture.h"
@@ -115,6 +117,26 @@ TEST_F(Trust, APinOfOneUserIsNoPinOfAnother) {
     }
 }
 
+TEST_F(Trust, ALinkThatWasRemovedOrBecameAPinEndsTheTrust) {
+    const tls::TlsServer server(Open(signed_));
+    for (const std::string& text : {std::string(), tls::Make({}).certificate}) {
+        const size_t before = server.Requests().size();
+        fs::create_directories(folder_);
+        fs::create_symlink(paths::kCaBundle, File(server));
+        APIHandler api(share_);
+        EXPECT_TRUE(Fetch(api, server)) << seams::LogDump();
+        EXPECT_TRUE(Fetch(server));
+        unlink(File(server).c_str());
+        if (!text.empty()) {
+            Save(server, text);
+        }
+        EXPECT_FALSE(Fetch(api, server));
+        EXPECT_FALSE(Fetch(server));
+        EXPECT_EQ(server.Requests().size(), before + 2);
+        unlink(File(server).c_str());
+    }
+}
+
 TEST_F(Trust, APinnedServerIsNotTrustedByTheServices) {
     const tls::TlsServer server(Open(own_));
     Save(server, own_.certificate);
@@ -128,6 +150,58 @@ TEST_F(Trust, APinnedServerIsNotTrustedByTheServices) {
     EXPECT_TRUE(talk.api.Init());
     EXPECT_FALSE(talk.Get(server.Url()));
     EXPECT_EQ(server.Requests().size(), 1U);
+}
+
+/** In a process that has checked another server by the CA bundle before. */
+bool AfterTheBundle(const std::function<bool()>& body) {
+    const tls::TlsServer known(tls::Make({}, &Authority()));
+    const fresh::Answer answer = fresh::Ask([&] {
+        return Utils::VerifyCert(nullptr, nullptr, known.Url().c_str(), paths::kCaBundle) && body();
+    });
+    EXPECT_TRUE(answer.finished) << answer;
+    return answer.ok;
+}
+
+TEST_F(Trust, APinnedServerIsTrustedByItsPinAlsoAfterAnotherWasCheckedByTheBundle) {
+    const tls::TlsServer genuine(Open(own_));
+    Save(genuine, own_.certificate);
+    EXPECT_TRUE(AfterTheBundle([&] { return Fetch(genuine); }));
+    tls::CertSpec spec;
+    spec.dns_names = {"other.example"};
+    for (const tls::Identity& shown : {signed_, tls::Make(spec, &Authority())}) {
+        const tls::TlsServer impostor(Open(shown));
+        Save(impostor, own_.certificate);
+        EXPECT_FALSE(AfterTheBundle([&] { return Fetch(impostor); }));
+        EXPECT_TRUE(impostor.Requests().empty());
+    }
+}
+
+TEST_F(Trust, AnIpv6ServerThatTheMountTrustsIsTrustedByTheTransfer) {
+    tls::ServerOptions options = Open(own_);
+    options.ipv6 = true;
+    const tls::TlsServer server(options);
+    const std::string url = "davs://[::1]:" + std::to_string(server.Port()) + "/dav/";
+    EXPECT_TRUE(
+        fresh::Ask([&] { return Utils::SSLVerifyPeer(nullptr, nullptr, url.c_str(), true); }).ok);
+    APIHandler api(share_);
+    api.SetErrorHandler(new DavErrorHandler);
+    EXPECT_TRUE(api.Init());
+    api.SetVFSURL(url);
+    EXPECT_TRUE(api.Process(0)) << seams::LogDump();
+}
+
+TEST_F(Trust, AServerWithoutAPortInItsAddressIsFoundUnderTheMountsName) {
+    tls::ServerOptions options = Open(own_);
+    options.port = 443;
+    const tls::TlsServer server(options);
+    EXPECT_TRUE(fresh::Ask([] {
+                    return Utils::SSLVerifyPeer(nullptr, nullptr, "davs://localhost/", true);
+                }).ok);
+    APIHandler api(share_);
+    api.SetErrorHandler(new DavErrorHandler);
+    EXPECT_TRUE(api.Init());
+    api.SetVFSURL("davs://localhost/file");
+    EXPECT_TRUE(api.Process(0)) << seams::LogDump();
 }
 
 /** One request as to a service. */

@@ -47,18 +47,20 @@ TEST_F(Conversation, AsksForTheEscapedPath) {
     EXPECT_EQ(requests_[0].target, "/my%20files/%C3%A9/50%25");
 }
 
-TEST_F(Conversation, ARefusedPasswordIsAFailureWithoutAFinerCode) {
-    options_.answer = [](const tls::Request&) { return tls::Response{401, {}, ""}; };
-    const Answer answer = Ask("/", "amy", "wrong");
-    EXPECT_EQ(answer.code, VFS_ERR_FAILED) << answer;
-    EXPECT_TRUE(answer.Logged(", code=22, err=")) << answer;
+TEST_F(Conversation, WhatATrustedServerAnswersIsNoMatterOfTrust) {
+    for (const int status : {400, 401, 403, 404, 405, 500, 501, 503}) {
+        options_.answer = [status](const tls::Request&) { return tls::Response{status, {}, ""}; };
+        const Answer answer = Ask("/", "amy", "wrong");
+        EXPECT_TRUE(answer.ok) << status << answer;
+        EXPECT_EQ(requests_.size(), 1U);
+    }
 }
 
-TEST_F(Conversation, AServerThatFailsIsAFailureToo) {
-    for (const int status : {403, 404, 405, 500, 503}) {
-        options_.answer = [status](const tls::Request&) { return tls::Response{status, {}, ""}; };
-        EXPECT_EQ(Ask().code, VFS_ERR_FAILED) << status;
-    }
+TEST_F(Conversation, AnAnswerMakesNoServerTrusted) {
+    file_ = WriteFile("saved.pem", tls::Make({}).certificate);
+    options_.answer = [](const tls::Request&) { return tls::Response{405, {}, ""}; };
+    EXPECT_EQ(Ask().code, VFS_ERR_CERT_UNTRUSTED);
+    EXPECT_TRUE(requests_.empty());
 }
 
 TEST_F(Conversation, FollowsARedirect) {

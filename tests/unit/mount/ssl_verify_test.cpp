@@ -119,16 +119,16 @@ TEST(VerifyCertCtx, DemandsACertificateAndLooksOneLevelDeep) {
     EXPECT_EQ(SSL_CTX_get_verify_depth(context.get()), 1);
 }
 
-TEST(VerifyCertCtx, LooksAtTheWholeChainOnceTheBundleWasAsked) {
+TEST(VerifyCertCtx, LooksNoDeeperOnceTheBundleWasAsked) {
     TrustAuthority();
-    const Answer depth_kept = fresh::Ask([] {
+    const Answer same_depth = fresh::Ask([] {
         const std::string url = "https://localhost:" + std::to_string(tls::RefusedPort()) + "/";
         Utils::VerifyCert(nullptr, nullptr, url.c_str(), paths::kCaBundle);
         const UniqueContext context(SSL_CTX_new(TLS_client_method()));
         Utils::VerifyCertCtxFn(nullptr, context.get(), nullptr);
-        return SSL_CTX_get_verify_depth(context.get()) != 1;
+        return SSL_CTX_get_verify_depth(context.get()) == 1;
     });
-    EXPECT_TRUE(depth_kept.ok) << depth_kept;
+    EXPECT_TRUE(same_depth.ok) << same_depth;
 }
 
 // --- a saved copy -----------------------------------------------------------------------------
@@ -347,49 +347,52 @@ TEST_F(Bundle, ALinkToItAsksItToo) {
     EXPECT_EQ(Verify(bad.Url(), link).code, VFS_ERR_CERT_UNTRUSTED);
 }
 
-// --- the chain flag ---------------------------------------------------------------------------
+// --- a saved copy in a process that has asked the bundle before ---------------------------------
 
-class ChainFlag : public Bundle {
+class SavedCopyAfterTheBundle : public Bundle {
   protected:
-    /** Verifies against the bundle first, then `url` against `file`, in one process. */
-    static Answer AfterTheBundle(const std::string& url, const std::string& file) {
+    static Answer Ask(const tls::TlsServer& server, const std::string& file) {
         const tls::TlsServer known(tls::Make({}, &Authority()));
         return fresh::Ask([&] {
-            Utils::VerifyCert(nullptr, nullptr, known.Url().c_str(), paths::kCaBundle);
+            const bool trusted =
+                Utils::VerifyCert(nullptr, nullptr, known.Url().c_str(), paths::kCaBundle);
             ResetError();
-            return Utils::VerifyCert(nullptr, nullptr, url.c_str(), file.c_str());
+            return trusted &&
+                   Utils::VerifyCert(nullptr, nullptr, server.Url().c_str(), file.c_str());
         });
     }
 };
 
-TEST_F(ChainFlag, OnceSetASavedCertificateNoLongerCountsByItsFingerprint) {
+// The letter of the design was one switch for the process. It shut out the genuine certificate and
+// let in any of any authority, so each check is now its own: by the bundle the whole chain, by a
+// saved copy nothing but that copy.
+
+TEST_F(SavedCopyAfterTheBundle, StillCountsByItsFingerprint) {
     const tls::Identity identity = tls::Make({});
     const tls::TlsServer server(identity);
-    const std::string file = WriteFile("saved.pem", identity.certificate);
-    EXPECT_TRUE(Verify(server.Url(), file).ok);
-    const Answer answer = AfterTheBundle(server.Url(), file);
-    EXPECT_FALSE(answer.ok);
-    EXPECT_EQ(answer.code, VFS_ERR_CERT_UNTRUSTED) << answer;
-    EXPECT_THAT(answer.log, Not(HasSubstr("Fingerprint")));
-}
-
-TEST_F(ChainFlag, OnceSetAnyCertificateOfAKnownAuthorityPassesForASavedOne) {
-    const tls::TlsServer server(tls::Make({}, &Authority()));
-    const std::string file = WriteFile("saved.pem", tls::Make({}).certificate);
-    EXPECT_EQ(Verify(server.Url(), file).code, VFS_ERR_CERT_UNTRUSTED);
-    const Answer answer = AfterTheBundle(server.Url(), file);
+    const Answer answer = Ask(server, WriteFile("saved.pem", identity.certificate));
     EXPECT_TRUE(answer.ok) << answer;
 }
 
-TEST_F(ChainFlag, IsSetEvenWhenTheBundleRefused) {
+TEST_F(SavedCopyAfterTheBundle, DoesNotLetInAnotherCertificateOfAKnownAuthority) {
+    for (const char* name : {"localhost", "other.example"}) {
+        const tls::TlsServer server(tls::Make(Named(name), &Authority()));
+        const Answer answer = Ask(server, WriteFile("saved.pem", tls::Make({}).certificate));
+        EXPECT_EQ(answer.code, VFS_ERR_CERT_UNTRUSTED) << name << answer;
+        EXPECT_TRUE(answer.Logged("Fingerprint verify failed, ")) << answer;
+        EXPECT_TRUE(server.Requests().empty());
+    }
+}
+
+TEST_F(SavedCopyAfterTheBundle, CountsAlsoWhenTheBundleRefusedTheServer) {
     const tls::Identity identity = tls::Make({});
     const tls::TlsServer server(identity);
     const std::string file = WriteFile("saved.pem", identity.certificate);
     const Answer answer = fresh::Ask([&] {
-        Utils::VerifyCert(nullptr, nullptr, server.Url().c_str(), paths::kCaBundle);
-        return Utils::VerifyCert(nullptr, nullptr, server.Url().c_str(), file.c_str());
+        return !Utils::VerifyCert(nullptr, nullptr, server.Url().c_str(), paths::kCaBundle) &&
+               Utils::VerifyCert(nullptr, nullptr, server.Url().c_str(), file.c_str());
     });
-    EXPECT_EQ(answer.code, VFS_ERR_CERT_UNTRUSTED) << answer;
+    EXPECT_TRUE(answer.ok) << answer;
 }
 
 }  // namespace

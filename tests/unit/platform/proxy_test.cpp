@@ -122,6 +122,20 @@ TEST_F(Proxy, AuthComesFromTheFirstProxyThatHasOne) {
     EXPECT_EQ(Auth(), "bob:pw");
 }
 
+TEST_F(Proxy, AuthOfOneProxyIsNotGivenToAnother) {
+    Set("http_proxy", "http://amy:pw@plain.example:3128");
+    Set("https_proxy", "http://tls.example:3129");
+    EXPECT_EQ(Address("https://files.example"), "tls.example:3129");
+    EXPECT_EQ(Auth(), "");
+    EXPECT_EQ(Address("http://files.example"), "plain.example:3128");
+    EXPECT_EQ(Auth(), "amy:pw");
+    Set("https_proxy", "http://bob:pw@tls.example:3129");
+    EXPECT_EQ(Address("davs://files.example"), "tls.example:3129");
+    EXPECT_EQ(Auth(), "bob:pw");
+    EXPECT_EQ(Address("sftp://files.example"), "");
+    EXPECT_EQ(Auth(), "") << "for a direct connection there are none";
+}
+
 TEST_F(Proxy, SmallBuffersAreRefused) {
     Set("http_proxy", "http://amy:pw@proxy.example:3128");
     char buffer[] = "untouched........................";

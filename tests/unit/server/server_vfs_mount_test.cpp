@@ -120,6 +120,23 @@ TEST_F(VfsServerMount, MountsTheRemotePathOnceWithAnAccount) {
     EXPECT_EQ(fake_location::Calls(), Calls{"mount sftp://amy@nas.example:2222/pub"});
 }
 
+TEST_F(VfsServerMount, AccountsWithReservedCharactersMountTheirOwnServer) {
+    const std::map<std::string, std::string> accounts = {
+        {"a@b", "a%40b"}, {"a/b", "a%2Fb"}, {"a?b", "a%3Fb"}, {"a#b", "a%23b"}};
+    fake_location::rules.path = [](const std::string& uri) { return "/local of " + uri; };
+    for (const auto& [account, escaped] : accounts) {
+        conf["account"] = account;
+        Load();
+        const size_t before = fake_location::Calls().size();
+        ASSERT_TRUE(Mount()) << seams::LogDump();
+        const std::string uri = "sftp://" + escaped + "@nas.example:2222/pub";
+        EXPECT_EQ(fake_location::Calls()[before], "mount " + uri);
+        EXPECT_EQ(Stored()["path"], "/local of " + uri);
+        ASSERT_TRUE(server.Unmount(kUser, VFS_CONFIG_CONNECT)) << seams::LogDump();
+        EXPECT_EQ(fake_location::Calls().back(), "find " + uri);
+    }
+}
+
 TEST_F(VfsServerMount, GoesOnWhenTheChainCouldNotBePrepared) {
     Load();
     EXPECT_TRUE(Mount());
@@ -250,6 +267,29 @@ TEST_F(VfsServerMount, DeletedConnectionForgetsTheHostKeyAsTheUser) {
 TEST_F(VfsServerMount, DeletedConnectionForgetsTheCertificate) {
     const std::string certificate = paths::SslDir(kUser) + "/nas.example:2222";
     Trust("", certificate);
+    Load();
+    EXPECT_TRUE(Delete(VFS_CONFIG_CONNECT));
+    EXPECT_FALSE(std::filesystem::exists(certificate));
+}
+
+TEST_F(VfsServerMount, DeletedConnectionOfAnAccountWithReservedCharactersForgetsBoth) {
+    const std::string certificate = paths::SslDir(kUser) + "/nas.example:2222";
+    for (const char* account : {"a@b", "a/b", "a?b", "a#b"}) {
+        executions.clear();
+        Trust(std::string("[nas.example]:2222 ") + kKey, certificate);
+        conf["account"] = account;
+        Load();
+        EXPECT_TRUE(Delete(VFS_CONFIG_CONNECT));
+        ASSERT_EQ(executions.size(), 1U);
+        EXPECT_EQ(executions[0].arguments[2], "[nas.example]:2222");
+        EXPECT_FALSE(std::filesystem::exists(certificate)) << account;
+    }
+}
+
+TEST_F(VfsServerMount, DeletedConnectionForgetsACertificateInBrackets) {
+    const std::string certificate = paths::SslDir(kUser) + "/[::1]:2222";
+    Trust("", certificate);
+    conf["hostname"] = "::1";
     Load();
     EXPECT_TRUE(Delete(VFS_CONFIG_CONNECT));
     EXPECT_FALSE(std::filesystem::exists(certificate));

@@ -89,6 +89,20 @@ TEST_F(UserAndUri, UriMustBeginWithTheTextOfTheId) {
     EXPECT_EQ(out, "ftp://nas.examplele/pub") << "the cut counts the decoded id";
 }
 
+TEST_F(UserAndUri, AccountsWithReservedCharactersAreFound) {
+    for (const std::string account : {"a@b", "a/b", "a?b", "a#b", "a@b/c?d#e"}) {
+        const std::string id = "davs://" + account + "@nas.example:5006";
+        Connected(id, WithPath("remote", "UTF-8"));
+        for (const std::string behind : {"", "/pub/x", "/x@y:1/z"}) {
+            ResetError();
+            ASSERT_TRUE(Resolve((id + behind).c_str())) << account << seams::LogDump();
+            EXPECT_EQ(user, account);
+            EXPECT_EQ(out, "davs://nas.example:5006/remote" + behind);
+            EXPECT_EQ(GetError(), VFS_ERR_NONE);
+        }
+    }
+}
+
 TEST_F(UserAndUri, SlashBehindTheServerIsNotDoubled) {
     Connected("http://nas.example", WithPath("pub", "UTF-8"));
     ASSERT_TRUE(Resolve("http://nas.example"));
