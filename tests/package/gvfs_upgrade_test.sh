@@ -20,7 +20,7 @@ printf '[Mount]\nType=zebra\n' >$tree$catalogue/zebra.mount
 dpkg-query -s gvfs-backends | sed '/^Status:/d;/^Conffiles:/,/^[A-Z]/{/^[A-Z]/!d;/^Conffiles:/d}' |
   sed 's/^Version: .*/&+newer/' >$tree/DEBIAN/control
 quietly dpkg-deb --build --root-owner-group $tree /tmp/newer.deb
-quietly dpkg --force-depends -i /tmp/newer.deb
+quietly apt-get -q install -y --no-install-recommends /tmp/newer.deb
 
 expect "" "$(dpkg-query -W -f '${Version}' gvfs-backends | sed 's/.*+newer$//')" "version of gvfs"
 is_ready
