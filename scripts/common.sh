@@ -21,6 +21,7 @@ TEST_PACKAGES=(
   man-db groff-base bsdextrautils rclone curl strace
 )
 BENCH_PACKAGES=(libbenchmark-dev python3 libmicrohttpd-dev libgnutls28-dev libfuse3-dev nginx curl rclone)
+PACKAGE_PACKAGES=(debhelper lintian diffoscope-minimal abigail-tools autopkgtest xz-utils systemd)
 
 need_root() {
   [ "$(id -u)" = 0 ] || { echo "$0: root is needed: sudo $0" >&2; exit 2; }

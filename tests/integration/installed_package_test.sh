@@ -7,7 +7,12 @@ build=$1 source=$2
 work=$(mktemp -d)
 cd "$work"
 
-cmake --install "$build" --prefix "$work/prefix" >/dev/null
+prefix=$work/prefix
+if grep -qx ZYROVFS_INSTALLED:BOOL=ON "$build/CMakeCache.txt"; then
+  prefix=/usr
+else
+  cmake --install "$build" --prefix "$prefix" >/dev/null
+fi
 
 cat >caller.cpp <<'END'
 #include <zyrovfs/zyrovfs_netdrive.h>
@@ -35,7 +40,7 @@ expect() {
 }
 
 export PKG_CONFIG_PATH
-PKG_CONFIG_PATH=$(dirname "$(find prefix -name zyrovfs.pc)")
+PKG_CONFIG_PATH=$(dirname "$(find "$prefix/lib" -name zyrovfs.pc)")
 g++ -std=c++17 caller.cpp -o by-pkg-config $(pkg-config --cflags --libs zyrovfs)
 export LD_LIBRARY_PATH
 LD_LIBRARY_PATH=$(pkg-config --variable=libdir zyrovfs)
@@ -43,7 +48,7 @@ expect "0 profiles" "$(./by-pkg-config)"
 unset LD_LIBRARY_PATH
 echo "by pkg-config: ok"
 
-cmake -S . -B by-cmake -DCMAKE_PREFIX_PATH="$work/prefix" >/dev/null
+cmake -S . -B by-cmake -DCMAKE_PREFIX_PATH="$prefix" >/dev/null
 cmake --build by-cmake >/dev/null
 expect "0 profiles" "$(by-cmake/caller)"
 echo "by the CMake package: ok"
@@ -54,7 +59,7 @@ sed '1,/^## A complete program$/d' "$source/docs/callers-guide.md" |
   echo "the guide shows another program than docs/example" >&2
   exit 1
 }
-cmake -S "$source/docs/example" -B example -DCMAKE_PREFIX_PATH="$work/prefix" >/dev/null
+cmake -S "$source/docs/example" -B example -DCMAKE_PREFIX_PATH="$prefix" >/dev/null
 cmake --build example >/dev/null
 "$source/tests/support/servers/remote" start secret
 useradd --uid 4001 --gid 100 amy

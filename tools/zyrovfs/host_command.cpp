@@ -2,6 +2,8 @@
 
 #include "command.h"
 #include "host_layer.h"
+#include "host_sweep.h"
+#include "host_users.h"
 #include "report.h"
 #include "text.h"
 
@@ -49,6 +51,29 @@ int Check(const std::string& build, bool json) {
     return status;
 }
 
+int Disconnect(bool json) {
+    std::vector<std::string> problems;
+    DisconnectUsers(problems);
+    return Report(problems, "Nobody has anything mounted; profiles and records were kept.", json);
+}
+
+int Sweep(bool json) {
+    const std::vector<std::string> removed = SweepHost();
+    if (json) {
+        Json::Value document;
+        document["removed"] = Json::arrayValue;
+        for (const std::string& path : removed) {
+            document["removed"].append(path);
+        }
+        PrintJson(document);
+    } else {
+        for (const std::string& path : removed) {
+            Say("Removed " + Printable(path));
+        }
+    }
+    return kSuccess;
+}
+
 }  // namespace
 
 void AddHostCommands(CLI::App& app, Session& session) {
@@ -65,6 +90,11 @@ void AddHostCommands(CLI::App& app, Session& session) {
                [=, &session] { return Check(*build, session.json); })
         ->add_option("--build", *build, build_help)
         ->type_name("DIR");
+    AddCommand(
+        *host, session, "disconnect", "End the mounts and daemons of all users",
+        OfRoot(session, "disconnect users", [&session] { return Disconnect(session.json); }));
+    AddCommand(*host, session, "sweep", "Remove files that killed writers left",
+               OfRoot(session, "sweep", [&session] { return Sweep(session.json); }));
 }
 
 }  // namespace tool

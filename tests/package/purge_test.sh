@@ -1,0 +1,23 @@
+#!/usr/bin/env bash
+# Purging everything while a user is connected leaves the machine as it was, and the servers too.
+. "$(dirname "$0")/common.sh"
+start_servers
+snapshot >/tmp/before
+add "$packages" "${all_packages[@]}"
+connect_user
+remote() { find /srv/remote -printf '%p %y %s\n' -type f -exec md5sum {} + | sort; }
+remote >/tmp/remote-before
+# A tree that the library knows nothing of, mounted by the user where purging removes folders.
+as_user mkdir -p /var/tmp/user/$uid/mine
+as_user rclone mount --daemon --vfs-cache-mode full /srv/remote /var/tmp/user/$uid/mine 2>/dev/null
+eventually as_user test -s /var/tmp/user/$uid/mine/kept.txt
+
+take_away purge -y "${all_packages[@]}"
+expect none "$(state)" "state of the package"
+remote | diff /tmp/remote-before - >&2 || fail "remote files have changed"
+as_user test -s /var/tmp/user/$uid/mine/kept.txt || fail "the user's own mount was taken away"
+as_user fusermount3 -u /var/tmp/user/$uid/mine
+rm -rf /var/tmp/user # the mount point, which purging had to leave
+
+is_as_before /tmp/before
+plain_gvfs_is_whole
