@@ -241,6 +241,7 @@ bool Cloud::InitXferData(XferData* xfer) {
     if (set == nullptr || api == nullptr) {
         return true;
     }
+    api->SetStopCheck(IsStopAsked);
     if (xfer->callback != nullptr) {
         (api->*set)(xfer->callback, nullptr);
     }

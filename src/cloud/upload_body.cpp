@@ -102,6 +102,7 @@ bool SendUpload(Cloud& cloud, const XferData& xfer, uint64_t announced, SentByte
         return false;
     }
     UploadBody body(xfer, announced);
+    api->SetStopCheck(IsStopAsked);  // forms are not described by InitXferData
     if (api->IsForm()) {
         body.GiveRewindTo(*api);
     } else {

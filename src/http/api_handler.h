@@ -18,6 +18,7 @@
 #include <json/value.h>
 
 #include <limits>
+#include <chrono>
 #include <string>
 #include <vector>
 
@@ -133,6 +134,12 @@ class APIHandler {
     bool SetSeekFunAndData(SeekCallback function, void* data);
     /** The body cannot be given again. */
     void ForgetSeek();
+
+    /**
+     * Behind Init: asked while nothing moves, about once a second, so that a person does not wait
+     * for a server that is silent. True ends the request as a read function does that gives up.
+     */
+    bool SetStopCheck(bool (*is_stop_asked)());
 
     /** The body comes from the read function. `mute` throws the answer's body away. */
     bool SetUploadOpt(bool mute);
@@ -260,6 +267,17 @@ class APIHandler {
     FormFile form_file_;
     Sink sink_;
     bool keeps_refusal_ = false;
+    /** Progress of a request, for libcurl. */
+    struct Movement {
+        bool (*is_stop_asked)() = nullptr;
+        curl_off_t bytes = 0;
+        std::chrono::steady_clock::time_point since;
+    };
+    static int WatchMovement(void* movement, curl_off_t, curl_off_t received, curl_off_t,
+                             curl_off_t sent);
+
+    FormFile form_file_;
+    Movement movement_;
     SeekCallback seek_function_ = nullptr;
     void* seek_data_ = nullptr;
     bool body_is_read_ = false;  ///< from a function, which may not be able to give it again

@@ -210,6 +210,32 @@ bool APIHandler::SetSeekFunAndData(SeekCallback function, void* data) {
             Accept(curl_easy_setopt(curl_, CURLOPT_SEEKDATA, data), "seek data"));
 }
 
+int APIHandler::WatchMovement(void* opaque, curl_off_t /*to_receive*/, curl_off_t received,
+                              curl_off_t /*to_send*/, curl_off_t sent) {
+    // Where bytes move, the functions that take and give them ask.
+    constexpr std::chrono::milliseconds kSilence(500);
+    auto& movement = *static_cast<Movement*>(opaque);
+    const auto now = std::chrono::steady_clock::now();
+    if (movement.bytes != received + sent) {
+        movement.bytes = received + sent;
+        movement.since = now;
+        return 0;
+    }
+    if (now - movement.since < kSilence) {
+        return 0;
+    }
+    movement.since = now;
+    return movement.is_stop_asked() ? 1 : 0;
+}
+
+bool APIHandler::SetStopCheck(bool (*is_stop_asked)()) {
+    movement_ = {is_stop_asked, 0, std::chrono::steady_clock::now()};
+    return Accept(curl_easy_setopt(curl_, CURLOPT_XFERINFODATA, &movement_), "progress data") &&
+           Accept(curl_easy_setopt(curl_, CURLOPT_XFERINFOFUNCTION, WatchMovement),
+                  "progress function") &&
+           Accept(curl_easy_setopt(curl_, CURLOPT_NOPROGRESS, 0L), "progress");
+}
+
 bool APIHandler::AllowOnlyHttp() {
     return Accept(curl_easy_setopt(curl_, CURLOPT_PROTOCOLS_STR, "http,https"), "protocols");
 }

@@ -233,6 +233,23 @@ TEST_F(Transfer, CtrlCDuringAnUploadLeavesNothingAtTheService) {
     EXPECT_EQ(Remote("/half.bin"), "nothing");
 }
 
+TEST_F(Transfer, CtrlCEndsATransferWhoseServiceIsSilent) {
+    PutRemote("/stalls.bin", Pattern(4 * kMiB));
+    PutLocal("stalls.bin", Pattern(4 * kMiB));
+    service().AddFault(Fault::On("GET", "/d/").Pause(100000, 120));
+    service().AddFault(Fault::On("POST", "/api/2.0/files/content").PauseUpload(100000, 120));
+    const std::string part = kHome + "down.bin.part";
+    const Outcome down =
+        Interrupted("cp " + kBox + "/stalls.bin " + kHome + "down.bin", part, "INT");
+    EXPECT_EQ(down.status, 9) << down.output;
+    EXPECT_THAT(down.output, HasSubstr("VFS_ERR_CANCELLED"));
+    const Outcome up = Interrupted("cp " + kHome + "stalls.bin " + kBox + "/up.bin", "", "INT");
+    EXPECT_EQ(up.status, 9) << up.output;
+    EXPECT_THAT(up.output, HasSubstr("VFS_ERR_CANCELLED"));
+    EXPECT_EQ(Remote("/up.bin"), "nothing");
+    EXPECT_THAT(service().UnusedFaults(), IsEmpty());
+}
+
 TEST_F(Transfer, ADisconnectEndsTheTransfersOfAConnection) {
     PutRemote("/busy.bin", Pattern(4 * kMiB));
     std::thread hand([] {

@@ -60,7 +60,7 @@ Progress::~Progress() {
 void Progress::CatchSignals() {
     struct sigaction action {};
     action.sa_handler = [](int signal) {
-        // The engine asks with each piece; a server that sends none is left by the second Ctrl-C.
+        // A transfer hears of it within a second; what else may be under way is left by the second.
         if (cancelled != 0) {
             std::signal(signal, SIG_DFL);
             std::raise(signal);
