@@ -17,8 +17,8 @@
 #include <curl/curl.h>
 #include <json/value.h>
 
-#include <limits>
 #include <chrono>
+#include <limits>
 #include <string>
 #include <vector>
 
@@ -276,7 +276,6 @@ class APIHandler {
     static int WatchMovement(void* movement, curl_off_t, curl_off_t received, curl_off_t,
                              curl_off_t sent);
 
-    FormFile form_file_;
     Movement movement_;
     SeekCallback seek_function_ = nullptr;
     void* seek_data_ = nullptr;
