@@ -66,7 +66,7 @@ const std::vector<Operation> kOperations = {
     {"policy-list", "policy list --limit 5"},
     {"policy-groups", "policy list --groups --limit 5"},
     {"policy-domain", "policy list --auth domain --limit 5"},
-    {"user-clean", "user clean --profiles --runtime --uid 4001"},
+    {"user-clean", "user clean --uid 4001"},
 };
 
 /** The user's daemons, and what they have mounted. */
@@ -80,6 +80,13 @@ void EndUser() {
         }
     }
     umount2(kFuseTree.c_str(), MNT_DETACH);
+}
+
+bool IsTracing() {
+    const fs::directory_iterator processes("/proc");
+    return std::any_of(begin(processes), end(processes), [](const auto& entry) {
+        return machine::Read(entry.path() / "comm") == "strace\n";
+    });
 }
 
 void TakeSnapshot() {
@@ -260,6 +267,8 @@ class PlantedPaths : public testing::Test {
                 Perform(traced_paths::Tracing(trace) + kTool + kOperations[i].arguments);
             EXPECT_TRUE(ending.in_time) << kOperations[i].name;
             EndUser();
+            // It writes to the end, and is no child of ours.
+            EXPECT_TRUE(machine::Eventually([] { return !IsTracing(); }));
             traces_.push_back({ending.took, traced_paths::Read(trace)});
         }
         Restore();
