@@ -8,9 +8,11 @@
 #include <sys/sysmacros.h>
 #include <sys/wait.h>
 
+#include <algorithm>
 #include <chrono>
 #include <csignal>
 #include <map>
+#include <regex>
 #include <thread>
 #include <vector>
 
