@@ -1,5 +1,3 @@
-#include <zosplatform/text.h>
-
 #include "cloud/conflict.h"
 #include "cloud/guard.h"
 #include "cloud/onedrive/onedrive_api.h"

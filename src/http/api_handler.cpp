@@ -335,18 +335,6 @@ CURLcode APIHandler::Transfer() {
     return Refused(curl_easy_perform(curl_));
 }
 
-bool APIHandler::IsRefusal() {
-    constexpr long kFirstFailure = 400;
-    long status = 0;
-    return curl_easy_getinfo(curl_, CURLINFO_RESPONSE_CODE, &status) == CURLE_OK &&
-           status >= kFirstFailure;
-}
-
-/** As libcurl itself ends a refusal, but with the body at hand. */
-CURLcode APIHandler::Refused(CURLcode code) {
-    return code == CURLE_OK && keeps_refusal_ && IsRefusal() ? CURLE_HTTP_RETURNED_ERROR : code;
-}
-
 /** Whether an old connection broke before any answer, and the body is back at its start. */
 bool APIHandler::CanSendAgain() {
     long status = 0;

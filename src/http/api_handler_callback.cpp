@@ -25,6 +25,18 @@ size_t APIHandler::WriteToStrBuf(char* data, size_t size, size_t count, std::str
     return length;
 }
 
+bool APIHandler::IsRefusal() {
+    constexpr long kFirstFailure = 400;
+    long status = 0;
+    return curl_easy_getinfo(curl_, CURLINFO_RESPONSE_CODE, &status) == CURLE_OK &&
+           status >= kFirstFailure;
+}
+
+/** As libcurl itself ends a refusal, but with the body at hand. */
+CURLcode APIHandler::Refused(CURLcode code) {
+    return code == CURLE_OK && keeps_refusal_ && IsRefusal() ? CURLE_HTTP_RETURNED_ERROR : code;
+}
+
 /** For libcurl, `handler` is the APIHandler. */
 size_t APIHandler::WriteOrKeepRefusal(char* data, size_t size, size_t count,
                                       void* handler) noexcept {

@@ -3,8 +3,8 @@
 #define ZYROVFS_TESTS_TRACED_PATHS_H
 
 #include <filesystem>
+#include <map>
 #include <regex>
-#include <set>
 #include <sstream>
 #include <string>
 
@@ -17,39 +17,36 @@ inline std::string Tracing(const std::string& output) {
     return "strace -D -f -y -qq -e trace=%file -o " + output + " ";
 }
 
-/** Absolute paths of the calls in a trace; with `-y` a descriptor has its path behind it. */
-inline std::set<std::string> Read(const std::string& trace) {
+/** Paths that were touched, and whether something was made, changed or removed there. */
+using Touched = std::map<std::string, bool>;
+
+/** The absolute paths of the calls in a trace, and each folder on the way to one. A folder is
+ * changed by what is changed below it. */
+inline Touched Read(const std::string& trace) {
+    // With `-y` a descriptor has its path behind it.
     static const std::regex named(R"re((?:(?:AT_FDCWD|\d+)<([^>]*)>, )?"([^"]+)")re");
-    std::set<std::string> paths;
+    static const std::regex changes(
+        R"re(O_CREAT|\b(mkdir|rename|unlink|rmdir|symlink|link|mknod|chmod|chown)\w*\()re");
+    Touched touched;
     std::istringstream lines(machine::Read(trace));
     for (std::string line; std::getline(lines, line);) {
         if (line.find("execve(") != std::string::npos) {
             continue;  // its arguments are no paths
         }
+        const bool changed = std::regex_search(line, changes);
         for (std::sregex_iterator at(line.begin(), line.end(), named), end; at != end; ++at) {
             const std::string text = (*at)[2];
-            const std::filesystem::path path = text[0] == '/'
-                                                   ? std::filesystem::path(text)
-                                                   : std::filesystem::path((*at)[1].str()) / text;
-            if (path.is_absolute()) {
-                paths.insert(path.lexically_normal());
+            std::filesystem::path path = text[0] == '/'
+                                             ? std::filesystem::path(text)
+                                             : std::filesystem::path((*at)[1].str()) / text;
+            path = path.lexically_normal();
+            path = path.has_filename() ? path : path.parent_path();
+            for (; path.is_absolute() && path.has_relative_path(); path = path.parent_path()) {
+                touched[path] |= changed;
             }
         }
     }
-    return paths;
-}
-
-/** Each path and each folder on the way to one. */
-inline std::set<std::string> Components(const std::set<std::string>& paths) {
-    std::set<std::string> all;
-    for (std::filesystem::path path : paths) {
-        for (; path.has_relative_path(); path = path.parent_path()) {
-            if (path.has_filename()) {
-                all.insert(path);
-            }
-        }
-    }
-    return all;
+    return touched;
 }
 
 }  // namespace traced_paths

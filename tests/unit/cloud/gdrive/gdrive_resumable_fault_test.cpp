@@ -34,6 +34,8 @@ TEST_F(GDriveResumable, RefusedForAWhileGoesOnFromWhatArrived) {
         EXPECT_THAT(Requests(), ElementsAre(kOpen, kPiece, kPiece, kPiece, kPiece));
         EXPECT_THAT(seams::Sleeps(), ElementsAre(5, 5));
         EXPECT_TRUE(seams::LoggedPart("Failed to process curl " + Host() + kUploadPath));
+        // Whoever has the session's address can write into the file.
+        EXPECT_FALSE(seams::LoggedPart("upload_id")) << seams::LogDump();
     }
 }
 

@@ -298,6 +298,13 @@ TEST_F(OneDriveBits, AFragmentThatIsRefusedForGoodIsNotRetried) {
     }
 }
 
+TEST_F(OneDriveBits, TheSessionIsNoMatterOfTheLog) {
+    Give({opened, Answer(403, "", "BITS-Session-Id: {s-1}\r\nX-Other: shown\r\n")});
+    EXPECT_FALSE(UploadTen());
+    EXPECT_TRUE(seams::LoggedPart("\"X-Other\":\"shown\"")) << seams::LogDump();
+    EXPECT_FALSE(seams::LoggedPart("{s-1}")) << seams::LogDump();
+}
+
 TEST_F(OneDriveBits, AStatusBelowFourHundredThatStoresNothingIsNoSuccess) {
     for (const int status : {300, 304, 308}) {
         drive->SetError(VFS_ERR_NONE, "");
