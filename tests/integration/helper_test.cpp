@@ -238,6 +238,25 @@ TEST(Caller, WhoseEffectiveUserIsTheUserGetsALocationConnectedOnDemand) {
         InProcess([] { return Server::Delete(kAmy, Server::VFS_CONFIG_SERVER, kFtp) ? 0 : 1; }), 0);
 }
 
+/** The helper has the lock of its caller, and would wait for it for 110 seconds otherwise. */
+TEST(Caller, WhoHoldsTheMountLockGetsALocationConnectedOnDemand) {
+    std::string id;
+    Json::Value out;
+    ASSERT_TRUE(Server::Add(kAmy, Server::VFS_CONFIG_SERVER, id, Profile("ftp", 2121, "secret"),
+                            false, out));
+    EXPECT_EQ(InCaller([] {
+                  std::string remote;
+                  std::string full;
+                  return InitGlobal(kAmy, false) && Utils::LockMnt(true) &&
+                         Utils::GetFullPath(kAmy, kFtp, "hello.txt", "UTF-8", remote, full) &&
+                         full == kFile;
+              }),
+              0);
+    Forget();
+    EXPECT_EQ(
+        InProcess([] { return Server::Delete(kAmy, Server::VFS_CONFIG_SERVER, kFtp) ? 0 : 1; }), 0);
+}
+
 void CollectAll(int) {
     while (waitpid(-1, nullptr, WNOHANG) > 0) {
     }
