@@ -4,6 +4,7 @@
 
 #include "core/file_memo.h"
 #include "server/config_document.h"
+#include "zyrovfs/cloud_utils.h"
 
 namespace ZYROCloud {
 
@@ -44,6 +45,12 @@ const Json::Value* StoredProfile(unsigned int uid, const std::string& server_id,
         profile.json["server_id"] = server_id;
         return true;
     };
+    if (Utils::GetCloudTypeFromURI(server_id) == CLOUD_TYPE_VFS) {
+        // Of a file server's connection the mount is part, and no file tells how that is.
+        static thread_local PlainProfile read_anew;
+        read_anew = PlainProfile();
+        return read(read_anew) ? &read_anew.json : nullptr;
+    }
     const PlainProfile* profile = profiles.Get(Server::DocumentPath(uid, mode), server_id, read);
     return profile == nullptr ? nullptr : &profile->json;
 }

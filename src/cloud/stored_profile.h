@@ -12,9 +12,9 @@ namespace ZYROCloud {
 
 /**
  * A user's profile as `Server::Get` tells it, credentials in plain text, and its id as "server_id".
- * Null when there is none. The thread keeps it while the user's file stays as it is: a backend
- * makes a driver for each of its calls, and reading a profile takes longer than the call's request.
- * Good until the next call.
+ * Null when there is none. A service's is kept by the thread while the user's file stays as it is:
+ * a backend makes a driver for each of its calls, and reading a profile takes longer than the
+ * call's request. Good until the next call.
  */
 const Json::Value* StoredProfile(unsigned int uid, const std::string& server_id,
                                  ZYROVFS::Server::VFS_CONFIG_MODE mode);

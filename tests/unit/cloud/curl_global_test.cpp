@@ -90,10 +90,14 @@ TEST(CurlGlobal, CleanupClosesTheHandlesThatWait) {
     EXPECT_EQ(0, scratch::InChild([] {
                   Cloud::InitCurlGlobal();
                   HandlePool& pool = HandlePool::Instance();
-                  { const bare::PlainDriver cloud; }
+                  {
+                      bare::PlainDriver cloud;
+                      cloud.GetAPIHandler()->GetCurlHandler();
+                  }
                   const bool kept = pool.Idle() == 1;
                   {
-                      const bare::PlainDriver lent;
+                      bare::PlainDriver lent;
+                      lent.GetAPIHandler()->GetCurlHandler();
                       Cloud::CleanupCurlGlobal();
                   }
                   return FirstWrong({kept, pool.Idle() == 0});
