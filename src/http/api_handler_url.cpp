@@ -89,7 +89,7 @@ bool APIHandler::SetURL(const std::string& url, bool need_escape) {
 /** The copy that connections of this handle may check against already, if the text is the same. */
 char* APIHandler::KeepText(const std::string& text) {
     for (const UniqueCString& kept : loan_.texts) {
-        if (text == kept.get()) {
+        if (kept != nullptr && text == kept.get()) {
             return kept.get();
         }
     }

@@ -1,5 +1,7 @@
 #include "mount/server_uri.h"
 
+#include <strings.h>
+
 #include <algorithm>
 #include <cctype>
 #include <cstring>
@@ -24,11 +26,11 @@ bool HasPort(const std::string& host) {
     return colon != std::string::npos && colon > 0 && IsNumber(host.substr(colon + 1));
 }
 
-/** Length of the user that `text`, an id without its scheme, begins with. */
-size_t UserLength(const std::string& text) {
+/** Length of the user that `text`, an id or a URL without its scheme, begins with. */
+size_t UserLength(const std::string& text, bool is_id) {
     const std::string authority = text.substr(0, text.find_first_of(kEnds));
     const size_t last = text.rfind('@');
-    if (last != std::string::npos && last >= authority.size() && !HasPort(authority)) {
+    if (is_id && last != std::string::npos && last >= authority.size() && !HasPort(authority)) {
         const std::string host = text.substr(last + 1);
         if (HasPort(host) && host.find_first_of(kEnds) == std::string::npos) {
             return last;
@@ -67,7 +69,8 @@ std::string ReadableUri(const std::string& id) {
         return id;
     }
     const size_t begin = scheme + strlen(kSchemeEnd);
-    const size_t length = UserLength(id.substr(begin));
+    const bool web = strncasecmp(id.c_str(), "http", strlen("http")) == 0;
+    const size_t length = UserLength(id.substr(begin), !web);
     return id.substr(0, begin) + EscapeUser(id.substr(begin, length)) + id.substr(begin + length);
 }
 

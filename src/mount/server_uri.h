@@ -17,8 +17,8 @@ std::string EscapeUser(const std::string& user);
 /**
  * A server id, also one with a path behind it, as a URI that reads as it is meant. The user ends
  * with the last '@' in front of the path. One with a '/', '?' or '#' in it is known in an id
- * without a path only: there the text ends with '@', host and port. Other text is given back as it
- * is.
+ * without a path only: there the text ends with '@', host and port. URLs of http and https
+ * are no ids and have no such user. Other text is given back as it is.
  */
 std::string ReadableUri(const std::string& id);
 

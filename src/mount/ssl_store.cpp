@@ -95,6 +95,20 @@ bool Locate(const char* given, Location& location) {
     return true;
 }
 
+/** The user has decided about this server; those to which it leads are another matter. */
+bool SaveCertificate(const char* user, const char* password, const char* url, const char* path) {
+    ServerCheck check;
+    check.save = [path](X509* certificate) { return SavePem(certificate, path); };
+    if (!CheckServer(user, password, url, check) && !check.led_on) {
+        return false;
+    }
+    if (!check.saved) {
+        LOG_ERROR("Failed to save cert %s", path);
+        return Fail(VFS_ERR_FAILED);
+    }
+    return true;
+}
+
 /** The new copy stands under the one name that is looked for first. */
 bool Download(const char* user, const char* password, const Location& location) {
     if (!Utils::DownloadCert(user, password, location.url.c_str(), location.file.c_str())) {
@@ -140,6 +154,18 @@ bool LinkToBundle(const Location& location) {
     return true;
 }
 
+/** A copy that no longer fits is no failure where the bundle trusts, nor is an untrusted server to
+ * which the one that was asked for leads. */
+template <typename Body>
+bool LeavingNoError(Body body) {
+    ErrorCellKept kept;
+    if (body()) {
+        return true;
+    }
+    kept.Dismiss();
+    return false;
+}
+
 bool VerifyPeer(const char* user, const char* password, const char* url, bool force) {
     Location location;
     if (!Locate(url, location)) {
@@ -165,17 +191,7 @@ bool Utils::DownloadCert(const char* user, const char* password, const char* url
         return Fail(VFS_ERR_BAD_PARAM);
     }
     return NoThrow(VFS_ERR_FAILED, [&] {
-        ServerCheck check;
-        check.save = [certPath](X509* certificate) { return SavePem(certificate, certPath); };
-        // The user has decided about this server; those to which it leads are another matter.
-        if (!CheckServer(user, password, url, check) && !check.led_on) {
-            return false;
-        }
-        if (!check.saved) {
-            LOG_ERROR("Failed to save cert %s", certPath);
-            return Fail(VFS_ERR_FAILED);
-        }
-        return true;
+        return LeavingNoError([&] { return SaveCertificate(user, password, url, certPath); });
     });
 }
 
@@ -185,12 +201,7 @@ bool Utils::SSLVerifyPeer(const char* user, const char* password, const char* ur
         return Fail(VFS_ERR_BAD_PARAM);
     }
     return NoThrow(VFS_ERR_FAILED, [&] {
-        ErrorCellKept kept;  // a copy that no longer fits is no failure where the bundle trusts
-        if (VerifyPeer(user, password, url, force)) {
-            return true;
-        }
-        kept.Dismiss();
-        return false;
+        return LeavingNoError([&] { return VerifyPeer(user, password, url, force); });
     });
 }
 

@@ -3,7 +3,6 @@
 #include <cstring>
 
 #include "core/error_cell.h"
-#include "core/json_member.h"
 #include "zyrovfs/global.h"
 
 namespace ZYROVFS::Server {

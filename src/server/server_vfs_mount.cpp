@@ -11,6 +11,7 @@
 #include "mount/init_global.h"
 #include "mount/known_hosts.h"
 #include "mount/server_trust.h"
+#include "mount/server_uri.h"
 #include "server/server_account.h"
 #include "server/server_vfs.h"
 #include "zyrovfs/utils.h"
@@ -38,7 +39,7 @@ void ForgetHostKey(unsigned int uid, const std::string& id) {
 
 void ForgetCertificate(unsigned int uid, const std::string& id) {
     std::string name;
-    if (!ServerFileName(id, name)) {
+    if (!ServerFileName(ReadableUri(id), name)) {
         LOG_ERROR("Failed to unlink the certificate of %s", id.c_str());
         return;
     }

@@ -52,7 +52,8 @@ TEST_P(AccountName, ConnectsTransfersAndIsForgotten) {
 
     EXPECT_TRUE(Server::Delete(kAmy, Server::VFS_CONFIG_CONNECT, id.c_str()))
         << GetErrorName(GetError());
-    EXPECT_FALSE(fs::exists(record["path"].asString() + "/told.txt"));
+    EXPECT_TRUE(
+        machine::Eventually([&] { return !fs::exists(record["path"].asString() + "/told.txt"); }));
 }
 
 INSTANTIATE_TEST_SUITE_P(Names, AccountName,

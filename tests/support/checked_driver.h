@@ -68,9 +68,12 @@ class Checked : public Driver {
   public:
     using Driver::Driver;
 
+    /** The description of a transfer. That a driver knows nothing of an item may be told without a
+     * code: callers go on, and what is missing shows when it is used. */
     bool GetMetaDataByURI(const std::string& uri, Json::Value& out,
                           const std::string& operation) override {
-        return In("GetMetaDataByURI").End(Driver::GetMetaDataByURI(uri, out, operation));
+        const Operation description = In("GetMetaDataByURI");
+        return Driver::GetMetaDataByURI(uri, out, operation) && description.End(true);
     }
     bool GetFileSize(const std::string& uri, long long* size) override {
         return In("GetFileSize").End(Driver::GetFileSize(uri, size));

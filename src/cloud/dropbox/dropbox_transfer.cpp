@@ -81,7 +81,8 @@ bool Dropbox::DirectUpload(XferData* xfer, const Json::Value& meta) {
 }
 
 bool Dropbox::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
-    return Guard(*this, [&] {
+    // A step of an upload, which has the last word where there is nothing to send.
+    return Barrier(*this, [&] {
         const std::string path = ServerPath(meta);
         const UploadSize size(meta);
         const unsigned long long total = size.total;

@@ -62,7 +62,8 @@ long long Received(APIHandler* api) {
 }  // namespace
 
 bool OneDrive::StartUploadSession(const std::string& url, std::string& session) {
-    return Guard(*this, [&] {
+    // A step of an upload, which has the last word about an answer without an id.
+    return Barrier(*this, [&] {
         Request request(*this, kFrame);
         request.To(kBitsMethod, url)
             .Header(kPacketType, "Create-Session")

@@ -103,7 +103,8 @@ bool OneDrive::GetFileInfoByPathFromServer(const std::string& path, const std::s
 
 bool OneDrive::GetMetaDataByURI(const std::string& uri, Json::Value& meta,
                                 const std::string& action) {
-    return Guard(*this, [&] {
+    // That nothing is known of an item is no failure yet: what is missing shows when it is used.
+    return Barrier(*this, [&] {
         const std::string server_path = GetServerPathBySharePath(uri);
         std::string url;
         // A relayed download has "=" and a MIME type behind its action.

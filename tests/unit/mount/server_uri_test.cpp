@@ -33,6 +33,14 @@ TEST(ReadableUri, AnIdEndsWithHostAndPortWhateverTheUserHolds) {
     EXPECT_EQ(ReadableUri("davs:///@[::1]:1"), "davs://%2F@[::1]:1");
 }
 
+TEST(ReadableUri, AUrlOfTheWebHasNoSuchUser) {
+    for (const char* url :
+         {"https://nas/mail@x:80", "HTTP://nas/?a@x:80", "https://amy@nas/b@x:1"}) {
+        EXPECT_EQ(ReadableUri(url), url);
+    }
+    EXPECT_EQ(ReadableUri("https://a@b@nas/c@x:1"), "https://a%40b@nas/c@x:1");
+}
+
 TEST(ReadableUri, IsReadTheSameASecondTime) {
     for (const char* id :
          {"davs://a@b/c@nas:1", "davs://a?b#c@[fd00::1]:1", "davs://a@b@nas:1/x"}) {

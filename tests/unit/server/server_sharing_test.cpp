@@ -121,7 +121,7 @@ TEST_F(Sharing, ConnectionAsksForAPathThatIsNotKnown) {
     ASSERT_TRUE(Load(conf));
     ASSERT_TRUE(Create(VFS_CONFIG_CONNECT));
     EXPECT_EQ(out["path"], "/fuse/y");
-    EXPECT_EQ(fake_location::Calls(), Calls{"path sharing://amy@corp@mail.example"});
+    EXPECT_EQ(fake_location::Calls(), Calls{"path sharing://amy%40corp@mail.example"});
 }
 
 TEST_F(Sharing, ConnectionWithoutAPathFails) {

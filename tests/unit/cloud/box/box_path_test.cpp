@@ -187,11 +187,11 @@ TEST_F(BoxMeta, OfADownloadHasTheAddressOfTheContent) {
     EXPECT_THAT(Requests(), IsEmpty());
 }
 
-TEST_F(BoxMeta, OfADownloadOfNothingKnownFailsAndSetsNothing) {
+TEST_F(BoxMeta, OfADownloadOfNothingKnownFails) {
     Json::Value meta;
     EXPECT_FALSE(box->GetMetaDataByURI(std::string(kServerId) + "/none", meta, "Download"));
     EXPECT_TRUE(meta.isNull());
-    EXPECT_EQ(box->GetErrorCode(), VFS_ERR_NONE);
+    EXPECT_EQ(box->GetErrorCode(), VFS_ERR_CLOUD_FAILED);
 }
 
 TEST_F(BoxMeta, OfAnUploadTellsNewFromKnown) {

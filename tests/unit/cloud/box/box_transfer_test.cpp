@@ -259,7 +259,7 @@ TEST_F(BoxUpload, WithAPieceOfItsDescriptionMissingFails) {
         Json::Value meta = whole;
         meta.removeMember(member);
         EXPECT_FALSE(box->DirectUpload(&bytes.xfer, meta)) << member;
-        EXPECT_EQ(box->GetErrorCode(), VFS_ERR_NONE) << member;
+        EXPECT_EQ(box->GetErrorCode(), VFS_ERR_CLOUD_FAILED) << member;
     }
     Json::Value meta = whole;
     meta.removeMember("url");

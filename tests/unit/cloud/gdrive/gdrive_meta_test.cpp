@@ -60,7 +60,7 @@ TEST_F(GDriveMeta, OfAnUploadIntoAFolderThatTheTreeDoesNotKnowFails) {
     EXPECT_FALSE(Ask("/docs/a.txt", "Upload"));
     EXPECT_TRUE(seams::Logged("Failed to get parent id by [/docs]")) << seams::LogDump();
     EXPECT_FALSE(meta.isMember("url"));
-    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_NONE);
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CLOUD_FAILED);
 }
 
 TEST_F(GDriveMeta, OfADownloadHasTheAddressThatTheTreeKnows) {

@@ -133,7 +133,7 @@ TEST_F(GDriveResumable, WithoutAnAddressOrASourceFailsWithALine) {
     EXPECT_FALSE(drive->ResumableUpload(nullptr, whole));
     EXPECT_FALSE(drive->ResumableUpload(&nothing, whole));
     EXPECT_FALSE(drive->ResumableUpload(&bytes.xfer, Json::Value(Json::objectValue)));
-    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_NONE);
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CLOUD_FAILED);
     EXPECT_TRUE(seams::Logged("Upload URL is empty")) << seams::LogDump();
     for (const char* odd : {"[1]", "7", R"({"url":[]})", R"({"url":"http://x","title":[]})"}) {
         drive->SetError(VFS_ERR_NONE, "");
