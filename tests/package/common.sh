@@ -1,6 +1,7 @@
 # What the tests of packages share. Source it; each test runs on a private host of its own:
 #   NAME_test.sh PACKAGES_DIR [DIR_OF_THE_PACKAGES_BEFORE]
-set -euo pipefail
+set -Eeuo pipefail
+trap 'echo "$0: line $LINENO: $BASH_COMMAND" >&2' ERR
 packages=$(realpath "$1")
 source=$(realpath "$(dirname "${BASH_SOURCE[0]}")/../..")
 export DEBIAN_FRONTEND=noninteractive LC_ALL=C

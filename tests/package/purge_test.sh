@@ -9,7 +9,8 @@ remote() { find /srv/remote -printf '%p %y %s\n' -type f -exec md5sum {} + | sor
 remote >/tmp/remote-before
 # A tree that the library knows nothing of, mounted by the user where purging removes folders.
 as_user mkdir -p /var/tmp/user/$uid/mine
-as_user rclone mount --daemon --vfs-cache-mode full /srv/remote /var/tmp/user/$uid/mine 2>/dev/null
+as_user env HOME=/home/$user rclone mount --vfs-cache-mode full /srv/remote \
+  /var/tmp/user/$uid/mine >/tmp/rclone 2>&1 &
 eventually as_user test -s /var/tmp/user/$uid/mine/kept.txt
 
 take_away purge -y "${all_packages[@]}"

@@ -46,8 +46,12 @@ Folder Folder::Below(const std::string& path, uid_t user) const {
 
 std::vector<std::string> Folder::Names() const {
     std::vector<std::string> names;
-    DIR* dir = fd_ < 0 ? nullptr : fdopendir(openat(fd_, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    const int fd = fd_ < 0 ? -1 : openat(fd_, ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    DIR* dir = fd < 0 ? nullptr : fdopendir(fd);
     if (dir == nullptr) {
+        if (fd >= 0) {
+            close(fd);
+        }
         return names;
     }
     while (const dirent* entry = readdir(dir)) {
