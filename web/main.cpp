@@ -22,11 +22,19 @@ struct Route {
 /** What is posted changes something, and is taken from this page alone. */
 constexpr Route kRoutes[] = {
     {"GET", "/api/connections", ListConnections},
+    {"GET", "/api/profiles", ListProfiles},
+    {"GET", "/api/protocols", ListProtocols},
     {"GET", "/api/list", ListFolder},
     {"GET", "/api/download", Download},
+    {"HEAD", "/api/download", Download},
+    {"POST", "/api/connect", Connect},
+    {"POST", "/api/add", Add},
+    {"POST", "/api/disconnect", Disconnect},
+    {"POST", "/api/forget", Forget},
     {"POST", "/api/upload", Upload},
     {"POST", "/api/mkdir", MakeFolder},
     {"POST", "/api/rename", Rename},
+    {"POST", "/api/move", Move},
     {"POST", "/api/delete", Delete},
 };
 
@@ -50,7 +58,7 @@ void Serve() {
     CheckPolicy(user);
     const Request request = ReadRequest();
     const Route& route = FindRoute(request);
-    if (request.method != "GET") {
+    if (request.method == "POST") {
         CheckOrigin();
     }
     ZYROCloud::Cloud::InitCurlGlobal();

@@ -1,15 +1,14 @@
 #include "request.h"
 
-#include <json/reader.h>
 #include <strings.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <charconv>
 #include <cstdlib>
-#include <memory>
 #include <sstream>
 
+#include "body.h"
 #include "failure.h"
 
 namespace web {
@@ -136,13 +135,8 @@ Json::Value ReadJson(const Request& request) {
     if (request.length < 0 || request.length > kMostJson) {
         throw Failure(413, "The request is too large.");
     }
-    const std::string body = ReadBody(static_cast<size_t>(request.length));
-    Json::CharReaderBuilder builder;
-    Json::CharReaderBuilder::strictMode(&builder.settings_);
-    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
-    Json::Value value;
-    if (!reader->parse(body.data(), body.data() + body.size(), &value, nullptr) ||
-        !value.isObject()) {
+    Json::Value value = ParseObject(ReadBody(static_cast<size_t>(request.length)));
+    if (value.isNull()) {
         throw Failure(400, "The request is not what this program reads.");
     }
     return value;

@@ -55,6 +55,10 @@ void AnswerJson(int status, const Json::Value& value) {
           "\n");
 }
 
+void AnswerDone() {
+    AnswerJson(200, Json::Value(Json::objectValue));
+}
+
 void DrainInput() {
     constexpr size_t kMost = 64UL << 20;
     constexpr int kPatience = 2000;  // milliseconds

@@ -16,6 +16,9 @@ std::string Head(int status, const std::string& type, const std::string& headers
 
 void AnswerJson(int status, const Json::Value& value);
 
+/** For what was done and has nothing to tell. */
+void AnswerDone();
+
 /** Reads what a browser is still sending, up to a bound: it shows an answer only then. */
 void DrainInput();
 
