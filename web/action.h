@@ -40,8 +40,22 @@ void Delete(const User& user, const Request& request);
 
 /** A form with one file, to "path" of "connection"; "size" of the file when the page knows it. */
 void Upload(const User& user, const Request& request);
-/** The file at "path" of "connection", or the part that a header "Range" names. */
+/** How far the upload "id" is. */
+void ShowProgress(const User& user, const Request& request);
+void CancelUpload(const User& user, const Request& request);
+/** The file at "path" of "connection", or the part that a header "Range" names; a document in the
+ * format "export". */
 void Download(const User& user, const Request& request);
+/** What is at each "path" of "connection" as one ZIP. */
+void SendArchive(const User& user, const Request& request);
+
+// --- copies in the background
+
+/** Body: "from" with "connection" and "paths", "to" with "connection" and "path". */
+void StartCopy(const User& user, const Request& request);
+void ListTasks(const User& user, const Request& request);
+void CancelTask(const User& user, const Request& request);
+void RemoveTask(const User& user, const Request& request);
 
 }  // namespace web
 

@@ -27,6 +27,10 @@ constexpr Route kRoutes[] = {
     {"GET", "/api/list", ListFolder},
     {"GET", "/api/download", Download},
     {"HEAD", "/api/download", Download},
+    {"GET", "/api/progress", ShowProgress},
+    {"GET", "/api/tasks", ListTasks},
+    {"GET", "/api/zip", SendArchive},
+    {"HEAD", "/api/zip", SendArchive},
     {"POST", "/api/connect", Connect},
     {"POST", "/api/add", Add},
     {"POST", "/api/disconnect", Disconnect},
@@ -36,6 +40,10 @@ constexpr Route kRoutes[] = {
     {"POST", "/api/rename", Rename},
     {"POST", "/api/move", Move},
     {"POST", "/api/delete", Delete},
+    {"POST", "/api/cancel", CancelUpload},
+    {"POST", "/api/copy", StartCopy},
+    {"POST", "/api/tasks/cancel", CancelTask},
+    {"POST", "/api/tasks/remove", RemoveTask},
 };
 
 const Route& FindRoute(const Request& request) {
@@ -67,6 +75,9 @@ void Serve() {
 }
 
 void ShowFailure(const Failure& failure) {
+    if (HasAnswered()) {
+        return;
+    }
     Json::Value answer;
     answer["error"] = failure.Describe();
     AnswerJson(failure.Status(), answer);

@@ -114,7 +114,9 @@ bool IsWithin(const std::string& path, const std::string& folder) {
            path.compare(0, folder.size() + 1, folder + "/") == 0;
 }
 
-std::string Attachment(const std::string& name) {
+namespace {
+
+std::string FileName(const std::string& name) {
     static const char kDigits[] = "0123456789ABCDEF";
     std::string escaped;
     for (const char c : name) {
@@ -125,7 +127,17 @@ std::string Attachment(const std::string& name) {
             escaped += {'%', kDigits[byte >> 4], kDigits[byte & 15]};
         }
     }
-    return "attachment; filename*=UTF-8''" + escaped;
+    return "; filename*=UTF-8''" + escaped;
+}
+
+}  // namespace
+
+std::string Attachment(const std::string& name) {
+    return "attachment" + FileName(name);
+}
+
+std::string Inline(const std::string& name) {
+    return "inline" + FileName(name);
 }
 
 }  // namespace web

@@ -36,6 +36,8 @@ bool IsUtf8(const std::string& text);
 
 /** For `Content-Disposition`: a name that any browser keeps as it is. */
 std::string Attachment(const std::string& name);
+/** The same for what a browser may show in its place. */
+std::string Inline(const std::string& name);
 
 }  // namespace web
 
