@@ -1,4 +1,5 @@
 // Connections made, mounted, taken down and forgotten.
+#include <unistd.h>
 #include <zyrovfs/server.h>
 
 #include "action.h"
@@ -35,6 +36,16 @@ std::string OwnConnection(const User& user, const Body& body) {
     return Connection(user, body.Text("connection")).Id();
 }
 
+/** The mounted tree learns of a mount a moment later; what is shown as connected can be opened. */
+void WaitUntilThere(const User& user, const std::string& id) {
+    constexpr int kTries = 100;
+    constexpr useconds_t kPause = 50000;
+    const std::unique_ptr<Tree> files = Connection(user, id).Files();
+    for (int i = 0; i < kTries && !files->IsThere(); ++i) {
+        usleep(kPause);
+    }
+}
+
 }  // namespace
 
 void Connect(const User& user, const Request& request) {
@@ -49,6 +60,7 @@ void Connect(const User& user, const Request& request) {
         change["password"] = password;
         return Server::Set(user.uid, Server::VFS_CONFIG_CONNECT, id, change, force);
     });
+    WaitUntilThere(user, id);
     AnswerConnection(id);
 }
 

@@ -33,7 +33,8 @@ constexpr CodeRow kCodes[] = {
     {VFS_ERR_BAD_PARAM, 422, "Check what was filled in."},
     {VFS_ERR_INVALID_SERVER, 422, "Check what was filled in."},
     {VFS_ERR_HOST_UNREACHABLE, 502, kHost},
-    {VFS_ERR_ACCESS_DENIED, 401, kCredentials},
+    // Said by a server that takes no session, and by mounts that know no better.
+    {VFS_ERR_ACCESS_DENIED, 502, "Check the address, the port, the user name and the password."},
     {VFS_ERR_WRONG_USERNAME, 401, kCredentials},
     {VFS_ERR_WRONG_PASSWORD, 401, kCredentials},
     {VFS_ERR_CONNECT_EXISTS, 409, "It is among the connections already."},
