@@ -36,12 +36,13 @@ std::string OwnConnection(const User& user, const Body& body) {
     return Connection(user, body.Text("connection")).Id();
 }
 
-/** The mounted tree learns of a mount a moment later; what is shown as connected can be opened. */
-void WaitUntilThere(const User& user, const std::string& id) {
+/** The mounted tree learns of mounts and unmounts a moment later; what is then shown as connected
+ * can be opened, and what is not is gone. */
+void WaitUntil(const User& user, const std::string& id, bool there) {
     constexpr int kTries = 100;
     constexpr useconds_t kPause = 50000;
     const std::unique_ptr<Tree> files = Connection(user, id).Files();
-    for (int i = 0; i < kTries && !files->IsThere(); ++i) {
+    for (int i = 0; i < kTries && files->IsThere() != there; ++i) {
         usleep(kPause);
     }
 }
@@ -60,7 +61,7 @@ void Connect(const User& user, const Request& request) {
         change["password"] = password;
         return Server::Set(user.uid, Server::VFS_CONFIG_CONNECT, id, change, force);
     });
-    WaitUntilThere(user, id);
+    WaitUntil(user, id, true);
     AnswerConnection(id);
 }
 
@@ -84,6 +85,7 @@ void Disconnect(const User& user, const Request& request) {
     if (!Server::Disconnect(user.uid, id.c_str())) {
         throw FailureOf("The connection was not taken down", GetError());
     }
+    WaitUntil(user, id, false);
     AnswerDone();
 }
 

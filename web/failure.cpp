@@ -153,7 +153,8 @@ Failure FailureOf(const std::string& what, __tag_vfs_err_ code) {
 Failure FailureOfErrno(const std::string& what) {
     const int error = errno;
     const __tag_vfs_err_ code = CodeOf(kErrnos, error);
-    return code == VFS_ERR_NONE ? Failure(502, what + ": " + std::strerror(error))
+    return code == VFS_ERR_NONE ? Failure(502, what + ": The remote side could not do it (" +
+                                                   std::strerror(error) + ").")
                                 : FailureOf(what, code);
 }
 

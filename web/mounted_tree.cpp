@@ -143,8 +143,7 @@ Descriptor MountedTree::Open(const std::string& path, int flags) const {
 }
 
 bool MountedTree::IsThere() {
-    struct stat folder {};
-    return stat(folder_.c_str(), &folder) == 0;
+    return access(folder_.c_str(), F_OK) == 0;
 }
 
 void MountedTree::List(const std::string& path, const std::function<void(Entry)>& tell) {
