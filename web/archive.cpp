@@ -94,8 +94,7 @@ void SendArchive(const User& user, const Request& request) {
     const std::vector<std::string> paths = Chosen(request);
     const TransferNote note(user, {connection.Id()});
     const std::unique_ptr<Cloud> cloud = connection.Driver();
-    std::vector<Item> items =
-        Walk(*connection.Files(), paths, kMostItems, [](const Item&) {});
+    std::vector<Item> items = Walk(*connection.Files(), paths, kMostItems, [](const Item&) {});
     const std::vector<ZipEntry> entries = EntriesOf(items);
     const std::string headers =
         "Content-Length: " + std::to_string(ZipSize(entries)) +
@@ -107,10 +106,10 @@ void SendArchive(const User& user, const Request& request) {
     // whole.
     Zip zip([](const char* data, size_t size) { return Write(data, size); });
     for (size_t i = 0; i < items.size(); ++i) {
-        const bool sent = zip.Begin(entries[i]) &&
-                          (entries[i].size == 0 ||
-                           SendContent(*cloud, connection.Uri(items[i].path), zip)) &&
-                          zip.End();
+        const bool sent =
+            zip.Begin(entries[i]) &&
+            (entries[i].size == 0 || SendContent(*cloud, connection.Uri(items[i].path), zip)) &&
+            zip.End();
         if (!sent) {
             return;
         }

@@ -78,8 +78,8 @@ void SendPart(const Source& source, const Range& range, long long size) {
     const std::string content_range = "Content-Range: bytes " + std::to_string(range.from) + "-" +
                                       std::to_string(range.to) + "/" + std::to_string(size) +
                                       "\r\n";
-    if (!Write(Head(206, source.Type(),
-                    source.Headers(source.name, range.Size()) + content_range)) ||
+    if (!Write(
+            Head(206, source.Type(), source.Headers(source.name, range.Size()) + content_range)) ||
         source.head_only) {
         return;
     }
@@ -154,8 +154,8 @@ void SendExport(const Source& source, const std::string& format) {
         return;
     }
     off_t at = 0;
-    while (at < size && sendfile(STDOUT_FILENO, room.Get(), &at,
-                                 static_cast<size_t>(size - at)) > 0) {
+    while (at < size &&
+           sendfile(STDOUT_FILENO, room.Get(), &at, static_cast<size_t>(size - at)) > 0) {
     }
 }
 

@@ -89,8 +89,10 @@ constexpr unsigned long long kLarge = 600ULL << 20;
 class WebCopy : public testing::Test {
   protected:
     void SetUp() override {
-        Must("mkdir -p /srv/remote/src/deep/empty /srv/remote/dst; "
-             "truncate -s " + std::to_string(kLarge) + " /srv/remote/large");
+        Must(
+            "mkdir -p /srv/remote/src/deep/empty /srv/remote/dst; "
+            "truncate -s " +
+            std::to_string(kLarge) + " /srv/remote/large");
         PutFile(kRemote + "src/a.bin", Noise(3 << 20));
         PutFile(kRemote + "src/deep/grüße.txt", "greetings");
         PutFile(kRemote + "src/nothing", "");
@@ -106,8 +108,7 @@ class WebCopy : public testing::Test {
         for (const Json::Value& task : tasks) {
             Post("tasks/cancel", Id(task["id"].asString()));
         }
-        EXPECT_TRUE(Eventually(
-            [] { return machine::Run("pgrep -x zyrovfs-web").status != 0; }));
+        EXPECT_TRUE(Eventually([] { return machine::Run("pgrep -x zyrovfs-web").status != 0; }));
         Must("rm -rf /srv/remote/src /srv/remote/dst /srv/remote/large /run/zyrovfs/web/4001/copy");
     }
 };
@@ -133,8 +134,9 @@ TEST_F(WebCopy, AFolderGoesFromOneConnectionToTheOtherWhenThePageIsClosed) {
 }
 
 TEST_F(WebCopy, AFolderThatIsThereAlreadyTakesInWhatComes) {
-    Must("mkdir /srv/remote/dst/src; echo kept >/srv/remote/dst/src/kept; "
-         "echo old >/srv/remote/dst/src/a.bin; chown -R remo: /srv/remote/dst");
+    Must(
+        "mkdir /srv/remote/dst/src; echo kept >/srv/remote/dst/src/kept; "
+        "echo old >/srv/remote/dst/src/a.bin; chown -R remo: /srv/remote/dst");
     const std::string id = Start({"/src"}, "/dst");
     ASSERT_TRUE(Reaches(id, "done")) << Task(id);
     EXPECT_EQ(machine::Read(kRemote + "dst/src/kept"), "kept\n");

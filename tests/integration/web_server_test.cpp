@@ -1,5 +1,6 @@
-// The set-up files that are installed, on the web servers that they are for: log-in by PAM, the page
-// with its policy, and bodies that are passed on as they come, with no file of anybody's in between.
+// The set-up files that are installed, on the web servers that they are for: log-in by PAM, the
+// page with its policy, and bodies that are passed on as they come, with no file of anybody's in
+// between.
 #include <gmock/gmock.h>
 
 #include <regex>
@@ -31,13 +32,16 @@ std::string SetUpFile(const std::string& name) {
 void Install() {
     Must("mkdir -p /run/libexec/zyrovfs /run/share/zyrovfs/web /run/servers && cp " + BuildDir() +
          "/web/zyrovfs-web /run/libexec/zyrovfs/");
-    Must("chown root:www-data /run/libexec/zyrovfs/zyrovfs-web; "
-         "chmod 4750 /run/libexec/zyrovfs/zyrovfs-web");
-    Must("echo '<!DOCTYPE html><title>Files</title>' >/run/share/zyrovfs/web/index.html; "
-         "echo 'export {}' >/run/share/zyrovfs/web/page.mjs");
+    Must(
+        "chown root:www-data /run/libexec/zyrovfs/zyrovfs-web; "
+        "chmod 4750 /run/libexec/zyrovfs/zyrovfs-web");
+    Must(
+        "echo '<!DOCTYPE html><title>Files</title>' >/run/share/zyrovfs/web/index.html; "
+        "echo 'export {}' >/run/share/zyrovfs/web/page.mjs");
     Must("cp " + SourceDir() + "/packaging/web/pam /etc/pam.d/zyrovfs-web");
-    Must("usermod -a -G shadow www-data; echo amy:amys-secret | chpasswd; "
-         "echo ben:bens-secret | chpasswd");
+    Must(
+        "usermod -a -G shadow www-data; echo amy:amys-secret | chpasswd; "
+        "echo ben:bens-secret | chpasswd");
 }
 
 void StartLighttpd() {
@@ -46,8 +50,9 @@ void StartLighttpd() {
            "server.port = 8092\nserver.username = \"www-data\"\nserver.groupname = \"www-data\"\n"
            "server.errorlog = \"/run/servers/lighttpd.log\"\n"
         << SetUpFile("lighttpd");
-    Must("touch /run/servers/lighttpd.log; chown www-data /run/servers/lighttpd.log; "
-         "lighttpd -f /run/servers/lighttpd.conf");
+    Must(
+        "touch /run/servers/lighttpd.log; chown www-data /run/servers/lighttpd.log; "
+        "lighttpd -f /run/servers/lighttpd.conf");
 }
 
 void StartNginx() {
@@ -57,8 +62,9 @@ void StartNginx() {
            "access_log off;\nserver {\nlisten 127.0.0.1:8093;\n"
         << SetUpFile("nginx") << "}\n}\n";
     Must("setpriv --reuid=www-data --regid=www-data --clear-groups true");
-    Must("spawn-fcgi -s /run/zyrovfs-web.socket -M 0600 -u www-data -g www-data -U www-data "
-         "-- /usr/sbin/fcgiwrap -f -c 8 >/dev/null 2>&1");
+    Must(
+        "spawn-fcgi -s /run/zyrovfs-web.socket -M 0600 -u www-data -g www-data -U www-data "
+        "-- /usr/sbin/fcgiwrap -f -c 8 >/dev/null 2>&1");
     Must("nginx -c /run/servers/nginx.conf >/dev/null 2>&1");
 }
 
@@ -140,21 +146,24 @@ TEST_P(WebServer, FilesGoUpAndDownAndInParts) {
 }
 
 TEST_P(WebServer, ABrokenArchiveIsBrokenForTheBrowser) {
-    Must("mkdir -p /srv/remote/lie; ln -sf ../hello.txt /srv/remote/lie/link; "
-         "chown -Rh remo: /srv/remote/lie");
+    Must(
+        "mkdir -p /srv/remote/lie; ln -sf ../hello.txt /srv/remote/lie/link; "
+        "chown -Rh remo: /srv/remote/lie");
     ASSERT_TRUE(Eventually([&] { return Ask(kAmys, At("list", "/lie")).status == 200; }));
-    EXPECT_NE(machine::Run("curl -s -o /run/body " + std::string(kAmys) + " '" +
-                           At("zip", "/lie") + "'")
-                  .status,
-              0);
+    EXPECT_NE(
+        machine::Run("curl -s -o /run/body " + std::string(kAmys) + " '" + At("zip", "/lie") + "'")
+            .status,
+        0);
     fs::remove_all(kRemote + "lie");
 }
 
 TEST_P(WebServer, WithoutRoomInTmpAndVarFilesGoThrough) {
     // Where the box's own files lie is kept; every other place is full.
-    Must("mkdir -p /run/keep && cp -a /var/tmp/. /run/keep/ && mkdir -p /run/small && "
-         "mount -t tmpfs -o size=1m tmpfs /run/small && mkdir -m 1777 /run/small/tmp && "
-         "mount --bind /run/small/tmp /tmp && (dd if=/dev/zero of=/tmp/full bs=4k 2>/dev/null; true)");
+    Must(
+        "mkdir -p /run/keep && cp -a /var/tmp/. /run/keep/ && mkdir -p /run/small && "
+        "mount -t tmpfs -o size=1m tmpfs /run/small && mkdir -m 1777 /run/small/tmp && "
+        "mount --bind /run/small/tmp /tmp && (dd if=/dev/zero of=/tmp/full bs=4k 2>/dev/null; "
+        "true)");
     for (const char* place : {"/var/cache", "/var/lib/nginx", "/var/spool", "/var/log"}) {
         Must(std::string("mkdir -p ") + place + " && mount --bind /run/small/tmp " + place);
     }
@@ -162,16 +171,16 @@ TEST_P(WebServer, WithoutRoomInTmpAndVarFilesGoThrough) {
     const Answer up = Upload("through.bin", bytes);
     EXPECT_EQ(up.status, 200) << up.body;
     EXPECT_TRUE(machine::Read(kRemote + "through.bin") == bytes);
-    EXPECT_TRUE(Eventually([&] { return Ask(kAmys, At("download", "/through.bin")).status == 200; }));
+    EXPECT_TRUE(
+        Eventually([&] { return Ask(kAmys, At("download", "/through.bin")).status == 200; }));
     EXPECT_TRUE(Ask(kAmys, At("download", "/through.bin")).body == bytes);
     EXPECT_EQ(Must("ls -A /tmp"), "full\n");
     Must("umount /tmp /var/cache /var/lib/nginx /var/spool /var/log; umount /run/small");
     fs::remove(kRemote + "through.bin");
 }
 
-INSTANTIATE_TEST_SUITE_P(Each, WebServer, testing::Values(kLighttpd, kNginx),
-                         [](const auto& info) {
-                             return info.param == kLighttpd ? "lighttpd" : "nginx";
-                         });
+INSTANTIATE_TEST_SUITE_P(Each, WebServer, testing::Values(kLighttpd, kNginx), [](const auto& info) {
+    return info.param == kLighttpd ? "lighttpd" : "nginx";
+});
 
 }  // namespace

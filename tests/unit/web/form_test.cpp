@@ -63,9 +63,9 @@ TEST(WebForm, TheBoundaryIsReadAsBrowsersAndOthersWriteIt) {
     EXPECT_EQ(BoundaryOf("multipart/form-data; boundary=" + longest), longest);
     EXPECT_EQ(BoundaryOf("multipart/form-data; boundary=.*[a-z]+?(^$)|"), ".*[a-z]+?(^$)|");
     for (const std::string& type : std::vector<std::string>{
-             "", "multipart/form-data", "multipart/form-data; boundary=",
-             "multipart/form-data; boundary=\"\"", "application/json; boundary=x",
-             "multipart/form-data; boundary=" + longest + "="}) {
+             "", "multipart/form-data",
+             "multipart/form-data; boundary=", "multipart/form-data; boundary=\"\"",
+             "application/json; boundary=x", "multipart/form-data; boundary=" + longest + "="}) {
         EXPECT_EQ(StatusOf([&] { BoundaryOf(type); }), 400) << type;
     }
 }

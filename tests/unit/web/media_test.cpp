@@ -7,9 +7,9 @@ namespace {
 using web::ViewableType;
 
 TEST(WebMedia, NothingThatABrowserRunsIsViewable) {
-    for (const char* name : {"a.html", "a.htm", "a.svg", "a.xml", "a.xhtml", "a.js", "a.mjs",
-                             "a.pdf", "a.css", "a.swf", "a.txt", "a", "", ".", "png", "a.png.html",
-                             "a.png ", "a.svgz", "a.mht"}) {
+    for (const char* name :
+         {"a.html", "a.htm", "a.svg", "a.xml", "a.xhtml", "a.js", "a.mjs", "a.pdf", "a.css",
+          "a.swf", "a.txt", "a", "", ".", "png", "a.png.html", "a.png ", "a.svgz", "a.mht"}) {
         EXPECT_EQ(ViewableType(name), "") << name;
     }
 }

@@ -41,7 +41,8 @@ TEST(WebName, PathsLeadDownOnly) {
     for (const char* path : {"/", "/a", "/a/b c/…", "/.../x"}) {
         EXPECT_EQ(StatusOf([&] { CheckPath(path); }), 200) << path;
     }
-    for (const char* path : {"", "a", "/..", "/a/..", "/a/../b", "/.", "//", "/a//b", "/a/", "a/b"}) {
+    for (const char* path :
+         {"", "a", "/..", "/a/..", "/a/../b", "/.", "//", "/a//b", "/a/", "a/b"}) {
         EXPECT_EQ(StatusOf([&] { CheckPath(path); }), 422) << path;
     }
     EXPECT_EQ(StatusOf([] { CheckPath("/" + std::string(4096, 'x')); }), 422);

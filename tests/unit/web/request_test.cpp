@@ -31,9 +31,7 @@ class WebRequest : public testing::Test {
             unsetenv(name);
         }
     }
-    static void Set(const char* name, const std::string& value) {
-        setenv(name, value.c_str(), 1);
-    }
+    static void Set(const char* name, const std::string& value) { setenv(name, value.c_str(), 1); }
 };
 
 TEST_F(WebRequest, EscapesAreUndoneOnce) {

@@ -36,8 +36,7 @@ TEST(WebTrust, AnUnknownHostKeyIsShownWithItsFingerprint) {
     EXPECT_EQ(question["fingerprint"], "SHA256:abc");
     EXPECT_FALSE(question["changed"].asBool());
     EXPECT_FALSE(question["token"].asString().empty());
-    EXPECT_TRUE(
-        DescribeTrust(VFS_ERR_IDENTITY_WRONG, "nas", Json::Value())["changed"].asBool());
+    EXPECT_TRUE(DescribeTrust(VFS_ERR_IDENTITY_WRONG, "nas", Json::Value())["changed"].asBool());
     EXPECT_TRUE(DescribeTrust(VFS_ERR_WRONG_PASSWORD, "nas", HostKey("x")).isNull());
 }
 

@@ -30,9 +30,8 @@ class SparseFile {
 
     Zip::Sink Sink() {
         return [this](const char* data, size_t size) {
-            const bool hole = size >= 65536 && std::all_of(data, data + size, [](char c) {
-                                  return c == '\0';
-                              });
+            const bool hole =
+                size >= 65536 && std::all_of(data, data + size, [](char c) { return c == '\0'; });
             hole ? file_.seekp(static_cast<std::streamoff>(size), std::ios::cur)
                  : file_.write(data, static_cast<std::streamsize>(size));
             size_ += size;
@@ -180,7 +179,8 @@ TEST(WebZip, ASinkThatTakesNoMoreEndsIt) {
         room -= fits ? size : 0;
         return fits;
     });
-    EXPECT_TRUE(zip.Begin({"a", 30, 0}) == false || zip.Write(std::string(30, 'x').data(), 30) == false);
+    EXPECT_TRUE(zip.Begin({"a", 30, 0}) == false ||
+                zip.Write(std::string(30, 'x').data(), 30) == false);
     EXPECT_FALSE(zip.End());
     EXPECT_FALSE(zip.Finish());
 }
