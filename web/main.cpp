@@ -21,13 +21,29 @@ struct Route {
 
 /** What is posted changes something, and is taken from this page alone. */
 constexpr Route kRoutes[] = {
-    {"GET", "/api/connections", ListConnections},
-    {"GET", "/api/list", ListFolder},
-    {"GET", "/api/download", Download},
-    {"POST", "/api/upload", Upload},
-    {"POST", "/api/mkdir", MakeFolder},
-    {"POST", "/api/rename", Rename},
-    {"POST", "/api/delete", Delete},
+    {"GET", "/connections", ListConnections},
+    {"GET", "/profiles", ListProfiles},
+    {"GET", "/protocols", ListProtocols},
+    {"GET", "/list", ListFolder},
+    {"GET", "/download", Download},
+    {"HEAD", "/download", Download},
+    {"GET", "/progress", ShowProgress},
+    {"GET", "/tasks", ListTasks},
+    {"GET", "/zip", SendArchive},
+    {"HEAD", "/zip", SendArchive},
+    {"POST", "/connect", Connect},
+    {"POST", "/add", Add},
+    {"POST", "/disconnect", Disconnect},
+    {"POST", "/forget", Forget},
+    {"POST", "/upload", Upload},
+    {"POST", "/mkdir", MakeFolder},
+    {"POST", "/rename", Rename},
+    {"POST", "/move", Move},
+    {"POST", "/delete", Delete},
+    {"POST", "/cancel", CancelUpload},
+    {"POST", "/copy", StartCopy},
+    {"POST", "/tasks/cancel", CancelTask},
+    {"POST", "/tasks/remove", RemoveTask},
 };
 
 const Route& FindRoute(const Request& request) {
@@ -50,7 +66,7 @@ void Serve() {
     CheckPolicy(user);
     const Request request = ReadRequest();
     const Route& route = FindRoute(request);
-    if (request.method != "GET") {
+    if (request.method == "POST") {
         CheckOrigin();
     }
     ZYROCloud::Cloud::InitCurlGlobal();
@@ -59,6 +75,9 @@ void Serve() {
 }
 
 void ShowFailure(const Failure& failure) {
+    if (HasAnswered()) {
+        return;
+    }
     Json::Value answer;
     answer["error"] = failure.Describe();
     AnswerJson(failure.Status(), answer);

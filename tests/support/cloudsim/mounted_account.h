@@ -17,8 +17,10 @@ namespace cloudsim {
  */
 class MountedAccount {
   public:
-    MountedAccount(Service& service, const Account& account, const std::string& folder)
-        : service_(service), account_(account), tree_(folder) {}
+    /** `top` is the folder that stands for the account's root: "" is the tree's own. */
+    MountedAccount(Service& service, const Account& account, const std::string& folder,
+                   const std::string& top = "")
+        : service_(service), account_(account), tree_(folder), top_(top) {}
 
     /** Shows what has changed since, and again what a client asked to be forgotten. */
     void Refresh();
@@ -32,6 +34,7 @@ class MountedAccount {
     Service& service_;
     const Account& account_;
     XattrTree tree_;
+    const std::string top_;
     Items shown_;
     size_t writes_seen_ = 0;
 };
