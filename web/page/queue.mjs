@@ -67,7 +67,7 @@ export class Queue {
     if (item.state === 'failed') {
       this.#forget(item);
     } else if (item.state === 'done') {
-      this.#move(item, 'gone');
+      this.#clear(item);
     }
     this.#changed();
   }
@@ -75,9 +75,7 @@ export class Queue {
   /** Takes away what is done; with nothing left to do the count begins anew. */
   clearDone() {
     for (const item of [...this.#byState.done]) {
-      this.#move(item, 'gone');
-      this.#bytes.total -= item.size;
-      this.#bytes.finished -= item.size;
+      this.#clear(item);
     }
     this.#changed();
   }
@@ -111,6 +109,12 @@ export class Queue {
     this.#byState[item.state]?.delete(item);
     item.state = state;
     this.#byState[state]?.add(item);
+  }
+
+  #clear(item) {
+    this.#move(item, 'gone');
+    this.#bytes.total -= item.size;
+    this.#bytes.finished -= item.size;
   }
 
   #forget(item) {

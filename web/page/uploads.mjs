@@ -206,8 +206,8 @@ export class Uploads {
       element('span', { className: 'buttons' }, retry, cancel, dismiss), bar, text);
     row.show = () => {
       row.dataset.state = item.state;
-      bar.value = item.state === 'done' ? 100 : percent(item.sent, item.size);
-      bar.hidden = item.state === 'failed';
+      bar.value = percent(item.sent, item.size);
+      bar.hidden = item.state === 'failed' || item.state === 'done';
       cancel.hidden = item.state !== 'running' && item.state !== 'waiting';
       retry.hidden = item.state !== 'failed';
       dismiss.hidden = item.state !== 'failed' && item.state !== 'done';
