@@ -11,7 +11,7 @@ import time
 import urllib.error
 import urllib.request
 
-PATIENCE = 30  # seconds
+PATIENCE = float(os.environ.get("PATIENCE", 30))  # seconds
 ELEMENT = "element-6066-11e4-a52e-4f735466cecf"
 KEYS = {"Enter": "\ue007", "Escape": "\ue00c", "Tab": "\ue004", "Space": " ", "Home": "\ue011",
         "End": "\ue010", "PageDown": "\ue00f", "PageUp": "\ue00e", "Up": "\ue013", "Down": "\ue015",
