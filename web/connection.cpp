@@ -1,38 +1,37 @@
 #include "connection.h"
 
-#include <fcntl.h>
-#include <linux/openat2.h>
-#include <sys/syscall.h>
-#include <unistd.h>
 #include <zyrovfs/cloud_utils.h>
 #include <zyrovfs/server.h>
 
-#include <utility>
-
+#include "body.h"
+#include "cloud_tree.h"
 #include "failure.h"
+#include "mounted_tree.h"
 #include "name.h"
 
 namespace web {
 
 using namespace ZYROVFS;
 
-Descriptor::~Descriptor() {
-    if (fd_ >= 0) {
-        close(fd_);
-    }
-}
-
-int Descriptor::Release() {
-    return std::exchange(fd_, -1);
+bool IsCloud(const std::string& protocol) {
+    return protocol == "box" || protocol == "dropbox" || protocol == "google" ||
+           protocol == "onedrive";
 }
 
 Connection::Connection(const User& user, const std::string& id) : user_(user), id_(id) {
-    Json::Value record;
-    if (!Server::CfgGetByID(user.uid, Server::VFS_CONFIG_CONNECT, id.c_str(), record)) {
+    if (!Server::CfgGetByID(user.uid, Server::VFS_CONFIG_CONNECT, id.c_str(), record_) ||
+        !record_.isObject()) {
         throw FailureOf("The connection cannot be used", GetError());
     }
-    const Json::Value path = record.isObject() ? record["path"] : Json::Value();
-    folder_ = path.isString() ? path.asString() : "";
+}
+
+std::string Connection::Member(const char* key) const {
+    const Json::Value& value = record_[key];
+    return value.isString() ? value.asString() : "";
+}
+
+std::string Connection::Title() const {
+    return Member("alias").empty() ? id_ : Member("alias");
 }
 
 std::string Connection::Uri(const std::string& path) const {
@@ -48,22 +47,14 @@ std::unique_ptr<ZYROCloud::Cloud> Connection::Driver() const {
     return cloud;
 }
 
-int Connection::Open(const std::string& path, int flags) const {
-    const Descriptor folder(
-        folder_.empty() ? -1 : open(folder_.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-    if (folder.Get() < 0) {
-        throw Failure(502, "The connection is not there at the moment. Connect it again.");
+std::unique_ptr<Tree> Connection::Files() const {
+    if (!IsCloud(Member("protocol"))) {
+        return std::make_unique<MountedTree>(Member("path"));
     }
-    const std::string below = CheckPath(path) == "/" ? "." : path.substr(1);
-    open_how how{};
-    how.flags = static_cast<__u64>(flags | O_CLOEXEC);
-    how.resolve = RESOLVE_BENEATH | RESOLVE_NO_MAGICLINKS;
-    const auto fd =
-        static_cast<int>(syscall(SYS_openat2, folder.Get(), below.c_str(), &how, sizeof how));
-    if (fd < 0) {
-        throw FailureOfErrno("\"" + path + "\"");
-    }
-    return fd;
+    const Json::Value account = ParseObject(Member("account_info"));
+    const Json::Value& id = account["id"];
+    return std::make_unique<CloudTree>(
+        id_, id.isConvertibleTo(Json::stringValue) ? id.asString() : "");
 }
 
 }  // namespace web

@@ -1,54 +1,43 @@
-/** A connection of the logged-in user: its files in the user's tree, and its driver. */
+/** A connection of the logged-in user: its files, and the driver of their contents. */
 #ifndef ZYROVFS_WEB_CONNECTION_H
 #define ZYROVFS_WEB_CONNECTION_H
 
 #include <json/value.h>
-#include <sys/types.h>
 #include <zyrovfs/cloud.h>
 
 #include <memory>
 #include <string>
 
 #include "identity.h"
+#include "tree.h"
 
 namespace web {
-
-/** Owns one descriptor. */
-class Descriptor {
-  public:
-    explicit Descriptor(int fd) : fd_(fd) {}
-    Descriptor(const Descriptor&) = delete;
-    Descriptor& operator=(const Descriptor&) = delete;
-    ~Descriptor();
-
-    int Get() const { return fd_; }
-    int Release();
-
-  private:
-    int fd_;
-};
 
 class Connection {
   public:
     /** Only this user's own connections are known. Failure with status 404. */
     Connection(const User& user, const std::string& id);
 
+    const std::string& Id() const { return id_; }
+    /** What people call it. */
+    std::string Title() const;
     /** Where a path is for the library. */
     std::string Uri(const std::string& path) const;
     /** Moves contents. Failure when there is none for this kind of connection. */
     std::unique_ptr<ZYROCloud::Cloud> Driver() const;
-
-    /**
-     * Opens an item below the connection's folder in the user's tree. Links of a server lead
-     * nowhere else: what would leave the folder is refused. Failure by errno.
-     */
-    int Open(const std::string& path, int flags) const;
+    /** The service's own for a cloud, the user's mounted tree for all else. */
+    std::unique_ptr<Tree> Files() const;
 
   private:
+    std::string Member(const char* key) const;
+
     const User& user_;
     const std::string id_;
-    std::string folder_;
+    Json::Value record_;
 };
+
+/** Whether a protocol is a cloud account's. */
+bool IsCloud(const std::string& protocol);
 
 }  // namespace web
 

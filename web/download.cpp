@@ -1,12 +1,19 @@
+#include <fcntl.h>
+#include <sys/mman.h>
+#include <sys/sendfile.h>
 #include <unistd.h>
 
-#include <charconv>
+#include <array>
 
 #include "action.h"
 #include "connection.h"
+#include "descriptor.h"
 #include "failure.h"
+#include "media.h"
 #include "name.h"
+#include "range.h"
 #include "response.h"
+#include "transfer_note.h"
 
 namespace web {
 
@@ -14,82 +21,155 @@ using ZYROCloud::Cloud;
 
 namespace {
 
-/** First and last byte. */
-struct Range {
-    long long from;
-    long long to;
+/** Services export no more than 10 MiB. */
+constexpr long long kLargestExport = 12LL << 20;
+
+/** A file of a connection, and how it is to be given. */
+struct Source {
+    Source(const User& user, const Request& request)
+        : connection(user, request.Parameter("connection")),
+          path(request.Parameter("path")),
+          name(SplitPath(path).name),
+          uri(connection.Uri(path)),
+          cloud(connection.Driver()),
+          head_only(request.method == "HEAD"),
+          type(request.Parameter("view", "") == "1" ? ViewableType(name) : "") {}
+
+    /** What the driver left, or that there is no such file. */
+    Failure Missing() const {
+        const ZYROVFS::__tag_vfs_err_ code = cloud->GetErrorCode();
+        return FailureOf("\"" + name + "\"",
+                         code == ZYROVFS::VFS_ERR_NONE ? ZYROVFS::VFS_ERR_NOT_FOUND : code);
+    }
+    std::string Headers(const std::string& shown, long long length) const {
+        return "Accept-Ranges: bytes\r\nContent-Length: " + std::to_string(length) +
+               "\r\nContent-Disposition: " + (type.empty() ? Attachment(shown) : Inline(shown)) +
+               "\r\n";
+    }
+    std::string Type() const { return type.empty() ? "application/octet-stream" : type; }
+
+    Connection connection;
+    std::string path;
+    std::string name;
+    std::string uri;
+    std::unique_ptr<Cloud> cloud;
+    bool head_only;
+    std::string type;  ///< empty: an attachment of no type that a browser would look into
 };
 
-/**
- * The one part that a header names, of a file of `size` bytes. False without a header, and for what
- * is answered with the whole file, as it may be: several parts, other units, a single byte, which
- * services cannot be asked for. Failure with status 416 for a part that is not there.
- */
-bool ReadRange(const std::string& header, long long size, Range& range) {
-    constexpr const char* kUnit = "bytes=";
-    const size_t dash = header.find('-');
-    if (header.rfind(kUnit, 0) != 0 || dash == std::string::npos ||
-        header.find(',') != std::string::npos) {
-        return false;
+/** Services cannot be asked for one byte alone, but give it together with the next one. */
+void SendByte(const Source& source, long long at) {
+    std::array<char, 2> byte{};
+    long long got = 0;
+    Json::Value meta;
+    source.cloud->GetMetaDataByURI(source.uri, meta, "Download");
+    const bool by_url = source.cloud->GetCloudType() != ZYROCloud::CLOUD_TYPE_DROPBOX &&
+                        meta.isObject() && meta["url"].isString();
+    if (Cloud::DownloadFileToBuffer(source.cloud.get(),
+                                    by_url ? meta["url"].asString() : source.uri, byte.data(), at,
+                                    1, &got, nullptr, nullptr, nullptr) &&
+        got >= 1) {
+        Write(byte.data(), 1);
     }
-    const std::string first = header.substr(6, dash - 6);
-    const std::string last = header.substr(dash + 1);
-    const auto read = [](const std::string& text, long long& number) {
-        const auto [stop, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-        return error == std::errc() && stop == text.data() + text.size() && number >= 0;
-    };
-    long long number = 0;
-    if (first.empty()) {
-        if (!read(last, number)) {
-            return false;
-        }
-        range = {number < size ? size - number : 0, size - 1};
-    } else if (!read(first, range.from) || (!last.empty() && !read(last, range.to))) {
-        return false;
-    } else if (last.empty() || range.to >= size) {
-        range.to = size - 1;
-    }
-    if (range.from >= size || (first.empty() && number == 0)) {
-        throw Failure(416, "The file has no such part.");
-    }
-    return range.from < range.to;
 }
 
-std::string Length(long long bytes) {
-    return "Content-Length: " + std::to_string(bytes) + "\r\n";
+/** Behind the head a failure shows as an answer that is shorter than it says. */
+void SendPart(const Source& source, const Range& range, long long size) {
+    const std::string content_range = "Content-Range: bytes " + std::to_string(range.from) + "-" +
+                                      std::to_string(range.to) + "/" + std::to_string(size) +
+                                      "\r\n";
+    if (!Write(Head(206, source.Type(),
+                    source.Headers(source.name, range.Size()) + content_range)) ||
+        source.head_only) {
+        return;
+    }
+    if (range.Size() == 1) {
+        SendByte(source, range.from);
+    } else {
+        Cloud::RelayDownloadFile(STDOUT_FILENO, range.from, range.to);
+    }
+}
+
+void SendWhole(const Source& source, long long size) {
+    if (Write(Head(200, source.Type(), source.Headers(source.name, size))) && !source.head_only &&
+        size > 0) {
+        Cloud::RelayDownloadFile(STDOUT_FILENO, 0, size);
+    }
+}
+
+void SendFile(const Source& source, const std::string& range_header) {
+    long long size = 0;
+    std::string mime;
+    if (!Cloud::RelayDownloadInit(source.cloud.get(), source.uri.c_str(), nullptr, "") ||
+        !Cloud::RelayDownloadGetFileSizeAndMimeType(&size, mime) || size < 0) {
+        throw source.Missing();
+    }
+    if (const std::optional<Range> range = ReadRange(range_header, size)) {
+        SendPart(source, *range, size);
+    } else {
+        SendWhole(source, size);
+    }
+}
+
+/** Room in memory that takes no more than an export may have. */
+Descriptor ExportRoom() {
+    Descriptor room(memfd_create("export", MFD_CLOEXEC | MFD_ALLOW_SEALING));
+    if (room.Get() < 0 || ftruncate(room.Get(), kLargestExport) != 0 ||
+        fcntl(room.Get(), F_ADD_SEALS, F_SEAL_GROW | F_SEAL_SHRINK) != 0) {
+        throw Failure(500, "Memory ran out.");
+    }
+    return room;
+}
+
+/** The format as the item's listing offers it; Failure with status 422 for another one. */
+Export FindExport(const Source& source, const std::string& format) {
+    const Entry entry = source.connection.Files()->Look(source.path);
+    for (const Export& offered : entry.exports) {
+        if (offered.format == format) {
+            return offered;
+        }
+    }
+    throw Failure(422, "\"" + source.name + "\" is not offered in this format.");
+}
+
+/** "Plan.gdoc" as "Plan.pdf". */
+std::string ExportName(const std::string& name, const Export& format) {
+    return name.substr(0, name.rfind('.')) + format.extension;
+}
+
+/**
+ * A service does not tell the size of an export beforehand. It is fetched whole before anything is
+ * sent, so that the answer has its length and a broken one is not taken for whole.
+ */
+void SendExport(const Source& source, const std::string& format) {
+    const Export chosen = FindExport(source, format);
+    const Descriptor room = ExportRoom();
+    if (!Cloud::RelayDownloadInit(source.cloud.get(), source.uri.c_str(), nullptr, format) ||
+        !Cloud::RelayDownloadFile(room.Get(), 0, 0)) {
+        throw source.Missing();
+    }
+    const off_t size = lseek(room.Get(), 0, SEEK_CUR);
+    if (!Write(Head(200, source.Type(), source.Headers(ExportName(source.name, chosen), size))) ||
+        source.head_only) {
+        return;
+    }
+    off_t at = 0;
+    while (at < size && sendfile(STDOUT_FILENO, room.Get(), &at,
+                                 static_cast<size_t>(size - at)) > 0) {
+    }
 }
 
 }  // namespace
 
 void Download(const User& user, const Request& request) {
-    const Connection connection(user, request.Parameter("connection"));
-    const std::string& path = request.Parameter("path");
-    const std::string name = SplitPath(path).name;
-    const std::unique_ptr<Cloud> cloud = connection.Driver();
-    const std::string uri = connection.Uri(path);
-    long long size = 0;
-    std::string mime;
-    if (!Cloud::RelayDownloadInit(cloud.get(), uri.c_str(), nullptr, "") ||
-        !Cloud::RelayDownloadGetFileSizeAndMimeType(&size, mime)) {
-        throw Failure(404, "\"" + name + "\" is not there.", ZYROVFS::VFS_ERR_NOT_FOUND);
-    }
-    Range range{0, size};
-    std::string headers =
-        "Accept-Ranges: bytes\r\nContent-Disposition: " + Attachment(name) + "\r\n";
-    const bool part = ReadRange(request.range, size, range);
-    if (part) {
-        headers += "Content-Range: bytes " + std::to_string(range.from) + "-" +
-                   std::to_string(range.to) + "/" + std::to_string(size) + "\r\n" +
-                   Length(range.to - range.from + 1);
+    const Source source(user, request);
+    const TransferNote note(user, {source.connection.Id()});
+    const std::string format = request.Parameter("export", "");
+    if (format.empty()) {
+        SendFile(source, request.range);
     } else {
-        range = {0, size};
-        headers += Length(size);
+        SendExport(source, format);
     }
-    if (!Write(Head(part ? 206 : 200, "application/octet-stream", headers))) {
-        return;
-    }
-    // Behind this a failure shows as an answer that is shorter than it says.
-    Cloud::RelayDownloadFile(STDOUT_FILENO, range.from, range.to);
 }
 
 }  // namespace web

@@ -1,12 +1,11 @@
 #include "form.h"
 
 #include <strings.h>
-#include <unistd.h>
 
 #include <algorithm>
-#include <cerrno>
 
 #include "failure.h"
+#include "input.h"
 
 namespace web {
 namespace {
@@ -17,13 +16,7 @@ constexpr size_t kLongestBoundary = 70;
 /** One byte at a time: what is read too much is lost to the relay. */
 char ReadByte() {
     char c = 0;
-    ssize_t n = 0;
-    do {
-        n = read(STDIN_FILENO, &c, 1);
-    } while (n < 0 && errno == EINTR);
-    if (n != 1) {
-        throw Failure(400, "The request ended early.");
-    }
+    ReadInput(&c, 1);
     return c;
 }
 

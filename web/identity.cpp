@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <grp.h>
 #include <pwd.h>
+#include <sys/prctl.h>
 #include <unistd.h>
 #include <zyrovfs/cfg.h>
 
@@ -21,6 +22,8 @@ namespace {
 constexpr gid_t kUsers = 100;
 /** Below are the accounts of the system. */
 constexpr uid_t kFirstUser = 1000;
+
+constexpr const char* kName = "zyrovfs-web";
 
 /** Set by the first start for the second; a request cannot, its headers have HTTP_ in front. */
 constexpr const char* kClean = "ZYROVFS_WEB_CLEAN";
@@ -65,6 +68,8 @@ void CleanDescriptors() {
 void StartClean() {
     if (IsRootThroughout() && getenv(kClean) != nullptr) {
         unsetenv(kClean);
+        // Started through a link, it would have that one's name where others look for it.
+        prctl(PR_SET_NAME, kName);
         return;
     }
     std::vector<std::string> environment = CleanEnvironment();
@@ -74,7 +79,7 @@ void StartClean() {
         pointers.push_back(variable.data());
     }
     pointers.push_back(nullptr);
-    std::array<char*, 2> arguments = {const_cast<char*>("zyrovfs-web"), nullptr};
+    std::array<char*, 2> arguments = {const_cast<char*>(kName), nullptr};
     CleanDescriptors();
     if (setresuid(0, 0, 0) == 0 && setresgid(0, 0, 0) == 0 && setgroups(0, nullptr) == 0) {
         execve("/proc/self/exe", arguments.data(), pointers.data());
@@ -100,6 +105,18 @@ User BecomeUser() {
         throw Failure(500, "The program cannot become the user.");
     }
     return user;
+}
+
+AsRoot::AsRoot() : before_(geteuid()) {
+    if (seteuid(0) != 0) {
+        throw Failure(500, "The program lacks the rights that it is installed with.");
+    }
+}
+
+AsRoot::~AsRoot() {
+    if (seteuid(before_) != 0) {
+        std::abort();  // must not go on as root
+    }
 }
 
 void CheckPolicy(const User& user) {

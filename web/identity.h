@@ -29,6 +29,18 @@ void StartClean();
  */
 User BecomeUser();
 
+/** Root's identity for what the user must not reach, for as long as the object lives. */
+class AsRoot {
+  public:
+    AsRoot();
+    AsRoot(const AsRoot&) = delete;
+    AsRoot& operator=(const AsRoot&) = delete;
+    ~AsRoot();
+
+  private:
+    uid_t before_;
+};
+
 /** Failure with status 403 for a user whom the policy shuts out. */
 void CheckPolicy(const User& user);
 

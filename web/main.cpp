@@ -22,12 +22,28 @@ struct Route {
 /** What is posted changes something, and is taken from this page alone. */
 constexpr Route kRoutes[] = {
     {"GET", "/api/connections", ListConnections},
+    {"GET", "/api/profiles", ListProfiles},
+    {"GET", "/api/protocols", ListProtocols},
     {"GET", "/api/list", ListFolder},
     {"GET", "/api/download", Download},
+    {"HEAD", "/api/download", Download},
+    {"GET", "/api/progress", ShowProgress},
+    {"GET", "/api/tasks", ListTasks},
+    {"GET", "/api/zip", SendArchive},
+    {"HEAD", "/api/zip", SendArchive},
+    {"POST", "/api/connect", Connect},
+    {"POST", "/api/add", Add},
+    {"POST", "/api/disconnect", Disconnect},
+    {"POST", "/api/forget", Forget},
     {"POST", "/api/upload", Upload},
     {"POST", "/api/mkdir", MakeFolder},
     {"POST", "/api/rename", Rename},
+    {"POST", "/api/move", Move},
     {"POST", "/api/delete", Delete},
+    {"POST", "/api/cancel", CancelUpload},
+    {"POST", "/api/copy", StartCopy},
+    {"POST", "/api/tasks/cancel", CancelTask},
+    {"POST", "/api/tasks/remove", RemoveTask},
 };
 
 const Route& FindRoute(const Request& request) {
@@ -50,7 +66,7 @@ void Serve() {
     CheckPolicy(user);
     const Request request = ReadRequest();
     const Route& route = FindRoute(request);
-    if (request.method != "GET") {
+    if (request.method == "POST") {
         CheckOrigin();
     }
     ZYROCloud::Cloud::InitCurlGlobal();
@@ -59,6 +75,9 @@ void Serve() {
 }
 
 void ShowFailure(const Failure& failure) {
+    if (HasAnswered()) {
+        return;
+    }
     Json::Value answer;
     answer["error"] = failure.Describe();
     AnswerJson(failure.Status(), answer);

@@ -49,16 +49,32 @@ bool IsUtf8(const std::string& text) {
     return true;
 }
 
-const std::string& CheckName(const std::string& name) {
+namespace {
+
+/** What is wrong with a name; null for a name that is fine. */
+const char* Fault(const std::string& name) {
     if (name.empty() || name == "." || name == "..") {
-        throw Failure(422, "That is no name for a file or a folder.");
+        return "That is no name for a file or a folder.";
     }
     if (name.size() > kLongestName) {
-        throw Failure(422, "The name is too long.");
+        return "The name is too long.";
     }
     if (name.find('/') != std::string::npos || name.find('\0') != std::string::npos ||
         !IsUtf8(name)) {
-        throw Failure(422, "The name has a character that names cannot have.");
+        return "The name has a character that names cannot have.";
+    }
+    return nullptr;
+}
+
+}  // namespace
+
+bool IsName(const std::string& name) {
+    return Fault(name) == nullptr;
+}
+
+const std::string& CheckName(const std::string& name) {
+    if (const char* fault = Fault(name)) {
+        throw Failure(422, fault).Advise("Choose another name.");
     }
     return name;
 }
@@ -93,7 +109,14 @@ std::string Join(const std::string& folder, const std::string& name) {
     return CheckPath(folder) + (folder == "/" ? "" : "/") + CheckName(name);
 }
 
-std::string Attachment(const std::string& name) {
+bool IsWithin(const std::string& path, const std::string& folder) {
+    return path == folder || folder == "/" ||
+           path.compare(0, folder.size() + 1, folder + "/") == 0;
+}
+
+namespace {
+
+std::string FileName(const std::string& name) {
     static const char kDigits[] = "0123456789ABCDEF";
     std::string escaped;
     for (const char c : name) {
@@ -104,7 +127,17 @@ std::string Attachment(const std::string& name) {
             escaped += {'%', kDigits[byte >> 4], kDigits[byte & 15]};
         }
     }
-    return "attachment; filename*=UTF-8''" + escaped;
+    return "; filename*=UTF-8''" + escaped;
+}
+
+}  // namespace
+
+std::string Attachment(const std::string& name) {
+    return "attachment" + FileName(name);
+}
+
+std::string Inline(const std::string& name) {
+    return "inline" + FileName(name);
 }
 
 }  // namespace web

@@ -26,10 +26,18 @@ Split SplitPath(const std::string& path);
 /** A path with one more name. */
 std::string Join(const std::string& folder, const std::string& name);
 
+/** Whether `path` is `folder` or below it. */
+bool IsWithin(const std::string& path, const std::string& folder);
+
+/** Whether CheckName would take it. */
+bool IsName(const std::string& name);
+
 bool IsUtf8(const std::string& text);
 
 /** For `Content-Disposition`: a name that any browser keeps as it is. */
 std::string Attachment(const std::string& name);
+/** The same for what a browser may show in its place. */
+std::string Inline(const std::string& name);
 
 }  // namespace web
 

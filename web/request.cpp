@@ -1,16 +1,14 @@
 #include "request.h"
 
-#include <json/reader.h>
 #include <strings.h>
-#include <unistd.h>
 
-#include <cerrno>
 #include <charconv>
 #include <cstdlib>
-#include <memory>
 #include <sstream>
 
+#include "body.h"
 #include "failure.h"
+#include "input.h"
 
 namespace web {
 namespace {
@@ -34,16 +32,16 @@ int HexDigit(char c) {
     throw Failure(400, "The address has a broken escape.");
 }
 
-std::map<std::string, std::string> ReadQuery(const std::string& text) {
+std::multimap<std::string, std::string> ReadQuery(const std::string& text) {
     if (text.size() > kMostQuery) {
         throw Failure(414, "The address is too long.");
     }
-    std::map<std::string, std::string> query;
+    std::multimap<std::string, std::string> query;
     std::istringstream parts(text);
     for (std::string part; std::getline(parts, part, '&');) {
         const size_t equals = part.find('=');
         if (equals != std::string::npos) {
-            query[Unescape(part.substr(0, equals))] = Unescape(part.substr(equals + 1));
+            query.emplace(Unescape(part.substr(0, equals)), Unescape(part.substr(equals + 1)));
         }
     }
     return query;
@@ -65,11 +63,7 @@ long long ReadLength(const std::string& text) {
 std::string ReadBody(size_t size) {
     std::string body(size, '\0');
     for (size_t at = 0; at < size;) {
-        const ssize_t n = read(STDIN_FILENO, &body[at], size - at);
-        if (n == 0 || (n < 0 && errno != EINTR)) {
-            throw Failure(400, "The request ended early.");
-        }
-        at += n > 0 ? static_cast<size_t>(n) : 0;
+        at += ReadInput(&body[at], size - at);
     }
     return body;
 }
@@ -110,6 +104,15 @@ std::string Request::Parameter(const std::string& name, const std::string& other
     return found == query.end() ? otherwise : found->second;
 }
 
+std::vector<std::string> Request::Parameters(const std::string& name) const {
+    std::vector<std::string> values;
+    const auto [begin, end] = query.equal_range(name);
+    for (auto value = begin; value != end; ++value) {
+        values.push_back(value->second);
+    }
+    return values;
+}
+
 Request ReadRequest() {
     Request request;
     request.method = Environment("REQUEST_METHOD");
@@ -136,13 +139,8 @@ Json::Value ReadJson(const Request& request) {
     if (request.length < 0 || request.length > kMostJson) {
         throw Failure(413, "The request is too large.");
     }
-    const std::string body = ReadBody(static_cast<size_t>(request.length));
-    Json::CharReaderBuilder builder;
-    Json::CharReaderBuilder::strictMode(&builder.settings_);
-    const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
-    Json::Value value;
-    if (!reader->parse(body.data(), body.data() + body.size(), &value, nullptr) ||
-        !value.isObject()) {
+    Json::Value value = ParseObject(ReadBody(static_cast<size_t>(request.length)));
+    if (value.isNull()) {
         throw Failure(400, "The request is not what this program reads.");
     }
     return value;

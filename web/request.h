@@ -6,6 +6,7 @@
 
 #include <map>
 #include <string>
+#include <vector>
 
 namespace web {
 
@@ -14,12 +15,14 @@ struct Request {
     std::string path;
     std::string content_type;
     std::string range;  ///< header of this name
-    std::map<std::string, std::string> query;
+    std::multimap<std::string, std::string> query;
     long long length = -1;  ///< of the body; -1 when the request does not tell
 
     /** A parameter of the query; Failure with status 400 without it. */
     const std::string& Parameter(const std::string& name) const;
     std::string Parameter(const std::string& name, const std::string& otherwise) const;
+    /** All of this name, in their order. */
+    std::vector<std::string> Parameters(const std::string& name) const;
 };
 
 /** Failure with status 400 for what cannot be read. */

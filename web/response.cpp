@@ -10,6 +10,8 @@
 namespace web {
 namespace {
 
+bool answered = false;
+
 const char* Reason(int status) {
     switch (status) {
         case 200:
@@ -27,15 +29,21 @@ const char* Reason(int status) {
 
 }  // namespace
 
-bool Write(const std::string& bytes) {
-    for (size_t at = 0; at < bytes.size();) {
-        const ssize_t n = write(STDOUT_FILENO, bytes.data() + at, bytes.size() - at);
+bool Write(const char* data, size_t size) {
+    answered = true;
+    while (size > 0) {
+        const ssize_t n = write(STDOUT_FILENO, data, size);
         if (n < 0 && errno != EINTR) {
             return false;
         }
-        at += n > 0 ? static_cast<size_t>(n) : 0;
+        data += n > 0 ? n : 0;
+        size -= n > 0 ? static_cast<size_t>(n) : 0;
     }
     return true;
+}
+
+bool HasAnswered() {
+    return answered;
 }
 
 std::string Head(int status, const std::string& type, const std::string& headers) {
@@ -53,6 +61,10 @@ void AnswerJson(int status, const Json::Value& value) {
     builder["indentation"] = "";
     Write(Head(status, "application/json; charset=utf-8") + Json::writeString(builder, value) +
           "\n");
+}
+
+void AnswerDone() {
+    AnswerJson(200, Json::Value(Json::objectValue));
 }
 
 void DrainInput() {

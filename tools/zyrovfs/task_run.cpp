@@ -8,7 +8,6 @@
 #include <zyrovfs/task.h>
 
 #include <cerrno>
-#include <climits>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
@@ -16,6 +15,7 @@
 
 #include "report.h"
 #include "task_queue.h"
+#include "task_turn.h"
 
 namespace tool {
 namespace {
@@ -66,7 +66,7 @@ class HeldSignals {
     sigset_t before_{};
 };
 
-enum WaitResult { kTurn = 0, kQueueFailed = -1 };  // or the signal that ended the wait
+constexpr int kQueueFailed = -1;
 
 void TellPlace(const TaskRun& run, int64_t place, int64_t& told) {
     if (place != told) {
@@ -76,36 +76,31 @@ void TellPlace(const TaskRun& run, int64_t place, int64_t& told) {
     }
 }
 
-int WaitForTurn(TaskMgr& tasks, const TaskRun& run, const HeldSignals& signals) {
+/** 0 when the turn has come, the signal that ended the wait, or kQueueFailed. */
+int Wait(const TaskRun& run, const HeldSignals& signals) {
     constexpr timespec kPause{0, 200000000};
-    constexpr int kMostFailures = 5;
-    TaskMgr without_limit(UINT_MAX);  // tells a place to one who has to wait, too
-    int failures = 0;
-    int64_t told = 0;
-    while (tasks.IsRunnable(run.name.c_str(), run.id.c_str(), getpid(), nullptr, nullptr) <= 0) {
-        const int64_t place =
-            without_limit.IsRunnable(run.name.c_str(), run.id.c_str(), getpid(), nullptr, nullptr);
-        // Without a place the entry was lost and has been queued again, or the registry fails.
-        failures = place > 0 ? 0 : failures + 1;
-        if (failures == kMostFailures) {
-            return kQueueFailed;
-        }
-        if (place > 0) {
-            TellPlace(run, place, told);
-        }
-        siginfo_t info{};
-        const int number = signals.Take(&kPause, info);
-        if (number != 0 && number != SIGCHLD) {
-            return number;
-        }
-    }
-    if (told != 0) {
-        fprintf(stderr, "%s: running\n", run.name.c_str());
-    }
-    siginfo_t info{};
     constexpr timespec kNoPause{0, 0};
-    const int number = signals.Take(&kNoPause, info);
-    return number == SIGCHLD ? 0 : number;
+    int64_t told = 0;
+    int number = 0;
+    const auto take = [&](const timespec& pause) {
+        siginfo_t info{};
+        number = signals.Take(&pause, info);
+        number = number == SIGCHLD ? 0 : number;
+        return number != 0;
+    };
+    const Turn turn = WaitForTurn(
+        run.name, run.id, run.limit, [&](int64_t place) { TellPlace(run, place, told); },
+        [&] { return take(kPause); });
+    if (turn == Turn::kQueueFailed) {
+        return kQueueFailed;
+    }
+    if (turn == Turn::kCame) {
+        if (told != 0) {
+            fprintf(stderr, "%s: running\n", run.name.c_str());
+        }
+        take(kNoPause);
+    }
+    return number;
 }
 
 /** In the command's process. Without an entry in the user directory HOME stays the caller's. */
@@ -193,9 +188,9 @@ int RunTask(unsigned int uid, const TaskRun& chosen, bool json) {
         return ReportProblem(
             "The queue " + run.name + " cannot be written; the system log tells why.", json);
     }
-    const int waited = WaitForTurn(tasks, run, signals);
+    const int waited = Wait(run, signals);
     int status = kBySignal + waited;
-    if (waited == kTurn) {
+    if (waited == 0) {
         status = RunCommand(uid, run, signals);
     } else if (waited == kQueueFailed) {
         status = ReportProblem(

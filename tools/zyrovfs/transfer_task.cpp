@@ -4,6 +4,8 @@
 #include <unistd.h>
 #include <zosplatform/user.h>
 
+#include <cerrno>
+
 namespace tool {
 
 TransferTask::TransferTask(unsigned int uid, const std::vector<std::string>& uris) {
@@ -13,7 +15,7 @@ TransferTask::TransferTask(unsigned int uid, const std::vector<std::string>& uri
     }
     Json::Value properties;
     properties["pid"] = getpid();
-    properties["proc_name"] = "zyrovfs";
+    properties["proc_name"] = program_invocation_short_name;
     properties["data"]["is_vfs"] = true;
     for (const std::string& uri : uris) {
         properties["data"]["vfs_uri"][uri] = true;
