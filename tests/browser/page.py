@@ -1,7 +1,9 @@
 """What the tests of the page share: a browser at the box's page, and what a person does there."""
+import base64
 import json
 import os
 import unittest
+import urllib.request
 from urllib.parse import urlencode
 
 from webdriver import Chromium
@@ -17,6 +19,16 @@ def write(path, contents):
     with open(path, "wb") as file:
         file.write(contents)
     return path
+
+
+def post(action, **body):
+    """A change that does not come from the page that is open."""
+    request = urllib.request.Request(
+        f"http://127.0.0.1:8090/files/api/{action}", data=json.dumps(body).encode(),
+        headers={"X-Zyrovfs-Request": "1", "Origin": "http://127.0.0.1:8090",
+                 "Authorization": "Basic " + base64.b64encode(b"amy:amy").decode()})
+    with urllib.request.urlopen(request) as answer:
+        return json.load(answer)
 
 
 def noise(path, size):
@@ -42,7 +54,8 @@ class PageTest(unittest.TestCase):
     def tearDown(self):
         # What the box refuses is in the console, too, and is not the page's.
         lines = [line["message"] for line in self.browser.log("browser")
-                 if "Failed to load resource" not in line["message"]]
+                 if "Failed to load resource" not in line["message"]
+                 and not line["message"].startswith("chrome:")]
         self.assertEqual(lines, [])
 
     def open(self, connection=None, path="/"):

@@ -48,8 +48,16 @@ class Browser:
         return self.command("execute", {"script": script, "args": list(arguments)})
 
     def wait(self, script, *arguments):
-        """Until a script gives what counts as true."""
-        return eventually(lambda: self.run(script, *arguments), f"{script} {arguments}\n{self.text()}")
+        """Until a script gives what counts as true; one that fails looks for what is not there yet."""
+        def condition():
+            try:
+                return self.run(script, *arguments)
+            except Failed:
+                return None
+        try:
+            return eventually(condition, f"{script} {arguments}")
+        except AssertionError as error:
+            raise AssertionError(f"{error}\n{self.text()}") from None
 
     def text(self):
         return self.run("return document.body?.innerText ?? ''")

@@ -2,6 +2,7 @@
 import { get, post } from './api.mjs';
 import { ask, field, paragraph } from './dialogs.mjs';
 import { element } from './dom.mjs';
+import { date } from './format.mjs';
 
 const refused = new Set(['VFS_ERR_WRONG_PASSWORD', 'VFS_ERR_UNAUTHORIZED', 'VFS_ERR_WRONG_USERNAME']);
 
@@ -44,13 +45,14 @@ function askForPassword(error) {
 const facts = [['host', 'Host'], ['type', 'Kind of key'], ['fingerprint', 'Fingerprint'],
   ['subject', 'Issued to'], ['issuer', 'Issued by'], ['valid_from', 'Valid from'],
   ['valid_to', 'Valid to']];
+const times = new Set(['valid_from', 'valid_to']);
 
 function askTrust(trust) {
   const key = trust.kind === 'host_key';
   const what = key ? 'host key' : 'certificate';
   const table = element('dl', {}, ...facts.filter(([name]) => trust[name])
     .flatMap(([name, label]) => [element('dt', { textContent: label }),
-      element('dd', { textContent: trust[name] })]));
+      element('dd', { textContent: times.has(name) ? date(trust[name]) : trust[name] })]));
   const problems = trust.problems?.length
     ? [element('ul', {}, ...trust.problems.map((text) => element('li', { textContent: text })))] : [];
   return ask({
@@ -80,32 +82,26 @@ export async function addConnection() {
 
   function showFields() {
     const chosen = offered.find(({ protocol }) => protocol === kind.value);
-    const rows = chosen.fields.map((one) => ({ one, row: field(one.label, makeControl(one, chosen)) }));
+    const rows = chosen.fields.map((one) => ({ one, row: field(one.label, makeControl(one)) }));
     controls = Object.fromEntries(rows.map(({ one, row }) => [one.name, row.control]));
     fields.replaceChildren(...rows.map(({ row }) => row));
-    const { anonymous } = controls;
-    if (anonymous) {
-      anonymous.onchange = () => {
-        for (const name of ['user', 'password'].filter((one) => controls[one])) {
-          controls[name].disabled = anonymous.checked;
-        }
-      };
-    }
   }
 
   function collect() {
-    const values = Object.entries(controls).filter(([, control]) => !control.disabled)
+    const values = Object.entries(controls)
+      .filter(([, control]) => control.type !== 'number' || control.value !== '')
       .map(([name, control]) => [name, control.type === 'checkbox' ? control.checked
         : control.type === 'number' ? Number(control.value) : control.value]);
     return { protocol: kind.value, ...Object.fromEntries(values) };
   }
 
-  const accounts = profiles.map(({ id, service, account }) => [`${service}: ${account}`, id]);
+  const accounts = profiles.map(
+    ({ id, title, account, alias }) => [`${title}: ${alias || account}`, id]);
   if (offered.length > 0) {
     showFields();
   }
   const body = [
-    ...(accounts.length ? [paragraph('Saved cloud accounts'), element('ul', { className: 'choices' },
+    ...(accounts.length ? [paragraph('Saved accounts'), element('ul', { className: 'choices' },
       ...accounts.map(([text, id]) => element('li', {}, element('button', {
         type: 'submit', value: `profile:${id}`, formNoValidate: true, textContent: text }))))] : []),
     ...(offered.length ? [field('Kind', kind), fields] : [])];
@@ -122,14 +118,14 @@ export async function addConnection() {
   return added && result;
 }
 
-function makeControl(one, chosen) {
-  const port = one.name === 'port' ? chosen.port : undefined;
+function makeControl(one) {
   return element('input', {
     type: one.type,
     required: Boolean(one.required),
     autocomplete: one.type === 'password' ? 'new-password' : 'off',
     autocapitalize: 'off',
     spellcheck: false,
-    ...(one.type === 'number' && { min: 1, max: 65535, value: port || '' }),
+    ...(one.type === 'number' && { min: 1, max: 65535 }),
+    ...(one.type === 'checkbox' ? { checked: one.value === true } : { value: one.value ?? '' }),
   });
 }

@@ -8,6 +8,8 @@ import { attempt } from './notices.mjs';
 const states = {
   connected: 'Connected', disconnected: 'Disconnected', unavailable: 'Not available' };
 
+const gone = { disconnected: 'disconnected', unavailable: 'not available' };
+
 export class Connections {
   #all = [];
   #open = null;
@@ -30,7 +32,7 @@ export class Connections {
   async load() {
     const { user, connections } = await get('connections');
     byId('user').textContent = user;
-    this.#all = connections.map((one) => ({ state: 'connected', ...one }));
+    this.#all = connections;
     this.show(this.#open?.id ?? null);
   }
 
@@ -39,8 +41,12 @@ export class Connections {
     this.#open = this.find(id);
     byId('connections').replaceChildren(...this.#all.map((one) => this.#item(one)));
     byId('no-connections').hidden = this.#all.length > 0;
-    document.body.dataset.view = this.#open === null ? 'connections' : this.#open.state;
-    byId('gone-title').textContent = this.#open === null ? '' : `“${this.#open.alias}” is disconnected`;
+    document.body.dataset.view = this.#open?.state ?? 'connections';
+    byId('gone-title').textContent = this.#open ? `“${this.#open.alias}” is ${gone[this.#open.state]}` : '';
+    byId('gone-advice').textContent = this.#open?.state === 'unavailable'
+      ? 'Its service refuses it now. Delete the connection and sign in to the account anew.'
+      : 'Connect it to see its files.';
+    byId('connect').hidden = this.#open?.state === 'unavailable';
   }
 
   async add() {

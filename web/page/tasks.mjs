@@ -8,7 +8,7 @@ const every = 1000;  // milliseconds
 
 export class Tasks {
   #rows = new Map();
-  #states = new Map();
+  #alive = new Set();
   #timer = null;
   #ended;
 
@@ -29,7 +29,7 @@ export class Tasks {
       return;
     }
     this.#show(tasks);
-    if (tasks.some(({ state }) => state === 'running')) {
+    if (tasks.some(isAlive)) {
       this.#lookLater();
     }
   }
@@ -53,10 +53,10 @@ export class Tasks {
         byId('copies').append(this.#rows.get(task.id));
       }
       this.#rows.get(task.id).show(task);
-      if (this.#states.get(task.id) === 'running' && task.state !== 'running') {
+      if (this.#alive.has(task.id) && !isAlive(task)) {
         this.#ended();
       }
-      this.#states.set(task.id, task.state);
+      this.#alive[isAlive(task) ? 'add' : 'delete'](task.id);
     }
   }
 
@@ -76,19 +76,23 @@ export class Tasks {
       element('span', { className: 'buttons' }, cancel, remove), bar, text);
     row.show = (task) => {
       row.dataset.state = task.state;
-      const running = task.state === 'running';
-      if (running && !task.total) {
+      const alive = isAlive(task);
+      if (alive && (task.counting || !task.total)) {
         bar.removeAttribute('value');
       } else {
         bar.value = task.state === 'done' ? 100 : percent(task.done, task.total);
       }
       bar.hidden = task.state === 'failed' || task.state === 'cancelled';
-      cancel.hidden = !running;
-      remove.hidden = running;
+      cancel.hidden = !alive;
+      remove.hidden = alive;
       text.textContent = detail(task);
     };
     return row;
   }
+}
+
+function isAlive({ state }) {
+  return state === 'waiting' || state === 'running';
 }
 
 function detail(task) {
@@ -96,11 +100,13 @@ function detail(task) {
     ? `${task.files_done} of ${count(task.files_total, 'file')}` : '';
   switch (task.state) {
     case 'done': return ['Done', files, size(task.total ?? task.done)].filter(Boolean).join(' · ');
+    case 'waiting': return 'Waiting for its turn';
     case 'cancelled': return ['Cancelled', files].filter(Boolean).join(' · ');
     case 'failed': return [task.error?.meaning ?? task.error ?? 'The copy failed.',
       task.error?.advice].filter(Boolean).join(' ');
-    default: return [files, task.total ? `${size(task.done)} of ${size(task.total)}` : 'Looking',
-      rate(task.rate), task.rate > 0 ? timeLeft((task.total - task.done) / task.rate) : '']
+    default: return [files, task.total ? `${size(task.done)} of ${size(task.total)}` : '',
+      task.counting ? 'counting what there is' : '', rate(task.rate),
+      !task.counting && task.rate > 0 ? timeLeft((task.total - task.done) / task.rate) : '']
       .filter(Boolean).join(' · ');
   }
 }

@@ -67,14 +67,16 @@ export class Uploads {
       text.textContent = `${count(sum.files, 'file')} in ${count(sum.folders, 'folder')}, ` +
         size(sum.bytes);
     });
-    closed.then(() => stop.abort());
-    const found = await walk(entries, (counted) => {
+    // A browser that is busy reading a folder does not keep the person waiting.
+    const stopped = closed.then(() => stop.abort());
+    const walked = walk(entries, (counted) => {
       sum = counted;
       tell();
     }, stop.signal).catch((error) => {
       failure = error;
       return null;
     });
+    const found = await Promise.race([walked, stopped.then(() => null)]);
     dialog.close();
     if (failure && failure.name !== 'AbortError') {
       await ask({

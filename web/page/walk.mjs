@@ -26,22 +26,24 @@ export async function walk(entries, counted = () => {}, signal = undefined) {
   const waiting = [[...entries]];
   while (waiting.length > 0) {
     const batch = waiting.shift();
-    for (const entry of batch) {
-      signal?.throwIfAborted();
-      if (entry.isDirectory) {
+    signal?.throwIfAborted();
+    const files = await Promise.all(
+      batch.map((entry) => (entry.isDirectory ? null : promised(entry, 'file'))));
+    for (const [at, entry] of batch.entries()) {
+      const file = files[at];
+      if (file) {
+        sum.files += 1;
+        sum.bytes += file.size;
+        found.push({ path: entry.fullPath, file, size: file.size });
+      } else {
         sum.folders += 1;
         found.push({ path: entry.fullPath, size: 0 });
         for await (const children of childrenOf(entry)) {
           waiting.push(children);
         }
-      } else {
-        const file = await promised(entry, 'file');
-        sum.files += 1;
-        sum.bytes += file.size;
-        found.push({ path: entry.fullPath, file, size: file.size });
       }
-      counted(sum);
     }
+    counted(sum);
   }
   return found;
 }

@@ -7,15 +7,19 @@ make_cloud_certificates() {
   "$build/tests/support/cloudsim/cloudsim" --make-tls /tmp/tls \
     {accounts,docs,content,login,public,cid-8c8ce076ca278000}.localhost &&
     cat /tmp/tls/ca.pem >>/etc/ssl/certs/ca-certificates.crt &&
-    mkdir -p /tmp/tokens /tmp/journal /tmp/clouds /srv/{box,dropbox,google,onedrive}
+    mkdir -p /tmp/tokens /tmp/journal "/tmp/clouds/$(cloud_top google)" \
+      /srv/{box,dropbox,google,onedrive}
 }
+# A box shows the own files of a Google account below a folder of their own; $google_top names it,
+# or nothing where the tree is to be the account's.
+cloud_top() { if [ "$1" = google ]; then echo "google/${google_top:-}"; else echo "$1"; fi; }
 # start_cloud NAME PORT OPTION...
 start_cloud() {
   local name=$1 port=$2
   shift 2
   "$build/tests/support/cloudsim/cloudsim" --$name --tls /tmp/tls/cert.pem /tmp/tls/key.pem \
     --port $port --client demo:demo-secret --account amy@example.com --name Amy \
-    --serve /srv/$name --mount /tmp/clouds/$name --tokens /tmp/tokens/$name \
+    --serve /srv/$name --mount "/tmp/clouds/$(cloud_top $name)" --tokens /tmp/tokens/$name \
     --journal /tmp/journal/$name "$@" >/tmp/$name-out 2>&1 &
   eventually grep -x ready /tmp/$name-out
 }
