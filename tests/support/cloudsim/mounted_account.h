@@ -18,7 +18,10 @@ namespace cloudsim {
 class MountedAccount {
   public:
     MountedAccount(Service& service, const Account& account, const std::string& folder)
-        : service_(service), account_(account), tree_(folder) {}
+        : service_(service), account_(account), tree_(folder) {
+        // Where a box shows the account below a folder of its own, that folder is the root.
+        tree_.Set("/", "id::file", account.Root());
+    }
 
     /** Shows what has changed since, and again what a client asked to be forgotten. */
     void Refresh();
