@@ -1,5 +1,7 @@
 #include "cloud_tree.h"
 
+#include <unistd.h>
+
 #include <utility>
 
 #include "cloud_item.h"
@@ -64,8 +66,10 @@ std::string NameAtService(const CloudItem& item, const std::string& name) {
 
 }  // namespace
 
-CloudTree::CloudTree(std::string server_id, std::string account_id)
-    : server_id_(std::move(server_id)), account_id_(std::move(account_id)) {
+CloudTree::CloudTree(std::string server_id, std::string account_id, std::string folder)
+    : server_id_(std::move(server_id)),
+      account_id_(std::move(account_id)),
+      folder_(std::move(folder)) {
     const std::string scheme = server_id_.substr(0, server_id_.find(':'));
     service_ = scheme == "box"       ? kBox
                : scheme == "dropbox" ? kDropbox
@@ -78,6 +82,10 @@ CloudTree::CloudTree(std::string server_id, std::string account_id)
 
 CloudTree::~CloudTree() {
     ZYROCloud_Cache_Destroy(&cache_);
+}
+
+bool CloudTree::IsThere() {
+    return access(folder_.c_str(), F_OK) == 0;
 }
 
 void CloudTree::ListItems(const std::string& path, const Tell& tell) {

@@ -10,20 +10,18 @@
 
 namespace web {
 
-/**
- * What a service calls an item: its id, or its path where the service goes by paths. An id that
- * begins with a letter of an item's name is no accident: nobody but the tree looks into it.
- */
 struct CloudItem {
     Entry entry;
-    std::string id;
+    std::string id;  ///< the service's own; the path where the service goes by paths
 };
 
 class CloudTree : public Tree {
   public:
-    /** `account_id` is the account's own id at the service, which Box's listings need. */
-    CloudTree(std::string server_id, std::string account_id);
+    /** `account_id` is the account's own id at the service, which Box's listings need;
+     * `folder` is where the account is mounted. */
+    CloudTree(std::string server_id, std::string account_id, std::string folder);
     ~CloudTree() override;
+    bool IsThere() override;
 
     void List(const std::string& path, const std::function<void(Entry)>& tell) override;
     Entry Look(const std::string& path) override;
@@ -45,6 +43,7 @@ class CloudTree : public Tree {
 
     std::string server_id_;
     std::string account_id_;
+    std::string folder_;
     Service service_;
     ZYROCloud_Cache* cache_ = nullptr;
 };

@@ -1,4 +1,5 @@
 // Connections made, mounted, taken down and forgotten.
+#include <unistd.h>
 #include <zyrovfs/server.h>
 
 #include "action.h"
@@ -35,6 +36,17 @@ std::string OwnConnection(const User& user, const Body& body) {
     return Connection(user, body.Text("connection")).Id();
 }
 
+/** The mounted tree learns of mounts and unmounts a moment later; what is then shown as connected
+ * can be opened, and what is not is gone. */
+void WaitUntil(const User& user, const std::string& id, bool there) {
+    constexpr int kTries = 100;
+    constexpr useconds_t kPause = 50000;
+    const std::unique_ptr<Tree> files = Connection(user, id).Files();
+    for (int i = 0; i < kTries && files->IsThere() != there; ++i) {
+        usleep(kPause);
+    }
+}
+
 }  // namespace
 
 void Connect(const User& user, const Request& request) {
@@ -49,6 +61,7 @@ void Connect(const User& user, const Request& request) {
         change["password"] = password;
         return Server::Set(user.uid, Server::VFS_CONFIG_CONNECT, id, change, force);
     });
+    WaitUntil(user, id, true);
     AnswerConnection(id);
 }
 
@@ -72,6 +85,7 @@ void Disconnect(const User& user, const Request& request) {
     if (!Server::Disconnect(user.uid, id.c_str())) {
         throw FailureOf("The connection was not taken down", GetError());
     }
+    WaitUntil(user, id, false);
     AnswerDone();
 }
 

@@ -54,7 +54,7 @@ std::unique_ptr<Tree> Connection::Files() const {
     const Json::Value account = ParseObject(Member("account_info"));
     const Json::Value& id = account["id"];
     return std::make_unique<CloudTree>(
-        id_, id.isConvertibleTo(Json::stringValue) ? id.asString() : "");
+        id_, id.isConvertibleTo(Json::stringValue) ? id.asString() : "", Member("path"));
 }
 
 }  // namespace web

@@ -33,7 +33,8 @@ constexpr CodeRow kCodes[] = {
     {VFS_ERR_BAD_PARAM, 422, "Check what was filled in."},
     {VFS_ERR_INVALID_SERVER, 422, "Check what was filled in."},
     {VFS_ERR_HOST_UNREACHABLE, 502, kHost},
-    {VFS_ERR_ACCESS_DENIED, 401, kCredentials},
+    // Said by a server that takes no session, and by mounts that know no better.
+    {VFS_ERR_ACCESS_DENIED, 502, "Check the address, the port, the user name and the password."},
     {VFS_ERR_WRONG_USERNAME, 401, kCredentials},
     {VFS_ERR_WRONG_PASSWORD, 401, kCredentials},
     {VFS_ERR_CONNECT_EXISTS, 409, "It is among the connections already."},
@@ -152,7 +153,8 @@ Failure FailureOf(const std::string& what, __tag_vfs_err_ code) {
 Failure FailureOfErrno(const std::string& what) {
     const int error = errno;
     const __tag_vfs_err_ code = CodeOf(kErrnos, error);
-    return code == VFS_ERR_NONE ? Failure(502, what + ": " + std::strerror(error))
+    return code == VFS_ERR_NONE ? Failure(502, what + ": The remote side could not do it (" +
+                                                   std::strerror(error) + ").")
                                 : FailureOf(what, code);
 }
 

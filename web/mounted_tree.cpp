@@ -142,6 +142,10 @@ Descriptor MountedTree::Open(const std::string& path, int flags) const {
     return fd;
 }
 
+bool MountedTree::IsThere() {
+    return access(folder_.c_str(), F_OK) == 0;
+}
+
 void MountedTree::List(const std::string& path, const std::function<void(Entry)>& tell) {
     const Folder folder = Read(Open(path, O_RDONLY | O_DIRECTORY));
     Check(folder != nullptr, path);

@@ -15,6 +15,7 @@ class MountedTree : public Tree {
      * operation a Failure that says to connect again. */
     explicit MountedTree(std::string folder) : folder_(std::move(folder)) {}
 
+    bool IsThere() override;
     void List(const std::string& path, const std::function<void(Entry)>& tell) override;
     Entry Look(const std::string& path) override;
     void MakeFolder(const std::string& path) override;

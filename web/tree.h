@@ -35,6 +35,8 @@ class Tree {
     Tree& operator=(const Tree&) = delete;
     virtual ~Tree() = default;
 
+    /** Whether the root is there, as far as can be told without asking a service. */
+    virtual bool IsThere() = 0;
     /** Tells of each entry, in the order in which they come. */
     virtual void List(const std::string& path, const std::function<void(Entry)>& tell) = 0;
     /** The item at a path; Failure with status 404 when there is none. */

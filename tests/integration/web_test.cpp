@@ -1,61 +1,18 @@
-// The web layer behind lighttpd, as a browser of a logged-in user sees it: the program is started
-// by the web server's own account and acts for the user, on a real WebDAV server and the user's
-// tree.
+// The web layer behind lighttpd: the program is started by the web server's own account and acts for
+// the user, on a real WebDAV server and the user's tree.
 #include <gmock/gmock.h>
-#include <json/reader.h>
-#include <sys/stat.h>
 
-#include <filesystem>
-
-#include "support/locations.h"
 #include "support/vfs_cloud_remote.h"
+#include "support/web_site.h"
 
 namespace {
 
 using namespace remote_side;
-using machine::Eventually;
-using machine::Must;
+using namespace web_site;
 using testing::HasSubstr;
 using testing::Not;
 using testing::UnorderedElementsAre;
 namespace fs = std::filesystem;
-
-constexpr const char* kSite = "http://127.0.0.1:8090";
-constexpr const char* kNoLogin = "http://127.0.0.1:8091";
-constexpr unsigned kBen = 4002;
-
-/** lighttpd with its own log-in on one port, and with none on the other. */
-void StartWebServer() {
-    Must("mkdir -p /run/web/root");
-    Must("cp " + BuildDir() + "/web/zyrovfs-web /run/web/zyrovfs-web");
-    Must("chown root:www-data /run/web/zyrovfs-web; chmod 4750 /run/web/zyrovfs-web");
-    Must("printf 'amy:a\\nben:b\\ndaemon:d\\nroot:r\\nnobody-here:n\\n' >/run/web/users");
-    std::ofstream("/run/web/lighttpd.conf") << R"(
-server.modules = ("mod_auth", "mod_authn_file", "mod_alias", "mod_cgi")
-server.document-root = "/run/web/root"
-server.bind = "127.0.0.1"
-server.port = 8090
-server.username = "www-data"
-server.groupname = "www-data"
-server.errorlog = "/run/web/error.log"
-server.stream-request-body = 2
-server.stream-response-body = 2
-alias.url = ("/files" => "/run/web/zyrovfs-web")
-$HTTP["url"] =~ "^/files" { cgi.assign = ("" => "") }
-auth.backend = "plain"
-auth.backend.plain.userfile = "/run/web/users"
-$SERVER["socket"] == "127.0.0.1:8091" { }
-else $SERVER["socket"] == "127.0.0.1:8090" {
-  auth.require = ("/" => ("method" => "basic", "realm" => "box", "require" => "valid-user"))
-}
-)";
-    Must(
-        "chown -R www-data /run/web/root /run/web/users; touch /run/web/error.log; "
-        "chown www-data /run/web/error.log");
-    Must("lighttpd -f /run/web/lighttpd.conf");
-    ASSERT_TRUE(Eventually(
-        [] { return machine::Run(std::string("curl -s -o /dev/null ") + kSite).status == 0; }));
-}
 
 std::string dav_id;
 
@@ -78,53 +35,19 @@ class Site : public testing::Environment {
 
 const auto* const kSetUp = testing::AddGlobalTestEnvironment(new Site);
 
-struct Answer {
-    int status = 0;
-    std::string head, body;
-
-    Json::Value Json() const {
-        Json::Value value;
-        Json::Reader().parse(body, value);
-        return value;
-    }
-};
-
-/** One request by curl; `arguments` stand in front of the address. */
-Answer Ask(const std::string& arguments, const std::string& address) {
-    Answer answer;
-    const std::string status = Must("curl -s -D /run/head -o /run/body -w '%{http_code}' " +
-                                    arguments + " '" + address + "'");
-    answer.status = std::stoi(status);
-    answer.head = machine::Read("/run/head");
-    answer.body = machine::Read("/run/body");
-    return answer;
-}
-
-std::string Escaped(const std::string& text) {
-    std::string escaped;
-    char part[4];
-    for (const char c : text) {
-        snprintf(part, sizeof part, "%%%02X", static_cast<unsigned char>(c));
-        escaped += part;
-    }
-    return escaped;
-}
-
 std::string At(const std::string& action, const std::string& path) {
-    return std::string(kSite) + "/files/api/" + action + "?connection=" + Escaped(dav_id) +
-           "&path=" + Escaped(path);
+    return web_site::At(action, dav_id, path);
 }
 
-constexpr const char* kAmyIs = "-u amy:a";
-/** What the page's own script sends with whatever changes something. */
-const std::string kOurs = "-u amy:a -H 'X-Zyrovfs-Request: 1' -H 'Origin: http://127.0.0.1:8090'";
+std::vector<std::string> NamesAt(const std::string& path) {
+    return web_site::NamesAt(dav_id, path);
+}
 
 Answer Change(const std::string& action, const std::string& path, const std::string& more = "",
               const std::string& headers = kOurs) {
     std::ofstream("/run/request.json")
         << "{\"connection\":\"" << dav_id << "\",\"path\":\"" << path << "\"" << more << "}";
-    return Ask(headers + " --data-binary @/run/request.json",
-               std::string(kSite) + "/files/api/" + action);
+    return Ask(headers + " --data-binary @/run/request.json", Api(action));
 }
 
 Answer Upload(const std::string& path, const std::string& bytes, const std::string& size = "",
@@ -132,15 +55,6 @@ Answer Upload(const std::string& path, const std::string& bytes, const std::stri
     std::ofstream("/run/source", std::ios::binary) << bytes;
     return Ask(headers + " -F 'file=@/run/source'",
                At("upload", path) + (size.empty() ? "" : "&size=" + size));
-}
-
-std::vector<std::string> NamesAt(const std::string& path) {
-    std::vector<std::string> names;
-    const Json::Value answer = Ask(kAmyIs, At("list", path)).Json();
-    for (const Json::Value& entry : answer["entries"]) {
-        names.push_back(entry["name"].asString());
-    }
-    return names;
 }
 
 TEST(Web, NobodyIsServedWithoutALogIn) {
@@ -173,11 +87,10 @@ TEST(Web, EachUserSeesTheOwnConnectionsAndNoOthers) {
     for (const char* action : {"list", "download"}) {
         EXPECT_EQ(Ask("-u ben:b", At(action, "/hello.txt")).status, 404) << action;
     }
-    const std::string as_ben = "-u ben:b" + kOurs.substr(std::string(kAmyIs).size());
     for (const char* action : {"mkdir", "rename", "delete"}) {
-        EXPECT_EQ(Change(action, "/hello.txt", ",\"name\":\"x\"", as_ben).status, 404) << action;
+        EXPECT_EQ(Change(action, "/hello.txt", ",\"name\":\"x\"", kBens).status, 404) << action;
     }
-    EXPECT_EQ(Upload("/ben.txt", "ben's", "5", as_ben).status, 404);
+    EXPECT_EQ(Upload("/ben.txt", "ben's", "5", kBens).status, 404);
     EXPECT_TRUE(fs::exists("/srv/remote/hello.txt"));
 }
 
@@ -266,7 +179,6 @@ TEST(Web, FoldersAreMadeAndDeleted) {
 }
 
 TEST(Web, FilesAreRenamedAndTakeNobodysPlace) {
-    // lighttpd moves no folder whose address has no slash at its end.
     ASSERT_EQ(Upload("/old.txt", "renamed", "7").status, 200);
     const Answer renamed = Change("rename", "/old.txt", ",\"name\":\"young.txt\"");
     EXPECT_EQ(renamed.status, 200) << renamed.body;
