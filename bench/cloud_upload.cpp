@@ -15,6 +15,7 @@
 #include <functional>
 
 #include "cloud_bare_upload.h"
+#include "service_process.h"
 
 namespace {
 
@@ -27,16 +28,11 @@ struct Sample {
     long peak;  ///< KiB
 };
 
-[[noreturn]] void Fail(const std::string& what) {
-    std::fprintf(stderr, "failed: %s\n", what.c_str());
-    std::exit(1);
-}
-
 /** A process that does this and tells what it took; it must be all that this one does meanwhile. */
 Sample Measure(const std::string& what, const std::function<bool()>& work) {
     int tell[2];
     if (pipe(tell) != 0) {
-        Fail("pipe");
+        bench::Fail("pipe");
     }
     const pid_t child = fork();
     if (child == 0) {
@@ -54,7 +50,7 @@ Sample Measure(const std::string& what, const std::function<bool()>& work) {
     rusage usage{};
     wait4(child, &status, 0, &usage);
     if (!told || status != 0) {
-        Fail(what);
+        bench::Fail(what);
     }
     const auto seconds = [](const timeval& time) {
         return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_usec) / 1e6;
@@ -62,66 +58,6 @@ Sample Measure(const std::string& what, const std::function<bool()>& work) {
     sample.cpu = seconds(usage.ru_utime) + seconds(usage.ru_stime);
     return sample;
 }
-
-/** A simulated service in a process of its own, as long as this object lives. */
-class ServiceProcess {
-  public:
-    explicit ServiceProcess(const bench::Service& service) {
-        int tell[2];
-        if (pipe(tell) != 0) {
-            Fail("pipe");
-        }
-        child_ = fork();
-        if (child_ == 0) {
-            prctl(PR_SET_PDEATHSIG, SIGKILL);
-            const bench::Simulated simulated(service);
-            const bench::Access made = simulated.Grant();
-            std::string text = made.token + "\n" + made.account + "\n";
-            for (const auto& [use, address] : made.hosts) {
-                text += use;
-                text += "\n" + address + "\n";
-            }
-            if (write(tell[1], text.data(), text.size()) < 0) {
-                _exit(1);
-            }
-            close(tell[1]);
-            for (;;) {
-                pause();
-            }
-        }
-        close(tell[1]);
-        Take(fdopen(tell[0], "r"));
-    }
-    ServiceProcess(const ServiceProcess&) = delete;
-    ServiceProcess& operator=(const ServiceProcess&) = delete;
-    ~ServiceProcess() {
-        kill(child_, SIGKILL);
-        waitpid(child_, nullptr, 0);
-    }
-
-    bench::Access access;
-
-  private:
-    void Take(std::FILE* from) {
-        char line[1024];
-        std::vector<std::string> lines;
-        while (std::fgets(line, sizeof line, from) != nullptr) {
-            lines.emplace_back(line);
-            lines.back().pop_back();
-        }
-        std::fclose(from);
-        if (lines.size() < 4) {
-            Fail("service");
-        }
-        access.token = lines[0];
-        access.account = lines[1];
-        for (size_t i = 2; i + 1 < lines.size(); i += 2) {
-            access.hosts[lines[i]] = lines[i + 1];
-        }
-    }
-
-    pid_t child_;
-};
 
 bool UploadByDriver(const bench::Service& service, const bench::Access& access,
                     const std::string& name, int fd, long long size) {
@@ -178,7 +114,7 @@ void PrintRatio(const char* what, const std::vector<Sample>& ours, const std::ve
 }
 
 void Compare(const bench::Service& service, int rounds, long long mib) {
-    const ServiceProcess process(service);
+    const bench::ServiceProcess process(service);
     const Sample small = Send(UploadByDriver, service, process.access, kSmallMiB);
     std::vector<Sample> ours;
     std::vector<Sample> bare;
@@ -211,7 +147,7 @@ void Compare(const bench::Service& service, int rounds, long long mib) {
 void MakeSource(long long mib) {
     const int fd = open(kSource, O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
     if (fd < 0 || posix_fallocate(fd, 0, mib * kMiB) != 0) {
-        Fail(kSource);
+        bench::Fail(kSource);
     }
     close(fd);
 }

@@ -6,6 +6,7 @@ cd "$(dirname "${BASH_SOURCE[0]}")/.."
 BUILD_PACKAGES=(
   g++ cmake ninja-build pkg-config ccache
   mold libglib2.0-dev libsoup2.4-dev libjsoncpp-dev libcurl4-openssl-dev libssl-dev libcli11-dev
+  zlib1g-dev
 )
 RUN_PACKAGES=(
   dbus-daemon gvfs gvfs-daemons gvfs-backends gvfs-fuse fuse3 libglib2.0-bin
@@ -16,7 +17,12 @@ SERVER_PACKAGES=(
   vsftpd openssh-server lighttpd lighttpd-mod-webdav lighttpd-mod-openssl samba glib-networking
   iproute2 util-linux openssl procps libmicrohttpd-dev libgnutls28-dev libfuse3-dev
 )
+# The web servers that the web layer is set up for, with their log-in by PAM.
+WEB_PACKAGES=(
+  lighttpd lighttpd-mod-authn-pam nginx libnginx-mod-http-auth-pam fcgiwrap spawn-fcgi
+)
 TEST_PACKAGES=(
+  "${WEB_PACKAGES[@]}" unzip
   libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev python3
   man-db groff-base bsdextrautils rclone curl
 )

@@ -9,6 +9,7 @@
 #include "failure.h"
 #include "name.h"
 #include "response.h"
+#include "stop.h"
 #include "transfer_note.h"
 #include "walk.h"
 #include "zip.h"
@@ -31,7 +32,7 @@ size_t Receive(char* data, size_t size, size_t count, void* opaque) {
     auto& into = static_cast<IntoZip&>(*static_cast<XferContext*>(opaque));
     into.can_retry = false;
     const size_t bytes = size * count;
-    return into.zip.Write(data, bytes) ? bytes : bytes == 0 ? 1 : 0;
+    return StopWatch::IsAsked() == 0 && into.zip.Write(data, bytes) ? bytes : bytes == 0 ? 1 : 0;
 }
 
 bool SendContent(Cloud& cloud, const std::string& uri, Zip& zip) {
@@ -92,10 +93,14 @@ std::vector<ZipEntry> EntriesOf(std::vector<Item>& items) {
 void SendArchive(const User& user, const Request& request) {
     const Connection connection(user, request.Parameter("connection"));
     const std::vector<std::string> paths = Chosen(request);
+    const StopWatch watch(nullptr);
     const TransferNote note(user, {connection.Id()});
     const std::unique_ptr<Cloud> cloud = connection.Driver();
-    std::vector<Item> items =
-        Walk(*connection.Files(), paths, kMostItems, [](const Item&) {});
+    std::vector<Item> items = Walk(*connection.Files(), paths, kMostItems, [](const Item&) {
+        if (StopWatch::IsAsked() != 0) {
+            throw FailureOf("The archive was stopped", ZYROVFS::VFS_ERR_CANCELLED);
+        }
+    });
     const std::vector<ZipEntry> entries = EntriesOf(items);
     const std::string headers =
         "Content-Length: " + std::to_string(ZipSize(entries)) +
@@ -107,10 +112,10 @@ void SendArchive(const User& user, const Request& request) {
     // whole.
     Zip zip([](const char* data, size_t size) { return Write(data, size); });
     for (size_t i = 0; i < items.size(); ++i) {
-        const bool sent = zip.Begin(entries[i]) &&
-                          (entries[i].size == 0 ||
-                           SendContent(*cloud, connection.Uri(items[i].path), zip)) &&
-                          zip.End();
+        const bool sent =
+            zip.Begin(entries[i]) &&
+            (entries[i].size == 0 || SendContent(*cloud, connection.Uri(items[i].path), zip)) &&
+            zip.End();
         if (!sent) {
             return;
         }

@@ -71,8 +71,7 @@ void ListConnections(const User& user, const Request&) {
     answer["user"] = user.name;
     answer["connections"] = Json::Value(Json::arrayValue);
     std::set<std::string> listed;
-    for (const Json::Value& connection :
-         ListOf(user, Server::VFS_CONFIG_CONNECT, "connections")) {
+    for (const Json::Value& connection : ListOf(user, Server::VFS_CONFIG_CONNECT, "connections")) {
         listed.insert(connection["id"].asString());
         answer["connections"].append(Describe(connection));
     }

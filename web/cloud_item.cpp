@@ -1,6 +1,5 @@
 #include "cloud_item.h"
 
-
 #include <algorithm>
 #include <iterator>
 
@@ -66,9 +65,8 @@ std::vector<Export> ExportsOf(const std::string& description) {
         return {};
     }
     std::vector<std::string> types = document["exportLinks"].getMemberNames();
-    std::stable_sort(types.begin(), types.end(), [](const auto& a, const auto& b) {
-        return RankOf(a) < RankOf(b);
-    });
+    std::stable_sort(types.begin(), types.end(),
+                     [](const auto& a, const auto& b) { return RankOf(a) < RankOf(b); });
     std::vector<Export> exports;
     exports.reserve(types.size());
     for (const std::string& type : types) {
@@ -85,8 +83,7 @@ Entry EntryOf(GFileInfo* info) {
     entry.folder = g_file_info_get_file_type(info) == G_FILE_TYPE_DIRECTORY;
     entry.file = !entry.folder;
     entry.size = entry.folder ? 0 : g_file_info_get_size(info);
-    const guint64 modified =
-        g_file_info_get_attribute_uint64(info, G_FILE_ATTRIBUTE_TIME_MODIFIED);
+    const guint64 modified = g_file_info_get_attribute_uint64(info, G_FILE_ATTRIBUTE_TIME_MODIFIED);
     entry.modified = modified == 0 ? -1 : static_cast<long long>(modified);
     if (entry.file) {
         entry.exports = ExportsOf(AttributeOf(info, G_FILE_ATTRIBUTE_STANDARD_DESCRIPTION));

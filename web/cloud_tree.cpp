@@ -56,12 +56,11 @@ std::string NameAtService(const CloudItem& item, const std::string& name) {
     const std::string& shown = item.entry.name;
     const size_t dot = shown.rfind('.');
     const std::string extension = dot == std::string::npos ? "" : shown.substr(dot);
-    const bool has_it = name.size() > extension.size() &&
-                        name.compare(name.size() - extension.size(), extension.size(),
-                                     extension) == 0;
-    return !item.entry.exports.empty() && has_it
-               ? name.substr(0, name.size() - extension.size())
-               : name;
+    const bool has_it =
+        name.size() > extension.size() &&
+        name.compare(name.size() - extension.size(), extension.size(), extension) == 0;
+    return !item.entry.exports.empty() && has_it ? name.substr(0, name.size() - extension.size())
+                                                 : name;
 }
 
 }  // namespace
@@ -194,8 +193,8 @@ void CloudTree::MoveItem(const CloudItem& item, const std::string& from, const s
                                                 target.c_str(), &error);
             break;
         case kDropbox:
-            moved = ZYROCloud_Cloud_Move(id, kUnused, item.id.c_str(), Join(to, name).c_str(),
-                                         &error);
+            moved =
+                ZYROCloud_Cloud_Move(id, kUnused, item.id.c_str(), Join(to, name).c_str(), &error);
             break;
     }
     Check(moved, item.entry.name, error);
@@ -237,11 +236,11 @@ void CloudTree::Delete(const std::string& path, bool recursive) {
     }
     int error = kNoCause;
     // What is starred lies elsewhere, too; here only its star is taken.
-    const int deleted = service_ == kGoogle && parent == kStarred
-                            ? ZYROCloud_Cloud_Google_DeleteStarred(server_id_.c_str(), cache_,
-                                                                   item.id.c_str(), &error)
-                            : ZYROCloud_Cloud_Delete(server_id_.c_str(), kUnused, item.id.c_str(),
-                                                     &error);
+    const int deleted =
+        service_ == kGoogle && parent == kStarred
+            ? ZYROCloud_Cloud_Google_DeleteStarred(server_id_.c_str(), cache_, item.id.c_str(),
+                                                   &error)
+            : ZYROCloud_Cloud_Delete(server_id_.c_str(), kUnused, item.id.c_str(), &error);
     Check(deleted, path, error);
 }
 

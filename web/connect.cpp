@@ -69,8 +69,7 @@ void Add(const User& user, const Request& request) {
     const Body body(request);
     const std::string saved = body.Text("profile", "");
     const Json::Value profile = saved.empty() ? ReadProfile(body) : Json::Value();
-    const std::string host =
-        saved.empty() ? profile.get("hostname", "").asString() : HostOf(saved);
+    const std::string host = saved.empty() ? profile.get("hostname", "").asString() : HostOf(saved);
     std::string id;
     WithTrust(kNotConnected, host, body.Text("accept", ""), [&](bool force) {
         Json::Value stored;

@@ -13,6 +13,7 @@
 #include "name.h"
 #include "range.h"
 #include "response.h"
+#include "stop.h"
 #include "transfer_note.h"
 
 namespace web {
@@ -78,8 +79,8 @@ void SendPart(const Source& source, const Range& range, long long size) {
     const std::string content_range = "Content-Range: bytes " + std::to_string(range.from) + "-" +
                                       std::to_string(range.to) + "/" + std::to_string(size) +
                                       "\r\n";
-    if (!Write(Head(206, source.Type(),
-                    source.Headers(source.name, range.Size()) + content_range)) ||
+    if (!Write(
+            Head(206, source.Type(), source.Headers(source.name, range.Size()) + content_range)) ||
         source.head_only) {
         return;
     }
@@ -100,7 +101,7 @@ void SendWhole(const Source& source, long long size) {
 void SendFile(const Source& source, const std::string& range_header) {
     long long size = 0;
     std::string mime;
-    if (!Cloud::RelayDownloadInit(source.cloud.get(), source.uri.c_str(), nullptr, "") ||
+    if (!Cloud::RelayDownloadInit(source.cloud.get(), source.uri.c_str(), StopWatch::NoLimit, "") ||
         !Cloud::RelayDownloadGetFileSizeAndMimeType(&size, mime) || size < 0) {
         throw source.Missing();
     }
@@ -144,7 +145,8 @@ std::string ExportName(const std::string& name, const Export& format) {
 void SendExport(const Source& source, const std::string& format) {
     const Export chosen = FindExport(source, format);
     const Descriptor room = ExportRoom();
-    if (!Cloud::RelayDownloadInit(source.cloud.get(), source.uri.c_str(), nullptr, format) ||
+    if (!Cloud::RelayDownloadInit(source.cloud.get(), source.uri.c_str(), StopWatch::NoLimit,
+                                  format) ||
         !Cloud::RelayDownloadFile(room.Get(), 0, 0)) {
         throw source.Missing();
     }
@@ -154,8 +156,8 @@ void SendExport(const Source& source, const std::string& format) {
         return;
     }
     off_t at = 0;
-    while (at < size && sendfile(STDOUT_FILENO, room.Get(), &at,
-                                 static_cast<size_t>(size - at)) > 0) {
+    while (at < size &&
+           sendfile(STDOUT_FILENO, room.Get(), &at, static_cast<size_t>(size - at)) > 0) {
     }
 }
 
@@ -163,6 +165,7 @@ void SendExport(const Source& source, const std::string& format) {
 
 void Download(const User& user, const Request& request) {
     const Source source(user, request);
+    const StopWatch watch(nullptr);
     const TransferNote note(user, {source.connection.Id()});
     const std::string format = request.Parameter("export", "");
     if (format.empty()) {

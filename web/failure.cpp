@@ -30,6 +30,10 @@ constexpr const char* kHost = "Check the address and the port, and whether the s
 
 /** What is not here is the remote side's failure, without advice. */
 constexpr CodeRow kCodes[] = {
+    {VFS_ERR_UNKNOWN, 502,
+     "The administrator finds the cause in the system log; the key of a server that is new here "
+     "may "
+     "have to be made known first."},
     {VFS_ERR_BAD_PARAM, 422, "Check what was filled in."},
     {VFS_ERR_INVALID_SERVER, 422, "Check what was filled in."},
     {VFS_ERR_HOST_UNREACHABLE, 502, kHost},
@@ -146,7 +150,8 @@ Json::Value Failure::Describe() const {
 
 Failure FailureOf(const std::string& what, __tag_vfs_err_ code) {
     const CodeRow* row = FindRow(code);
-    const std::string cause = code == VFS_ERR_NONE ? "." : std::string(": ") + GetErrorMeaning(code);
+    const std::string cause =
+        code == VFS_ERR_NONE ? "." : std::string(": ") + GetErrorMeaning(code);
     return {row == nullptr ? 502 : row->status, what + cause, code};
 }
 

@@ -104,6 +104,8 @@ User BecomeUser() {
         setresuid(-1, user.uid, -1) != 0) {
         throw Failure(500, "The program cannot become the user.");
     }
+    // Also while root's identity is taken up, the library's work is this user's.
+    setenv("ZYROVFS_UID", std::to_string(user.uid).c_str(), 1);
     return user;
 }
 

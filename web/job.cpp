@@ -31,8 +31,8 @@ Descriptor Enter(const Descriptor& parent, const std::string& name, bool make) {
     if (make) {
         mkdirat(parent.Get(), name.c_str(), 0700);
     }
-    return Descriptor(openat(parent.Get(), name.c_str(),
-                             O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+    return Descriptor(
+        openat(parent.Get(), name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
 }
 
 /** The folder of a user's records; no descriptor when there is none. For root. */
@@ -99,7 +99,8 @@ void MakeRoom(const Descriptor& folder) {
         }
     }
     if (ended.empty()) {
-        throw Failure(429, "Too much is under way at once.").Advise("Wait until some of it is done.");
+        throw Failure(429, "Too much is under way at once.")
+            .Advise("Wait until some of it is done.");
     }
     std::sort(ended.begin(), ended.end());
     for (size_t i = 0; i < std::max<size_t>(ended.size() / 2, 1); ++i) {

@@ -26,17 +26,17 @@ enum class JobState : uint32_t { kWaiting, kRunning, kDone, kFailed, kCancelled 
 /** Begins with what the library's relay fills in. Numbers are written by one process and read by
  * others while they change. */
 struct JobRecord : ZYROCloud::_tag_cgi_upload_progress_ {
-    unsigned long long moved;   ///< bytes that have reached the target
-    unsigned long long bytes;   ///< to be moved, as far as is known
-    unsigned long long files;   ///< that are whole at the target
-    unsigned long long items;   ///< files to be moved, as far as is known
-    int64_t started;            ///< epoch seconds
-    int64_t ended;              ///< the same; 0 while it runs
+    unsigned long long moved;  ///< bytes that have reached the target
+    unsigned long long bytes;  ///< to be moved, as far as is known
+    unsigned long long files;  ///< that are whole at the target
+    unsigned long long items;  ///< files to be moved, as far as is known
+    int64_t started;           ///< epoch seconds
+    int64_t ended;             ///< the same; 0 while it runs
     JobState state;
-    uint32_t counting;          ///< 1 while `bytes` and `items` grow
-    uint32_t cancel_asked;      ///< 1: by anybody
-    int32_t status;             ///< HTTP's, of a failure
-    int32_t code;               ///< the library's
+    uint32_t counting;      ///< 1 while `bytes` and `items` grow
+    uint32_t cancel_asked;  ///< 1: by anybody
+    int32_t status;         ///< HTTP's, of a failure
+    int32_t code;           ///< the library's
     char meaning[512];
     char title[512];
 };

@@ -10,11 +10,12 @@ constexpr struct {
     const char* extension;
     const char* type;
 } kTypes[] = {
-    {"avif", "image/avif"}, {"gif", "image/gif"},   {"jpeg", "image/jpeg"}, {"jpg", "image/jpeg"},
-    {"png", "image/png"},   {"webp", "image/webp"}, {"mp4", "video/mp4"},   {"m4v", "video/mp4"},
-    {"webm", "video/webm"}, {"ogv", "video/ogg"},   {"mov", "video/quicktime"},
-    {"flac", "audio/flac"}, {"m4a", "audio/mp4"},   {"mp3", "audio/mpeg"},  {"oga", "audio/ogg"},
-    {"ogg", "audio/ogg"},   {"opus", "audio/ogg"},  {"wav", "audio/wav"},
+    {"avif", "image/avif"}, {"gif", "image/gif"},       {"jpeg", "image/jpeg"},
+    {"jpg", "image/jpeg"},  {"png", "image/png"},       {"webp", "image/webp"},
+    {"mp4", "video/mp4"},   {"m4v", "video/mp4"},       {"webm", "video/webm"},
+    {"ogv", "video/ogg"},   {"mov", "video/quicktime"}, {"flac", "audio/flac"},
+    {"m4a", "audio/mp4"},   {"mp3", "audio/mpeg"},      {"oga", "audio/ogg"},
+    {"ogg", "audio/ogg"},   {"opus", "audio/ogg"},      {"wav", "audio/wav"},
 };
 
 }  // namespace

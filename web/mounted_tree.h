@@ -19,8 +19,7 @@ class MountedTree : public Tree {
     void List(const std::string& path, const std::function<void(Entry)>& tell) override;
     Entry Look(const std::string& path) override;
     void MakeFolder(const std::string& path) override;
-    void Move(const std::string& path, const std::string& folder,
-              const std::string& name) override;
+    void Move(const std::string& path, const std::string& folder, const std::string& name) override;
     void Delete(const std::string& path, bool recursive) override;
 
   private:

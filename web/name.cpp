@@ -110,8 +110,7 @@ std::string Join(const std::string& folder, const std::string& name) {
 }
 
 bool IsWithin(const std::string& path, const std::string& folder) {
-    return path == folder || folder == "/" ||
-           path.compare(0, folder.size() + 1, folder + "/") == 0;
+    return path == folder || folder == "/" || path.compare(0, folder.size() + 1, folder + "/") == 0;
 }
 
 namespace {

@@ -1,5 +1,8 @@
 #include "stop.h"
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include <csignal>
 
 #include "job.h"
@@ -33,6 +36,16 @@ StopWatch::~StopWatch() {
 
 int StopWatch::IsAsked() {
     return signalled != 0 || (watched != nullptr && watched->IsCancelAsked()) ? 1 : 0;
+}
+
+long long StopWatch::NoLimit(unsigned long long /*chunk*/, unsigned long long /*done*/) {
+    constexpr const char* kNoRoom = "/dev/full";
+    const int nowhere = IsAsked() == 0 ? -1 : open(kNoRoom, O_WRONLY | O_CLOEXEC);
+    if (nowhere >= 0) {
+        dup2(nowhere, STDOUT_FILENO);
+        close(nowhere);
+    }
+    return 0;
 }
 
 }  // namespace web

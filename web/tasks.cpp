@@ -82,7 +82,8 @@ void WaitForTurn(const std::string& id) {
     if (!tasks.Add(kQueue, id.c_str(), getpid())) {
         throw Failure(500, "The box cannot keep its list of copies.");
     }
-    switch (tool::WaitForTurn(kQueue, id, kAtOnce, [](int64_t) {}, pause)) {
+    switch (tool::WaitForTurn(
+        kQueue, id, kAtOnce, [](int64_t) {}, pause)) {
         case tool::Turn::kCame:
             return;
         case tool::Turn::kStopped:

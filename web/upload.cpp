@@ -97,8 +97,7 @@ class Relay {
         Shared().current = form.read;
         const std::string uri = connection_.Uri(path_);
         if (!Cloud::RelayUploadInit(cloud.get(), uri.c_str(), &Shared(), form.boundary.c_str(),
-                                    nullptr, StopWatch::IsAsked, nullptr, &Shared().moved,
-                                    size_) ||
+                                    nullptr, StopWatch::IsAsked, nullptr, &Shared().moved, size_) ||
             !Cloud::RelayUploadFile()) {
             throw FailureOf(Sentence(cloud->GetErrorCode()), cloud->GetErrorCode());
         }

@@ -65,8 +65,8 @@ uint32_t DosTime(int64_t seconds) {
     }
     const auto date = static_cast<uint32_t>(std::min(parts.tm_year - 80, 127) << 9 |
                                             (parts.tm_mon + 1) << 5 | parts.tm_mday);
-    const auto time = static_cast<uint32_t>(parts.tm_hour << 11 | parts.tm_min << 5 |
-                                            parts.tm_sec / 2);
+    const auto time =
+        static_cast<uint32_t>(parts.tm_hour << 11 | parts.tm_min << 5 | parts.tm_sec / 2);
     return date << 16 | time;
 }
 

@@ -5,7 +5,7 @@ import signal
 import subprocess
 import zipfile
 
-from page import CLOUDS, PageTest, REMOTE, SERVER, noise, read, write
+from page import CLOUDS, PageTest, REMOTE, SERVER, noise, post, read, write
 
 
 def pid_of_dropbox():
@@ -56,14 +56,10 @@ class Copy(PageTest):
     def test_a_copy_goes_on_without_the_page_is_found_again_and_cancelled(self):
         b = self.browser
         pid = pid_of_dropbox()
-        self.open(SERVER, "/copy")
         os.kill(pid, signal.SIGSTOP)
         try:
-            b.run("""const body = { from: { connection: arguments[0], paths: ['/copy/one.bin'] },
-                    to: { connection: arguments[1], path: '/' } };
-                return fetch('/files/api/copy', { method: 'POST', body: JSON.stringify(body),
-                    headers: { 'X-Zyrovfs-Request': '1' } }).then((answer) => answer.status)""",
-                  SERVER, CLOUDS["dropbox"])
+            post("copy", **{"from": {"connection": SERVER, "paths": ["/copy/one.bin"]},
+                            "to": {"connection": CLOUDS["dropbox"], "path": "/"}})
             self.open()
             b.wait("return document.querySelector('#copies [data-state=running]')")
             b.click("#copies [aria-label^=Cancel]")

@@ -94,8 +94,8 @@ TEST_F(WebConnect, TheCatalogueComesWithAFormForEachProtocol) {
 }
 
 TEST_F(WebConnect, ServersOfEachProtocolAreAddedByTheFormAndBrowsed) {
-    for (const Json::Value& form : {Dav(), Form("sftp", "127.0.0.1", 2222),
-                                    Form("ftp", "127.0.0.1", 2121)}) {
+    for (const Json::Value& form :
+         {Dav(), Form("sftp", "127.0.0.1", 2222), Form("ftp", "127.0.0.1", 2121)}) {
         const Answer added = Post("add", form);
         ASSERT_EQ(added.status, 200) << added.body << form;
         const std::string id = added.Json()["connection"].asString();
@@ -172,9 +172,10 @@ TEST_F(WebConnect, AFormThatIsNotFilledInIsRefused) {
 }
 
 TEST_F(WebConnect, ACertificateThatNobodyKnowsIsForThePersonToDecide) {
-    Must("openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:P-256 -nodes -days 2 -subj "
-         "/CN=stranger -addext subjectAltName=DNS:localhost -keyout /srv/tls/x.key "
-         "-out /srv/tls/x.crt 2>/dev/null; cat /srv/tls/x.key /srv/tls/x.crt >/srv/tls/server.pem");
+    Must(
+        "openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:P-256 -nodes -days 2 -subj "
+        "/CN=stranger -addext subjectAltName=DNS:localhost -keyout /srv/tls/x.key "
+        "-out /srv/tls/x.crt 2>/dev/null; cat /srv/tls/x.key /srv/tls/x.crt >/srv/tls/server.pem");
     machine::Remote("restart dav");
     const Answer asked = Post("add", Form("davs", "localhost", 8443));
     EXPECT_EQ(asked.status, 409) << asked.body;
@@ -202,9 +203,10 @@ TEST_F(WebConnect, ACertificateThatNobodyKnowsIsForThePersonToDecide) {
 
 TEST_F(WebConnect, SavedProfilesAreOfferedAndConnectedByTheirId) {
     std::ofstream("/run/secret") << kPassword << '\n';
-    Must(BuildDir() + "/tools/zyrovfs/zyrovfs profile add --user amy --protocol dav --hostname "
-                      "127.0.0.1 --port 8080 --account remo --alias Saved --password-file "
-                      "/run/secret");
+    Must(BuildDir() +
+         "/tools/zyrovfs/zyrovfs profile add --user amy --protocol dav --hostname "
+         "127.0.0.1 --port 8080 --account remo --alias Saved --password-file "
+         "/run/secret");
     const Json::Value offered = Ask(kAmyIs, Api("profiles")).Json()["profiles"];
     ASSERT_EQ(offered.size(), 1U) << offered;
     EXPECT_EQ(offered[0]["service"], "dav");

@@ -1,5 +1,5 @@
-// The web layer behind lighttpd: the program is started by the web server's own account and acts for
-// the user, on a real WebDAV server and the user's tree.
+// The web layer behind lighttpd: the program is started by the web server's own account and acts
+// for the user, on a real WebDAV server and the user's tree.
 #include <gmock/gmock.h>
 
 #include "support/vfs_cloud_remote.h"

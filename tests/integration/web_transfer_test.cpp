@@ -132,8 +132,7 @@ TEST(WebTransfer, ProgressIsTheOwnersAndIdsAreChecked) {
     ASSERT_TRUE(Reaches(id, "done"));
     EXPECT_EQ(Progress(id, "-u ben:b").status, 404);
     EXPECT_EQ(Progress("0000000000000000").status, 404);
-    for (const char* odd : {"short", "..%2F..%2F..%2Fetc%2Fpasswd", "0123456789abcdef%2F",
-                            ""}) {
+    for (const char* odd : {"short", "..%2F..%2F..%2Fetc%2Fpasswd", "0123456789abcdef%2F", ""}) {
         EXPECT_EQ(Progress(odd).status, 422) << odd;
     }
     EXPECT_EQ(Progress(std::string(65, 'a')).status, 422);
@@ -154,10 +153,10 @@ TEST(WebTransfer, RecordsOfWhatHasEndedMakeRoomForMore) {
     std::ofstream("/run/source") << "x";
     for (int i = 0; i < 70; ++i) {
         const std::string id = "many-" + std::to_string(100000000000 + i);
-        ASSERT_EQ(Ask(kOurs + " -F 'file=@/run/source'",
-                      At("upload", "/many.txt") + "&size=1&id=" + id)
-                      .status,
-                  200)
+        ASSERT_EQ(
+            Ask(kOurs + " -F 'file=@/run/source'", At("upload", "/many.txt") + "&size=1&id=" + id)
+                .status,
+            200)
             << i;
     }
     EXPECT_LE(std::stoi(Must("ls /run/zyrovfs/web/4001/upload | wc -l")), 64);
@@ -169,16 +168,15 @@ TEST(WebTransfer, RecordsOfWhatHasEndedMakeRoomForMore) {
 TEST(WebTransfer, TheHeadOfAFileTellsItsSizeWithoutItsBytes) {
     const Answer head = Ask(std::string(kAmyIs) + " -I", At("download", "/hello.txt"));
     EXPECT_EQ(head.status, 200);
-    EXPECT_THAT(head.head, AllOf(HasSubstr("Content-Length: 27"),
-                                 HasSubstr("Accept-Ranges: bytes")));
+    EXPECT_THAT(head.head,
+                AllOf(HasSubstr("Content-Length: 27"), HasSubstr("Accept-Ranges: bytes")));
     EXPECT_EQ(Ask(std::string(kAmyIs) + " -I", At("download", "/nothing")).status, 404);
 }
 
 TEST(WebTransfer, OneByteComesAlone) {
     for (const auto& [range, byte] :
          {std::pair{"0-0", "h"}, {"4-4", "o"}, {"25-25", "e"}, {"-1", "\n"}, {"26-", "\n"}}) {
-        const Answer part =
-            Ask(std::string(kAmyIs) + " -r " + range, At("download", "/hello.txt"));
+        const Answer part = Ask(std::string(kAmyIs) + " -r " + range, At("download", "/hello.txt"));
         EXPECT_EQ(part.status, 206) << range;
         EXPECT_EQ(part.body, byte) << range;
     }
@@ -197,7 +195,8 @@ TEST(WebTransfer, OnlyWhatABrowserNeverRunsIsShownInItsPlace) {
         const Answer shown = Ask(kAmyIs, At("download", std::string("/") + name) + "&view=1");
         const bool runs = std::string(type) == "application/octet-stream";
         EXPECT_THAT(shown.head, HasSubstr(std::string("Content-Type: ") + type)) << name;
-        EXPECT_THAT(shown.head, HasSubstr(runs ? "Disposition: attachment" : "Disposition: inline"));
+        EXPECT_THAT(shown.head,
+                    HasSubstr(runs ? "Disposition: attachment" : "Disposition: inline"));
         EXPECT_THAT(shown.head, HasSubstr("nosniff"));
         EXPECT_THAT(shown.head, HasSubstr("sandbox"));
         fs::remove(kRemote + name);
@@ -213,7 +212,8 @@ class WebZip : public testing::Test {
         PutFile(kRemote + "zip/deep/grüße 😀.txt", "greetings");
         PutFile(kRemote + "zip/deep/er/back\\slash \"quoted\" 'x'.txt", "odd");
         Must("chown -R remo: /srv/remote/zip");
-        ASSERT_TRUE(Eventually([] { return Ask(kAmyIs, At("list", "/zip/deep/er")).status == 200; }));
+        ASSERT_TRUE(
+            Eventually([] { return Ask(kAmyIs, At("list", "/zip/deep/er")).status == 200; }));
     }
     static void TearDownTestSuite() { fs::remove_all(kRemote + "zip"); }
 };
@@ -226,9 +226,10 @@ TEST_F(WebZip, AFolderComesWithAllThatIsInItAsAnyUnzipperTakesIt) {
     Must("cp /run/body /run/whole.zip");
     EXPECT_EQ(machine::Run("unzip -t /run/whole.zip").status, 0)
         << machine::Run("unzip -t /run/whole.zip").output;
-    Must("rm -rf /run/unzipped; mkdir /run/unzipped; "
-         "python3 -c \"import zipfile; z = zipfile.ZipFile('/run/whole.zip'); "
-         "assert z.testzip() is None; z.extractall('/run/unzipped')\"");
+    Must(
+        "rm -rf /run/unzipped; mkdir /run/unzipped; "
+        "python3 -c \"import zipfile; z = zipfile.ZipFile('/run/whole.zip'); "
+        "assert z.testzip() is None; z.extractall('/run/unzipped')\"");
     const std::string at = "/run/unzipped/zip/";
     EXPECT_TRUE(machine::Read(at + "noise.bin") == Noise(3 << 20));
     EXPECT_EQ(machine::Read(at + "nothing"), "");
@@ -239,12 +240,13 @@ TEST_F(WebZip, AFolderComesWithAllThatIsInItAsAnyUnzipperTakesIt) {
 
 TEST_F(WebZip, AFileThatIsNotWhatWasAnnouncedBreaksTheAnswer) {
     // This server tells the length of a link for that of the file behind it.
-    Must("mkdir -p /srv/remote/lie; ln -s ../hello.txt /srv/remote/lie/link; "
-         "chown -Rh remo: /srv/remote/lie");
+    Must(
+        "mkdir -p /srv/remote/lie; ln -s ../hello.txt /srv/remote/lie/link; "
+        "chown -Rh remo: /srv/remote/lie");
     ASSERT_TRUE(Eventually([] { return Ask(kAmyIs, At("list", "/lie")).status == 200; }));
-    const machine::Outcome outcome = machine::Run("curl -s -o /run/body -w '%{http_code}' " +
-                                                  std::string(kAmyIs) + " '" + At("zip", "/lie") +
-                                                  "'");
+    const machine::Outcome outcome =
+        machine::Run("curl -s -o /run/body -w '%{http_code}' " + std::string(kAmyIs) + " '" +
+                     At("zip", "/lie") + "'");
     constexpr int kPartialFile = 18;
     EXPECT_EQ(outcome.status, kPartialFile) << "curl tells a broken answer so";
     EXPECT_EQ(outcome.output, "200");
@@ -254,12 +256,12 @@ TEST_F(WebZip, AFileThatIsNotWhatWasAnnouncedBreaksTheAnswer) {
 }
 
 TEST_F(WebZip, ASelectionComesUnderTheNamesThatItHas) {
-    const Answer zip =
-        Ask(kAmyIs, At("zip", "/zip/noise.bin") + "&path=" + Escaped("/zip/deep"));
+    const Answer zip = Ask(kAmyIs, At("zip", "/zip/noise.bin") + "&path=" + Escaped("/zip/deep"));
     ASSERT_EQ(zip.status, 200) << zip.body;
     EXPECT_THAT(zip.head, HasSubstr("filename*=UTF-8''zip.zip"));
     const std::string list = Must("unzip -Z1 -UU /run/body");
-    EXPECT_THAT(list, AllOf(HasSubstr("noise.bin\n"), HasSubstr("deep/er/"), Not(HasSubstr("zip/"))));
+    EXPECT_THAT(list,
+                AllOf(HasSubstr("noise.bin\n"), HasSubstr("deep/er/"), Not(HasSubstr("zip/"))));
 }
 
 TEST_F(WebZip, ItsHeadTellsItsSize) {

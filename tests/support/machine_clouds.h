@@ -94,6 +94,8 @@ class Clouds : public testing::Environment {
     }
 
     std::vector<Place> places;
+    /** Where Google's backend shows the account's root. */
+    std::string google_top;
 
   private:
     static void Configure(const Json::Value& hosts) {
@@ -108,8 +110,8 @@ class Clouds : public testing::Environment {
         Place place{protocol, std::move(service), nullptr, nullptr};
         place.account = &place.service->AddAccount("amy@example.com", "Amy");
         place.account->SetQuota(50 * kMiB);
-        place.tree = std::make_unique<cloudsim::MountedAccount>(*place.service, *place.account,
-                                                                place.Folder());
+        place.tree = std::make_unique<cloudsim::MountedAccount>(
+            *place.service, *place.account, place.Folder(), protocol == "google" ? google_top : "");
         SignIn(place);
         Must(kTool + " cloud client add " + protocol + " client --password-file /tmp/secret");
         Must(kTool + " profile add --user amy --protocol " + protocol +

@@ -103,14 +103,14 @@ export async function addConnection() {
   const body = [
     ...(accounts.length ? [paragraph('Saved accounts'), element('ul', { className: 'choices' },
       ...accounts.map(([text, id]) => element('li', {}, element('button', {
-        type: 'submit', value: `profile:${id}`, formNoValidate: true, textContent: text }))))] : []),
+        type: 'button', textContent: text, onclick: (event) => event.target.form.accept(id) }))))] : []),
     ...(offered.length ? [field('Kind', kind), fields] : [])];
   const added = await ask({
     title: 'Add a connection',
     body,
     accept: offered.length ? 'Connect' : null,
     submit: async (value) => {
-      const wanted = value.startsWith('profile:') ? { profile: value.slice(8) } : collect();
+      const wanted = value === 'accept' ? collect() : { profile: value };
       result = await connectWith('add', wanted);
       return result;
     },

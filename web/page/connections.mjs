@@ -8,6 +8,9 @@ import { attempt } from './notices.mjs';
 const states = {
   connected: 'Connected', disconnected: 'Disconnected', unavailable: 'Not available' };
 
+const patience = 20;
+const pause = 250;  // milliseconds
+
 const gone = { disconnected: 'disconnected', unavailable: 'not available' };
 
 export class Connections {
@@ -52,7 +55,7 @@ export class Connections {
   async add() {
     const added = await attempt('Add a connection', addConnection);
     if (added) {
-      await this.#reloadAndGo(added.connection?.id ?? added.connection);
+      await this.#reloadAndGo(added.connection, true);
     }
   }
 
@@ -64,7 +67,7 @@ export class Connections {
       () => connectWith('connect', { connection: id }, { askPassword: true }));
     byId('connect').disabled = false;
     if (done) {
-      await this.#reloadAndGo(id);
+      await this.#reloadAndGo(id, true);
     }
   }
 
@@ -92,8 +95,15 @@ export class Connections {
     }
   }
 
-  async #reloadAndGo(id) {
-    await attempt('Connections', () => this.load());
+  /** With `made` the connection is there, but the box may take a moment to see its folder. */
+  async #reloadAndGo(id, made = false) {
+    for (let tries = made ? patience : 1; tries > 0; tries -= 1) {
+      await attempt('Connections', () => this.load());
+      if (!made || this.find(id)?.state === 'connected') {
+        break;
+      }
+      await new Promise((resolve) => { setTimeout(resolve, pause); });
+    }
     this.#go(id);
   }
 

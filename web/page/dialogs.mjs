@@ -34,7 +34,10 @@ export function ask({ title, body = [], accept = 'OK', danger = false, submit = 
     dialog.showModal();
     form.querySelector('[autofocus], input, select, .choices button')?.focus();
 
-    async function send(event) {
+    // For buttons in the body that are an answer by themselves; Enter is not theirs.
+    form.accept = accepted;
+
+    function send(event) {
       event.preventDefault();
       const missing = form.querySelector(':invalid:not(fieldset)');
       if (missing) {
@@ -43,11 +46,15 @@ export function ask({ title, body = [], accept = 'OK', danger = false, submit = 
         missing.focus();
         return;
       }
+      accepted(event.submitter?.value ?? 'accept');
+    }
+
+    async function accepted(value) {
       problem.textContent = '';
       form.setAttribute('aria-busy', 'true');
       buttons.querySelectorAll('[type=submit]').forEach((one) => { one.disabled = true; });
       try {
-        result = await submit(event.submitter?.value ?? 'accept');
+        result = await submit(value);
         dialog.close();
       } catch (error) {
         problem.textContent = sentences(error);

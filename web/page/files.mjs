@@ -213,6 +213,7 @@ export class Files {
       byId(id).disabled = many === 0;
     }
     byId('rename').disabled = many !== 1;
+    byId('tools').classList.toggle('for-chosen', many > 0);
     byId('chosen').textContent = many ? `${count(many, 'item')} chosen` : '';
   }
 }

@@ -38,7 +38,10 @@ void MountedAccount::Show(const std::string& path, const Item& item) {
 
 void MountedAccount::Refresh() {
     Items items;
-    Collect("", account_.Root(), items);
+    if (!top_.empty()) {
+        items[top_] = account_.Get(account_.Root());
+    }
+    Collect(top_, account_.Root(), items);
     Forget();
     for (const auto& [path, item] : shown_) {
         if (items.count(path) == 0) {

@@ -17,11 +17,10 @@ namespace cloudsim {
  */
 class MountedAccount {
   public:
-    MountedAccount(Service& service, const Account& account, const std::string& folder)
-        : service_(service), account_(account), tree_(folder) {
-        // Where a box shows the account below a folder of its own, that folder is the root.
-        tree_.Set("/", "id::file", account.Root());
-    }
+    /** `top` is the folder that stands for the account's root: "" is the tree's own. */
+    MountedAccount(Service& service, const Account& account, const std::string& folder,
+                   const std::string& top = "")
+        : service_(service), account_(account), tree_(folder), top_(top) {}
 
     /** Shows what has changed since, and again what a client asked to be forgotten. */
     void Refresh();
@@ -35,6 +34,7 @@ class MountedAccount {
     Service& service_;
     const Account& account_;
     XattrTree tree_;
+    const std::string top_;
     Items shown_;
     size_t writes_seen_ = 0;
 };

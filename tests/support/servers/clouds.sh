@@ -1,7 +1,8 @@
 # The simulated services, for the demo and the tests of the page. Debian has no gvfs backend for
 # clouds, so a simulator also shows the tree that one would mount, and the connection is recorded as
 # that mount would have left it. To be sourced; $build is the build tree, $tool the command line
-# tool, $user and $uid the box's user, and `eventually` and `zyrovfs` are the caller's.
+# tool, $user and $uid the box's user, $google_top the folder that a box shows the own files of a
+# Google account in (nothing: the tree is the account's), and `eventually` and `zyrovfs` are the caller's.
 cloud_conf=/usr/zyro/etc/zyrovfs/cloud.conf
 make_cloud_certificates() {
   "$build/tests/support/cloudsim/cloudsim" --make-tls /tmp/tls \
@@ -10,16 +11,13 @@ make_cloud_certificates() {
     mkdir -p /tmp/tokens /tmp/journal "/tmp/clouds/$(cloud_top google)" \
       /srv/{box,dropbox,google,onedrive}
 }
-# A box shows the own files of a Google account below a folder of their own; $google_top names it,
-# or nothing where the tree is to be the account's.
-cloud_top() { if [ "$1" = google ]; then echo "google/${google_top:-}"; else echo "$1"; fi; }
 # start_cloud NAME PORT OPTION...
 start_cloud() {
   local name=$1 port=$2
   shift 2
   "$build/tests/support/cloudsim/cloudsim" --$name --tls /tmp/tls/cert.pem /tmp/tls/key.pem \
     --port $port --client demo:demo-secret --account amy@example.com --name Amy \
-    --serve /srv/$name --mount "/tmp/clouds/$(cloud_top $name)" --tokens /tmp/tokens/$name \
+    --serve /srv/$name --mount /tmp/clouds/$name --tokens /tmp/tokens/$name \
     --journal /tmp/journal/$name "$@" >/tmp/$name-out 2>&1 &
   eventually grep -x ready /tmp/$name-out
 }
@@ -27,7 +25,8 @@ start_cloud() {
 start_clouds() {
   make_cloud_certificates &&
     start_cloud box 8444 --token-life "$1" && start_cloud dropbox 8445 &&
-    start_cloud google 8446 && start_cloud onedrive 8447 || return
+    start_cloud google 8446 ${google_top:+--mount-top "$google_top"} &&
+    start_cloud onedrive 8447 || return
   cat >$cloud_conf <<-END
 	{"hosts": {"BoxApiHost": "https://localhost:8444",
 	  "BoxUploadHost": "https://upload.localhost:8444",
