@@ -1,5 +1,4 @@
 // A selection and whole folders as one ZIP, made while it is sent.
-#include <unistd.h>
 #include <zyrovfs/error.h>
 
 #include <set>

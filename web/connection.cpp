@@ -57,4 +57,8 @@ std::unique_ptr<Tree> Connection::Files() const {
         id_, id.isConvertibleTo(Json::stringValue) ? id.asString() : "", Member("path"));
 }
 
+std::unique_ptr<Tree> Connection::BeforeUpload() const {
+    return Member("protocol") == "box" ? Files() : std::make_unique<MountedTree>(Member("path"));
+}
+
 }  // namespace web

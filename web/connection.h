@@ -27,6 +27,9 @@ class Connection {
     std::unique_ptr<ZYROCloud::Cloud> Driver() const;
     /** The service's own for a cloud, the user's mounted tree for all else. */
     std::unique_ptr<Tree> Files() const;
+    /** Who knows what an upload would replace: the mounted tree, which costs little; the service
+     * itself where a file takes the place of a folder with all that is in it. */
+    std::unique_ptr<Tree> BeforeUpload() const;
 
   private:
     std::string Member(const char* key) const;

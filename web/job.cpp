@@ -9,6 +9,7 @@
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <cerrno>
 #include <cstring>
 #include <ctime>
@@ -191,7 +192,8 @@ bool Job::IsCancelAsked() const {
 void Job::End(JobState state) {
     record_->counting = 0;
     record_->ended = time(nullptr);
-    __atomic_store_n(&record_->state, state, __ATOMIC_RELEASE);
+    std::atomic_thread_fence(std::memory_order_release);
+    record_->state = state;
 }
 
 void Job::Succeed() {

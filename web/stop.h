@@ -20,8 +20,8 @@ class StopWatch {
 
     /** As the transfer engine asks: anything but 0 stops. */
     static int IsAsked();
-    /** For a download into standard output, which is asked for its speed alone: when a stop is asked
-     * for, what follows finds no room there. Answers that there is no limit. */
+    /** For a download into standard output, which is asked for its speed alone: when a stop is
+     * asked for, what follows finds no room there. Answers that there is no limit. */
     static long long NoLimit(unsigned long long chunk, unsigned long long done);
 };
 

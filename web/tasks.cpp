@@ -6,6 +6,7 @@
 #include <zyrovfs/task_turn.h>
 
 #include <algorithm>
+#include <cstring>
 #include <ctime>
 #include <string>
 

@@ -31,10 +31,9 @@ long long ReadSize(const std::string& text) {
     return size;
 }
 
-/** A service may put a file in the place of a folder, with all that is in it. */
 void RefuseFolder(const Connection& connection, const std::string& path) {
     try {
-        if (!connection.Files()->Look(path).folder) {
+        if (!connection.BeforeUpload()->Look(path).folder) {
             return;
         }
     } catch (const Failure& failure) {

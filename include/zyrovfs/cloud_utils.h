@@ -1,4 +1,5 @@
-/** Making drivers, text helpers that they share, and the OAuth clients that they renew with. */
+/** Making drivers, text helpers that they share, logging in, and the OAuth clients that tokens are
+ * made and renewed with. */
 #ifndef ZYROVFS_CLOUD_UTILS_H
 #define ZYROVFS_CLOUD_UTILS_H
 
@@ -46,6 +47,44 @@ ZYROVFS_API _tag_cloud_type GetCloudTypeFromURI(const std::string& uri);
 /** A backslash in front of each quote. A backslash of the text itself stays single. */
 ZYROVFS_API std::string EscapeSingleQuote(const std::string& text);
 ZYROVFS_API std::string EscapeDoubleQuote(const std::string& text);
+
+// --- logging in ---------------------------------------------------------------------------------
+
+/** A login that has begun. Whoever ends it needs all of it; `verifier` is a secret. */
+struct Login {
+    std::string service;
+    std::string client_id;
+    std::string redirect_uri;
+    std::string state;
+    std::string verifier;
+    std::string address;  ///< to be opened in a browser: the service's own page
+};
+
+/**
+ * Begins to get tokens for an account of `service` ("box", "dropbox", "google", "onedrive"): an
+ * authorization code with PKCE. `client_id` is one of those that AddClient has stored; empty for
+ * the only one, and for OneDrive, whose renewals know one client alone. The service sends the
+ * browser to `redirect_uri`, which must be registered with the client. VFS_ERR_BAD_PARAM for an
+ * unknown service or client, VFS_ERR_CONFIG_READ, VFS_ERR_FAILED.
+ */
+ZYROVFS_API bool BeginLogin(const std::string& service, const std::string& client_id,
+                            const std::string& redirect_uri, Login& out);
+
+/** Why a login did not end well, in the service's words; both may be empty. */
+struct LoginRefusal {
+    std::string error;  ///< a word of RFC 6749, such as "access_denied"
+    std::string description;
+};
+
+/**
+ * Ends it. `answer` is where the service sent the browser: the whole address, or what follows its
+ * question mark. `profile` becomes what Server::Add wants for a saved profile, tokens in plain
+ * text. Needs Cloud::InitCurlGlobal. VFS_ERR_BAD_PARAM for what is no answer to this login, and
+ * nothing is sent then; VFS_ERR_ACCESS_DENIED for a person who refused; the code of a request that
+ * failed; VFS_ERR_CLOUD_FAILED for an answer without tokens.
+ */
+ZYROVFS_API bool FinishLogin(const Login& login, const std::string& answer, Json::Value& profile,
+                             LoginRefusal& refusal);
 
 // --- OAuth clients of this installation ---------------------------------------------------------
 

@@ -91,8 +91,10 @@ struct Host {
 };
 constexpr Host kBoxApi = {"BoxApiHost", "https://api.box.com"};
 constexpr Host kBoxUpload = {"BoxUploadHost", "https://upload.box.com"};
+constexpr Host kBoxAccount = {"BoxAccountHost", "https://account.box.com"};
 constexpr Host kDropboxApi = {"DropboxApiHost", "https://api.dropboxapi.com"};
 constexpr Host kDropboxContent = {"DropboxContentHost", "https://content.dropboxapi.com"};
+constexpr Host kDropboxWeb = {"DropboxWebHost", "https://www.dropbox.com"};
 constexpr Host kGoogleApi = {"GoogleApiHost", "https://www.googleapis.com"};
 constexpr Host kGoogleAccounts = {"GoogleAccountsHost", "https://accounts.google.com"};
 constexpr Host kLiveApi = {"LiveApiHost", "https://apis.live.net"};
@@ -159,12 +161,20 @@ std::string BoxUploadHost() {
     return Configured(kBoxUpload, TakeBase);
 }
 
+std::string BoxAccountHost() {
+    return Configured(kBoxAccount, TakeBase);
+}
+
 std::string DropboxApiHost() {
     return Configured(kDropboxApi, TakeBase);
 }
 
 std::string DropboxContentHost() {
     return Configured(kDropboxContent, TakeBase);
+}
+
+std::string DropboxWebHost() {
+    return Configured(kDropboxWeb, TakeBase);
 }
 
 std::string GoogleApiHost() {

@@ -17,8 +17,10 @@ namespace ZYROCloud {
  */
 std::string BoxApiHost();
 std::string BoxUploadHost();
+std::string BoxAccountHost();
 std::string DropboxApiHost();
 std::string DropboxContentHost();
+std::string DropboxWebHost();
 std::string GoogleApiHost();
 std::string GoogleAccountsHost();
 std::string LiveApiHost();

@@ -106,7 +106,7 @@ TEST(ToolClouds, WhenAGrantWasTakenBackTheWayOutIsTold) {
         place.account->RevokeRefreshTokens();
         const Outcome refused = ForAmy("account " + place.Id());
         EXPECT_EQ(refused.status, 1);
-        EXPECT_THAT(refused.output, HasSubstr("zyrovfs profile set")) << refused.output;
+        EXPECT_THAT(refused.output, HasSubstr("zyrovfs login")) << refused.output;
         Clouds::SignIn(place);
         const Outcome saved =
             ForAmy("profile set " + place.Id() +

@@ -179,8 +179,8 @@ TEST_P(WebServer, WithoutRoomInTmpAndVarFilesGoThrough) {
     fs::remove(kRemote + "through.bin");
 }
 
-INSTANTIATE_TEST_SUITE_P(Each, WebServer, testing::Values(kLighttpd, kNginx), [](const auto& info) {
-    return info.param == kLighttpd ? "lighttpd" : "nginx";
+INSTANTIATE_TEST_SUITE_P(Each, WebServer, testing::Values(kLighttpd, kNginx), [](const auto& row) {
+    return row.param == kLighttpd ? "lighttpd" : "nginx";
 });
 
 }  // namespace

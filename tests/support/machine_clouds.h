@@ -62,8 +62,10 @@ class Clouds : public testing::Environment {
         Json::Value hosts;
         hosts["BoxApiHost"] = box->ApiHost();
         hosts["BoxUploadHost"] = box->UploadHost();
+        hosts["BoxAccountHost"] = box->AccountHost();
         hosts["DropboxApiHost"] = dropbox->ApiHost();
         hosts["DropboxContentHost"] = dropbox->ContentHost();
+        hosts["DropboxWebHost"] = dropbox->WebHost();
         hosts["GoogleApiHost"] = google->ApiHost();
         hosts["GoogleAccountsHost"] = google->AccountsHost();
         hosts["LiveApiHost"] = onedrive->ApiHost();

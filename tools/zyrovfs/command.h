@@ -51,6 +51,7 @@ void AddUserCommands(CLI::App& app, Session& session);
 void AddTransferCommands(CLI::App& app, Session& session);
 void AddAccountCommand(CLI::App& app, Session& session);
 void AddCloudCommands(CLI::App& app, Session& session);
+void AddLoginCommand(CLI::App& app, Session& session);
 void AddTaskCommands(CLI::App& app, Session& session);
 void AddPolicyCommands(CLI::App& app, Session& session);
 void AddHostCommands(CLI::App& app, Session& session);

@@ -20,6 +20,7 @@ int Main(int argc, char** argv) {
     AddTransferCommands(app, session);
     AddAccountCommand(app, session);
     AddCloudCommands(app, session);
+    AddLoginCommand(app, session);
     AddUserCommands(app, session);
     AddTaskCommands(app, session);
     AddPolicyCommands(app, session);

@@ -78,12 +78,12 @@ void PrintCode(const std::string& what, __tag_vfs_err_ code) {
 void PrintAdvice(__tag_vfs_err_ code) {
     if (code == VFS_ERR_TOKEN_REVOKED) {
         std::cerr << "The service has taken back what it granted: the owner withdrew it, changed "
-                     "the password, or did not use it for long. Sign in at the service again and "
-                     "save the new tokens with `zyrovfs profile set ID --access-token-file FILE "
-                     "--refresh-token-file FILE --expires-in SECONDS`.\n";
+                     "the password, or did not use it for long. Sign in again with "
+                     "`zyrovfs login SERVICE --again ID`.\n";
     } else if (code == VFS_ERR_UNAUTHORIZED) {
-        std::cerr << "The account no longer lets this connection in. Give it new tokens or a new "
-                     "password with `zyrovfs profile set`.\n";
+        std::cerr << "The account no longer lets this connection in. Sign in again with `zyrovfs "
+                     "login SERVICE --again ID`, or give it a new password with `zyrovfs profile "
+                     "set`.\n";
     }
 }
 

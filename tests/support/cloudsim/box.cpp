@@ -63,6 +63,9 @@ std::string BoxService::Role(const Request& request) const {
 }
 
 std::unique_ptr<Handler> BoxService::Begin(Request& request) {
+    if (request.path == "/api/oauth2/authorize") {
+        return Consent(request);
+    }
     const std::string role = Role(request);
     const std::vector<std::string> path = request.Segments();
     const bool token = (role == kApi && request.path == "/oauth2/token") ||

@@ -40,6 +40,8 @@ class BoxService : public Service {
     std::string ApiHost() const { return Address(box_options_.api_name); }
     std::string UploadHost() const { return Address(box_options_.upload_name); }
     std::string DownloadHost() const { return Address(box_options_.download_name); }
+    /** Where a person logs in, at the service "account.box.com". */
+    std::string AccountHost() const { return ApiHost(); }
     std::string TokenUrl() const { return ApiHost() + "/oauth2/token"; }
 
     std::map<std::string, std::string> Attributes(const Account& account,

@@ -18,14 +18,21 @@ Reply TokenError(const char* error, const char* description) {
 Reply BoxService::Token(const std::string& text) {
     Request form;
     form.query = ParseForm(text);
-    if (form.Query("grant_type") != "refresh_token" || !form.HasQuery("refresh_token")) {
+    const bool by_code = form.Query("grant_type") == "authorization_code" && form.HasQuery("code");
+    const bool by_token =
+        form.Query("grant_type") == "refresh_token" && form.HasQuery("refresh_token");
+    if (!by_code && !by_token) {
         return TokenError("invalid_request", "Invalid grant_type parameter or parameter missing");
     }
     if (!tokens_.IsClient(form.Query("client_id"), form.Query("client_secret"))) {
         return TokenError("invalid_client", "The client credentials are invalid");
     }
     Tokens tokens;
-    if (!tokens_.Refresh(form.Query("refresh_token"), form.Query("client_id"), tokens)) {
+    const std::string client = form.Query("client_id");
+    if (by_code && !TakeCode(form, client, tokens)) {
+        return TokenError("invalid_grant", "The authorization code has expired");
+    }
+    if (by_token && !tokens_.Refresh(form.Query("refresh_token"), client, tokens)) {
         return TokenError("invalid_grant", "Invalid refresh token");
     }
     Json::Value body;

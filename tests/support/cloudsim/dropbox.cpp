@@ -109,6 +109,9 @@ std::string Dropbox::Role(const Request& request) const {
 }
 
 std::unique_ptr<Handler> Dropbox::Begin(Request& request) {
+    if (request.path == "/oauth2/authorize") {
+        return Consent(request);
+    }
     const std::string role = Role(request);
     if (role != kContent && IsTokenPath(request.path)) {
         return request.method != "POST" ? Ready(Reply(405).With("Allow", "POST"))

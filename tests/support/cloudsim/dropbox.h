@@ -47,6 +47,8 @@ class Dropbox : public Service {
     /** "https://localhost:PORT" and so on, without a slash at the end. */
     std::string ApiHost() const { return Address(dropbox_options_.api_name); }
     std::string ContentHost() const { return Address(dropbox_options_.content_name); }
+    /** Where a person logs in, at the service "www.dropbox.com". */
+    std::string WebHost() const { return ApiHost(); }
     std::string TokenUrl() const { return ApiHost() + "/oauth2/token"; }
 
     /** For so long, by the service's clock, every function answers 429. */

@@ -15,6 +15,17 @@ Reply TokenError(int status, const char* error, const char* description) {
     return JsonReply(status, body);
 }
 
+Reply TokenAnswer(const Tokens& tokens, bool with_refresh_token = false) {
+    Json::Value body;
+    body["access_token"] = tokens.access_token;
+    body["token_type"] = "bearer";
+    body["expires_in"] = Json::Int64(tokens.expires_in);
+    if (with_refresh_token) {
+        body["refresh_token"] = tokens.refresh_token;
+    }
+    return JsonReply(200, body).With("Cache-Control", "no-store");
+}
+
 struct Credentials {
     std::string id, secret;
 };
@@ -49,26 +60,25 @@ Reply Dropbox::Token(const Request& request, const std::string& text) {
     if (!tokens_.IsClient(client.id, client.secret)) {
         return TokenError(401, "invalid_client", "Invalid client_id or client_secret");
     }
+    Tokens tokens;
+    if (form.Query("grant_type") == "authorization_code") {
+        // A refresh token comes only to those who asked for one on the page.
+        return TakeCode(form, client.id, tokens)
+                   ? TokenAnswer(tokens)
+                   : TokenError(400, "invalid_grant", "code doesn't exist or has expired");
+    }
     if (form.Query("grant_type") != "refresh_token") {
         return TokenError(400, "unsupported_grant_type", "grant_type is not supported");
     }
     if (!form.HasQuery("refresh_token")) {
         return TokenError(400, "invalid_request", "missing required field \"refresh_token\"");
     }
-    Tokens tokens;
     const std::string old = form.Query("refresh_token");
     if (!tokens_.Refresh(old, client.id, tokens)) {
         return TokenError(400, "invalid_grant", "refresh token is invalid or revoked");
     }
-    Json::Value body;
-    body["access_token"] = tokens.access_token;
-    body["token_type"] = "bearer";
-    body["expires_in"] = Json::Int64(tokens.expires_in);
     // One that stays good isn't told again.
-    if (tokens.refresh_token != old) {
-        body["refresh_token"] = tokens.refresh_token;
-    }
-    return JsonReply(200, body).With("Cache-Control", "no-store");
+    return TokenAnswer(tokens, tokens.refresh_token != old);
 }
 
 Account* Dropbox::Authorize(Request& request) {

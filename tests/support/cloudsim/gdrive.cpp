@@ -70,6 +70,9 @@ std::string GDrive::Role(const Request& request) const {
 }
 
 std::unique_ptr<Handler> GDrive::Begin(Request& request) {
+    if (request.path == "/o/oauth2/v2/auth") {
+        return Consent(request);
+    }
     const std::string role = Role(request);
     const std::vector<std::string> path = request.Segments();
     if (role == kAccount) {

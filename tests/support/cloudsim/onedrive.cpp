@@ -137,6 +137,9 @@ std::string OneDrive::Role(const Request& request) const {
 }
 
 std::unique_ptr<Handler> OneDrive::Begin(Request& request) {
+    if (request.path == "/oauth20_authorize.srf") {
+        return Consent(request);
+    }
     const std::string role = Role(request);
     if (role == kLogin) {
         return BeginLogin(request);

@@ -7,7 +7,7 @@
 namespace cloudsim {
 namespace {
 
-Reply TokenError(const char* error, const char* description) {
+Reply TokenError(const char* error, const std::string& description) {
     Json::Value body;
     body["error"] = error;
     body["error_description"] = description;
@@ -24,13 +24,15 @@ Reply OneDrive::Token(const std::string& text) {
         return TokenError("invalid_request",
                           "The request must include the input parameter 'grant_type'.");
     }
-    if (form.Query("grant_type") != "refresh_token") {
+    const std::string grant = form.Query("grant_type");
+    const std::string needed = grant == "authorization_code" ? "code" : "refresh_token";
+    if (grant != "refresh_token" && grant != "authorization_code") {
         return TokenError("unsupported_grant_type",
                           "The provided value for the input parameter 'grant_type' is not valid.");
     }
-    if (!form.HasQuery("refresh_token")) {
+    if (!form.HasQuery(needed)) {
         return TokenError("invalid_request",
-                          "The request must include the input parameter 'refresh_token'.");
+                          "The request must include the input parameter '" + needed + "'.");
     }
     // A client that was given no secret sends none.
     if (!tokens_.IsClient(client, form.Query("client_secret"))) {
@@ -38,10 +40,10 @@ Reply OneDrive::Token(const std::string& text) {
                           "The client does not exist, or its secret is not the right one.");
     }
     Tokens tokens;
-    if (!tokens_.Refresh(form.Query("refresh_token"), client, tokens)) {
-        return TokenError("invalid_grant",
-                          "The provided value for the input parameter 'refresh_token' is not "
-                          "valid.");
+    if (grant == "authorization_code" ? !TakeCode(form, client, tokens)
+                                      : !tokens_.Refresh(form.Query(needed), client, tokens)) {
+        return TokenError("invalid_grant", "The provided value for the input parameter '" + needed +
+                                               "' is not valid.");
     }
     Json::Value body;
     body["token_type"] = "bearer";

@@ -3,6 +3,8 @@
 #include <ctime>
 #include <stdexcept>
 
+#include "support/cloudsim/consent.h"
+
 namespace cloudsim {
 namespace {
 
@@ -44,6 +46,35 @@ Account& Service::AddAccount(const std::string& email, const std::string& name) 
         std::make_unique<Account>(*this, email, shown, AccountId(accounts_.size())));
     tree_.AddAccount(*accounts_.back());
     return *accounts_.back();
+}
+
+std::unique_ptr<Handler> Service::Consent(const Request& request) {
+    const ConsentRequest consent(request);
+    const std::string problem = consent.Problem(tokens_);
+    if (!problem.empty()) {
+        return Ready(Reply(400, problem, "text/plain; charset=UTF-8"));
+    }
+    if (request.method != "POST") {
+        std::vector<std::string> accounts;
+        const std::lock_guard<std::mutex> lock(mutex_);
+        for (const auto& account : accounts_) {
+            accounts.push_back(account->Email());
+        }
+        return Ready(ConsentPage(consent, accounts));
+    }
+    return Collect([this, consent](const std::string& text) {
+        Request form;
+        form.query = ParseForm(text);
+        const std::lock_guard<std::mutex> lock(mutex_);
+        for (const auto& account : accounts_) {
+            if (form.Query("decision") == "allow" && account->Email() == form.Query("account")) {
+                const std::string code = tokens_.IssueCode(
+                    *account, {consent.client, consent.redirect_uri, consent.challenge});
+                return Reply(302).With("Location", consent.Back({{"code", code}}));
+            }
+        }
+        return Reply(302).With("Location", consent.Back({{"error", "access_denied"}}));
+    });
 }
 
 std::string Service::AccountId(size_t index) const {

@@ -75,6 +75,14 @@ class Service {
     /** Id of the account that is the `index`th to be added. */
     virtual std::string AccountId(size_t index) const;
     std::unique_ptr<Sink> NewSink() const;
+    /** The page on which a person logs in: asked for by GET, answered by POST. */
+    std::unique_ptr<Handler> Consent(const Request& request);
+    /** The end of such a login at the token endpoint. */
+    bool TakeCode(const Request& form, const std::string& client, Tokens& tokens) {
+        return tokens_.Exchange(form.Query("code"),
+                                {client, form.Query("redirect_uri"), form.Query("code_verifier")},
+                                tokens);
+    }
 
     const ServerOptions options_;
     std::atomic<int64_t> ahead_{0};

@@ -1,11 +1,31 @@
 #include "support/cloudsim/tokens.h"
 
+#include <openssl/evp.h>
+
 #include "support/cloudsim/http.h"
 
 namespace cloudsim {
 namespace {
 
 constexpr int64_t kRefreshLife = 60 * 24 * 3600;
+constexpr int64_t kCodeLife = 60;
+
+/** SHA-256 in unpadded base64 for addresses. */
+std::string S256(const std::string& verifier) {
+    unsigned char digest[EVP_MAX_MD_SIZE];
+    unsigned int length = 0;
+    EVP_Digest(verifier.data(), verifier.size(), digest, &length, EVP_sha256(), nullptr);
+    static constexpr char kAlphabet[] =
+        "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789-_";
+    std::string text;
+    for (unsigned int bit = 0; bit < length * 8; bit += 6) {
+        const unsigned int at = bit / 8;
+        const unsigned int next = at + 1 < length ? digest[at + 1] : 0;
+        const unsigned int both = digest[at] * 256U + next;
+        text += kAlphabet[both >> (10 - bit % 8) & 63];
+    }
+    return text;
+}
 
 }  // namespace
 
@@ -24,6 +44,11 @@ bool TokenStore::IsClient(const std::string& id, const std::string& secret) cons
     }
     const auto found = clients_.find(id);
     return found != clients_.end() && found->second == secret;
+}
+
+bool TokenStore::IsClientId(const std::string& id) const {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    return clients_.empty() ? id == "client" : clients_.count(id) != 0;
 }
 
 std::string TokenStore::FirstClient() const {
@@ -46,6 +71,32 @@ Tokens TokenStore::Issue(Account& account, const std::string& client, int64_t to
     const std::string of = client.empty() ? FirstClient() : client;
     const std::lock_guard<std::mutex> lock(mutex_);
     return Make(account, of, token_life);
+}
+
+std::string TokenStore::IssueCode(Account& account, const CodeLogin& login) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    // Codes of one service have slashes in them.
+    const std::string code = "4/" + RandomText(40);
+    codes_[code] = {&account, login, now_() + kCodeLife};
+    return code;
+}
+
+bool TokenStore::Exchange(const std::string& code, const CodeLogin& login, Tokens& tokens) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    const auto found = codes_.find(code);
+    if (found == codes_.end()) {
+        return false;
+    }
+    const Code issued = found->second;
+    codes_.erase(found);
+    const bool proved =
+        issued.login.proof.empty() ? login.proof.empty() : S256(login.proof) == issued.login.proof;
+    if (issued.login.client != login.client || issued.login.redirect_uri != login.redirect_uri ||
+        !proved || issued.expires <= now_()) {
+        return false;
+    }
+    tokens = Make(*issued.account, login.client, life);
+    return true;
 }
 
 Tokens TokenStore::Last(const Account& account) const {

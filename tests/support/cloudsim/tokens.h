@@ -13,11 +13,20 @@
 
 namespace cloudsim {
 
+/** What binds a code to its login. */
+struct CodeLogin {
+    std::string client;
+    std::string redirect_uri;
+    /** The challenge for IssueCode, "" without one; the verifier for Exchange. */
+    std::string proof;
+};
+
 class TokenStore {
   public:
     explicit TokenStore(std::function<int64_t()> now) : now_(std::move(now)) {}
 
     void AddClient(const std::string& id, const std::string& secret);
+    bool IsClientId(const std::string& id) const;
     bool IsClient(const std::string& id, const std::string& secret) const;
     std::string FirstClient() const;
 
@@ -35,6 +44,11 @@ class TokenStore {
     /** False when the token isn't good for this client (any more). */
     bool Refresh(const std::string& refresh_token, const std::string& client, Tokens& tokens);
 
+    /** A code for whoever ends the login that `login` began. */
+    std::string IssueCode(Account& account, const CodeLogin& login);
+    /** False when the code is unknown, used, too old, or another login's; it is gone then, too. */
+    bool Exchange(const std::string& code, const CodeLogin& login, Tokens& tokens);
+
     std::atomic<int64_t> life{3600};
     std::atomic<bool> rotate{true};
 
@@ -42,6 +56,11 @@ class TokenStore {
     struct Grant {
         Account* account;
         std::string client;
+        int64_t expires;
+    };
+    struct Code {
+        Account* account;
+        CodeLogin login;
         int64_t expires;
     };
     using Grants = std::unordered_map<std::string, Grant>;
@@ -54,6 +73,7 @@ class TokenStore {
     std::string first_client_;
     Grants access_, refresh_;
     std::map<const Account*, Tokens> last_;
+    std::map<std::string, Code> codes_;
 };
 
 }  // namespace cloudsim

@@ -8,7 +8,7 @@ make_cloud_certificates() {
   "$build/tests/support/cloudsim/cloudsim" --make-tls /tmp/tls \
     {accounts,docs,content,login,public,cid-8c8ce076ca278000}.localhost &&
     cat /tmp/tls/ca.pem >>/etc/ssl/certs/ca-certificates.crt &&
-    mkdir -p /tmp/tokens /tmp/journal "/tmp/clouds/$(cloud_top google)" \
+    mkdir -p /tmp/journal "/tmp/clouds/$(cloud_top google)" \
       /srv/{box,dropbox,google,onedrive}
 }
 # start_cloud NAME PORT OPTION...
@@ -17,8 +17,7 @@ start_cloud() {
   shift 2
   "$build/tests/support/cloudsim/cloudsim" --$name --tls /tmp/tls/cert.pem /tmp/tls/key.pem \
     --port $port --client demo:demo-secret --account amy@example.com --name Amy \
-    --serve /srv/$name --mount /tmp/clouds/$name --tokens /tmp/tokens/$name \
-    --journal /tmp/journal/$name "$@" >/tmp/$name-out 2>&1 &
+    --serve /srv/$name --mount /tmp/clouds/$name --journal /tmp/journal/$name "$@" >/tmp/$name-out 2>&1 &
   eventually grep -x ready /tmp/$name-out
 }
 # start_clouds SECONDS: how long an access token of Box lives
@@ -29,9 +28,10 @@ start_clouds() {
     start_cloud onedrive 8447 || return
   cat >$cloud_conf <<-END
 	{"hosts": {"BoxApiHost": "https://localhost:8444",
-	  "BoxUploadHost": "https://upload.localhost:8444",
+	  "BoxUploadHost": "https://upload.localhost:8444", "BoxAccountHost": "https://localhost:8444",
 	  "DropboxApiHost": "https://localhost:8445",
 	  "DropboxContentHost": "https://content.localhost:8445",
+	  "DropboxWebHost": "https://localhost:8445",
 	  "GoogleApiHost": "https://localhost:8446",
 	  "GoogleAccountsHost": "https://accounts.localhost:8446",
 	  "LiveApiHost": "https://localhost:8447",
@@ -41,21 +41,21 @@ start_clouds() {
   chmod 640 $cloud_conf
   grep -hE '^(api|upload|content|accounts|login)=' /tmp/{box,dropbox,google,onedrive}-out
 }
-# token KIND NAME: the file with a token that the service has given
-token() {
-  sed "s/.*\"$1_token\": *\"\([^\"]*\)\".*/\1/" /tmp/tokens/$2 >/tmp/tokens/$2-$1
-  echo /tmp/tokens/$2-$1
+# sign_in NAME: at the service's own page, in a browser that this plays
+sign_in() {
+  local page
+  zyrovfs login $1 --port 0 </dev/null >/tmp/login-$1 2>&1 &
+  eventually grep -q '^  http' /tmp/login-$1 && page=$(sed -n 's/^  //p' /tmp/login-$1) &&
+    curl -sL --data account=amy@example.com --data decision=allow "$page" >/dev/null && wait $! &&
+    tail -n 3 /tmp/login-$1 | head -n 2
 }
-# save_account NAME SECONDS: what the tokens of an account are good for
 save_account() {
-  echo demo-secret | $tool cloud client add $1 demo --password-stdin &&
-    zyrovfs profile add --protocol $1 --client-id demo --expires-in $2 \
-      --access-token-file "$(token access $1)" --refresh-token-file "$(token refresh $1)"
+  echo demo-secret | $tool cloud client add $1 demo --password-stdin && sign_in $1
 }
-# save_accounts SECONDS: the same for Box; this takes the place of all live connections
+# What is saved takes the place of all live connections.
 save_accounts() {
-  save_account box "$1" && save_account dropbox 3600 && save_account google 3600 &&
-    save_account onedrive 3600 || return
+  local name
+  for name in box dropbox google onedrive; do save_account $name || return; done
   sed -E 's|"path":"","protocol":"([a-z]+)"|"path":"/tmp/clouds/\1","protocol":"\1"|g' \
     /usr/zyro/etc/zyrovfs/$uid/servers.conf >/var/tmp/zyrovfs/$uid/connect.conf
 }
