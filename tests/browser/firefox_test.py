@@ -1,5 +1,4 @@
 """The road up and down in the other browser."""
-import unittest
 
 from page import CLOUDS, PageTest, noise, read
 from webdriver import Firefox
@@ -26,5 +25,3 @@ class InFirefox(PageTest):
         self.assertEqual(read(b.downloaded("fox 🦊.bin")), read(source))
 
 
-if __name__ == "__main__":
-    unittest.main()

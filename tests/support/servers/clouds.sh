@@ -8,8 +8,7 @@ make_cloud_certificates() {
   "$build/tests/support/cloudsim/cloudsim" --make-tls /tmp/tls \
     {accounts,docs,content,login,public,cid-8c8ce076ca278000}.localhost &&
     cat /tmp/tls/ca.pem >>/etc/ssl/certs/ca-certificates.crt &&
-    mkdir -p /tmp/journal "/tmp/clouds/$(cloud_top google)" \
-      /srv/{box,dropbox,google,onedrive}
+    mkdir -p /tmp/journal /tmp/clouds /srv/{box,dropbox,google,onedrive}
 }
 # start_cloud NAME PORT OPTION...
 start_cloud() {
