@@ -78,7 +78,7 @@ class Transfer(PageTest):
             }).observe(document.body, { subtree: true, childList: true, characterData: true })""")
         self.drop("/tmp/source/many")
         b.wait("return document.querySelector('#uploads-sum').textContent.includes('10,101 uploads')")
-        self.assertGreater(b.run("return new Set(window.seen).size"), 1)
+        self.assertIn("files in", "".join(b.run("return window.seen")))
         self.assertLess(b.run("return document.querySelectorAll('.transfer').length"), 60)
         b.click("#cancel-uploads")
         b.wait("return document.querySelector('#cancel-uploads').hidden")
@@ -101,7 +101,7 @@ class Transfer(PageTest):
         self.open(SERVER, "/up/closed")
         b.type("#choose-files-input", source)
         b.wait("return document.querySelector('.transfer[data-state=failed] .detail').textContent.length > 20")
-        self.open_folder_in_page("/up")
+        self.go_up()
         self.assertTrue(b.run("return Boolean(document.querySelector('.transfer[data-state=failed]'))"))
         os.chmod(f"{REMOTE}/up/closed", 0o777)
         b.click("[aria-label^='Try again']")
@@ -110,7 +110,7 @@ class Transfer(PageTest):
         b.click("[aria-label^='Dismiss']")
         b.wait("return !document.querySelector('.transfer')")
 
-    def open_folder_in_page(self, path):
+    def go_up(self):
         self.browser.click(f"#crumbs li:nth-last-child(2) button")
         self.wait_for_folder()
 

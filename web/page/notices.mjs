@@ -7,7 +7,7 @@ const most = 6;
 /** `again` is offered as a button when there is a way to try once more. */
 export function showFailure(title, error, again = null) {
   const notice = element('div', { className: 'notice', role: 'alert' },
-    element('p', {}, element('strong', { textContent: title }), ' ', sentences(error)),
+    element('p', {}, element('strong', { textContent: `${title}:` }), ' ', sentences(error)),
     again && element('button', {
       textContent: 'Try again',
       onclick: () => {
