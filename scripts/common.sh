@@ -26,6 +26,10 @@ TEST_PACKAGES=(
   libgtest-dev libgmock-dev clang clang-tidy clang-format libclang-rt-14-dev python3
   man-db groff-base bsdextrautils rclone curl strace
 )
+# The page in its browsers, behind its web server.
+BROWSER_PACKAGES=(
+  chromium chromium-driver firefox-esr fonts-dejavu-core python3 curl lighttpd-mod-deflate socat
+)
 BENCH_PACKAGES=(libbenchmark-dev python3 libmicrohttpd-dev libgnutls28-dev libfuse3-dev nginx curl rclone)
 PACKAGE_PACKAGES=(debhelper lintian diffoscope-minimal abigail-tools autopkgtest xz-utils systemd)
 

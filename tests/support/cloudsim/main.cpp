@@ -40,6 +40,7 @@ not used), api, accounts and content of Google, api, login and content of OneDri
     --pattern NAME SIZE   one such file
     --quota BYTES         --max-upload BYTES
     --mount FOLDER        shows its names and ids there, as a mounted backend would
+    --mount-top NAME      below a folder of this name there
     --tokens FILE         the pair of tokens that it starts with, written there as JSON
   --client ID:SECRET    of the token endpoint (client:secret unless given)
   --token-life SECONDS  of all tokens given (3600)
@@ -57,7 +58,7 @@ not used), api, accounts and content of Google, api, login and content of OneDri
 )";
 
 struct AccountPlan {
-    std::string email, name, served, tokens, mounted;
+    std::string email, name, served, tokens, mounted, top;
     std::vector<std::pair<std::string, uint64_t>> patterns;
     size_t many = 0;
     uint64_t many_size = 0, quota = 0, max_upload = 0;
@@ -178,6 +179,7 @@ const std::map<std::string, Option>& AccountOptions() {
         {"--name", [](Plan& plan, Arguments& in) { LastAccount(plan).name = in.Word(); }},
         {"--serve", [](Plan& plan, Arguments& in) { LastAccount(plan).served = in.Word(); }},
         {"--mount", [](Plan& plan, Arguments& in) { LastAccount(plan).mounted = in.Word(); }},
+        {"--mount-top", [](Plan& plan, Arguments& in) { LastAccount(plan).top = "/" + in.Word(); }},
         {"--tokens", [](Plan& plan, Arguments& in) { LastAccount(plan).tokens = in.Word(); }},
         {"--many",
          [](Plan& plan, Arguments& in) {
@@ -320,8 +322,8 @@ int Serve(const Plan& plan) {
     for (const AccountPlan& account : plan.accounts) {
         const cloudsim::Account& made = Fill(service, account, plan.token_life);
         if (!account.mounted.empty()) {
-            mounted.push_back(
-                std::make_unique<cloudsim::MountedAccount>(service, made, account.mounted));
+            mounted.push_back(std::make_unique<cloudsim::MountedAccount>(
+                service, made, account.mounted, account.top));
             mounted.back()->Refresh();
         }
     }
