@@ -9,6 +9,7 @@
 #include <sys/socket.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <memory>
@@ -90,7 +91,9 @@ void Replay::Serve() {
         for (const Connection& each : open) {
             waiting.push_back({each.fd, POLLIN, 0});
         }
-        Check(poll(waiting.data(), waiting.size(), -1) > 0, "poll");
+        if (poll(waiting.data(), waiting.size(), -1) < 0 && errno == EINTR) {
+            continue;
+        }
         for (size_t i = open.size(); i > 0; --i) {
             if (waiting[i].revents != 0 && !Converse(open[i - 1])) {
                 close(open[i - 1].fd);
