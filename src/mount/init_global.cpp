@@ -17,6 +17,11 @@
 #include "zyrovfs/vfs.h"
 
 namespace ZYROVFS {
+
+bool IsAnyDaemonDead() {
+    return DBUS::CheckDaemonDied() || GVFSD::CheckDaemonDied() || GVFSD_FUSE::CheckDaemonDied();
+}
+
 namespace {
 
 constexpr const char* kActingUser = "ZYROVFS_UID";
@@ -42,10 +47,6 @@ bool StartChain() {
     }
     const MountLockRelease release;
     return DBUS::Init() && GVFSD::Init() && GVFSD_FUSE::Init();
-}
-
-bool IsAnyDaemonDead() {
-    return DBUS::CheckDaemonDied() || GVFSD::CheckDaemonDied() || GVFSD_FUSE::CheckDaemonDied();
 }
 
 bool Prepare(unsigned int uid, bool force) {

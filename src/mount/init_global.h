@@ -11,6 +11,9 @@ namespace ZYROVFS {
  */
 bool InitForMount(unsigned int uid);
 
+/** Whether one of the acting user's three daemons is known to be gone. */
+bool IsAnyDaemonDead();
+
 }  // namespace ZYROVFS
 
 #endif

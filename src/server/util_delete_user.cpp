@@ -15,6 +15,7 @@
 #include "core/owned_folder.h"
 #include "core/paths.h"
 #include "core/user_mount.h"
+#include "mount/init_global.h"
 #include "zyrovfs/global.h"
 #include "zyrovfs/server.h"
 #include "zyrovfs/utils.h"
@@ -22,10 +23,6 @@
 
 namespace ZYROVFS::Server {
 namespace {
-
-bool IsAnyDaemonDead() {
-    return DBUS::CheckDaemonDied() || GVFSD::CheckDaemonDied() || GVFSD_FUSE::CheckDaemonDied();
-}
 
 bool AreAllDaemonsDead() {
     return DBUS::CheckDaemonDied() && GVFSD::CheckDaemonDied() && GVFSD_FUSE::CheckDaemonDied();
