@@ -41,6 +41,10 @@ bool IsLeft(const struct stat& info, uid_t user) {
            info.st_mtime < time(nullptr) - kLongestWrite;
 }
 
+std::string Join(std::string folder, const std::string& name) {
+    return folder.append("/").append(name);
+}
+
 void Sweep(const Folder& folder, const std::string& path, uid_t user, Naming naming,
            std::vector<std::string>& removed) {
     for (const std::string& name : folder.Names()) {
@@ -48,7 +52,7 @@ void Sweep(const Folder& folder, const std::string& path, uid_t user, Naming nam
         if (IsUnfinished(name, naming) &&
             fstatat(folder.Get(), name.c_str(), &info, AT_SYMLINK_NOFOLLOW) == 0 &&
             IsLeft(info, user) && unlinkat(folder.Get(), name.c_str(), 0) == 0) {
-            removed.push_back(path + "/" + name);
+            removed.push_back(Join(path, name));
         }
     }
 }
@@ -62,7 +66,7 @@ struct Place {
 
 void SweepUsers(const Place& place, std::vector<std::string>& removed) {
     const Folder shared = Folder::Shared(place.machine, place.shared);
-    const std::string path = std::string(place.machine) + "/" + place.shared;
+    const std::string path = Join(place.machine, place.shared);
     Sweep(shared, path, 0, Naming::kBesideOld, removed);
     for (const std::string& name : shared.Names()) {
         uid_t user = 0;
@@ -70,8 +74,9 @@ void SweepUsers(const Place& place, std::vector<std::string>& removed) {
             continue;
         }
         for (const std::string& below : place.of_user) {
-            const std::string inner = name + below;
-            Sweep(shared.Below(inner, user), path + "/" + inner, user, Naming::kBesideOld, removed);
+            std::string inner = name;
+            inner += below;
+            Sweep(shared.Below(inner, user), Join(path, inner), user, Naming::kBesideOld, removed);
         }
     }
 }

@@ -68,6 +68,12 @@ bool Disconnect(uid_t uid, const Folder& runtime) {
     return AreDaemonsDeadSoon();
 }
 
+std::string DaemonsLeft(const std::string& user) {
+    std::string sentence = "Daemons of user ";
+    sentence.append(user).append(" do not end; /var/tmp/user/").append(user);
+    return sentence.append(" has their process ids.");
+}
+
 }  // namespace
 
 bool DisconnectUsers(std::vector<std::string>& problems) {
@@ -75,8 +81,7 @@ bool DisconnectUsers(std::vector<std::string>& problems) {
     for (const std::string& name : users.Names()) {
         uid_t uid = 0;
         if (ToUid(name, uid) && !Disconnect(uid, users.Below(name, uid))) {
-            problems.push_back("Daemons of user " + name + " do not end; /var/tmp/user/" + name +
-                               " has their process ids.");
+            problems.push_back(DaemonsLeft(name));
         }
     }
     return problems.empty();
