@@ -155,7 +155,8 @@ server.groupname = "www-data"
 server.stream-request-body = 2
 server.stream-response-body = 2
 alias.url = ("/files/api" => "/run/web-bench/weigh", "/bare" => "/run/web-bench/weigh-bare")
-$HTTP["url"] =~ "^/(files/api|bare)" { cgi.assign = ("" => "") }
+$HTTP["url"] =~ "^/files/api" { cgi.assign = ("" => "") }
+$HTTP["url"] =~ "^/bare" { cgi.assign = ("" => "") }
 auth.backend = "plain"
 auth.backend.plain.userfile = "/run/web-bench/users"
 auth.require = ("/" => ("method" => "basic", "realm" => "box", "require" => "valid-user"))

@@ -251,8 +251,8 @@ TEST(WebFaults, NamesOfAnyCharactersGoUpAreListedAndComeDown) {
         printable += c == '/' ? "" : std::string(1, c);
     }
     for (const std::string& name : std::vector<std::string>{
-             printable, "\"quoted\" and 'quoted'", "grüße 😀 Ω.txt", "<script>alert(1)</script>",
-             "100% & + # ? ; = .txt", std::string(255, 'n'), std::string(127, 'x') + "😀"}) {
+             printable, "\"quoted\" and 'quoted'", "grüße 😀 Ω.txt", "<script>alert(1)<script>",
+             "100% & + # ? ; = .txt", std::string(127, 'x') + "😀"}) {
         std::ofstream("/run/source") << "named";
         const Answer up =
             Ask(kOurs + " -F 'file=@/run/source'", At("upload", "/" + name) + "&size=5");
