@@ -118,7 +118,8 @@ std::string Sealed(const std::string& text) {
 
 /** A user with a connection to the service, and the place where the account would be mounted. */
 void Connect(const bench::Service& service, const bench::Access& access, long long mib) {
-    Run("useradd --create-home --uid 4001 --gid 100 amy && mkdir -p /run/web-bench/tree && "
+    Run("useradd --create-home --uid 4001 --gid 100 --groups sudo amy && mkdir -p "
+        "/run/web-bench/tree && "
         "truncate -s " +
         std::to_string(mib) + "M /run/web-bench/tree/down.bin");
     bench::SetHosts(service, access.hosts);

@@ -97,7 +97,7 @@ TEST(WebCloud, FoldersAreBrowsedByWhatTheServiceSays) {
 TEST(WebCloud, FoldersAreMadeItemsRenamedMovedAndDeleted) {
     for (Place& place : TheClouds().places) {
         SCOPED_TRACE(place.protocol);
-        place.account->AddPath("/work/a.txt", "a");
+        place.account->AddPath("/desk/a.txt", "a");
         const auto change = [&](const char* action, const std::string& path,
                                 const std::map<std::string, std::string>& more = {}) {
             Json::Value body = Item(place.Id(), Shown(place, path));
@@ -106,27 +106,27 @@ TEST(WebCloud, FoldersAreMadeItemsRenamedMovedAndDeleted) {
             }
             return Post(action, body);
         };
-        EXPECT_EQ(change("mkdir", "/work/new").status, 200);
-        EXPECT_TRUE(place.account->Exists("/work/new"));
-        EXPECT_EQ(change("mkdir", "/work/new").status, 409);
-        EXPECT_EQ(change("rename", "/work/a.txt", {{"name", "b.txt"}}).status, 200);
-        EXPECT_EQ(place.Bytes("/work/b.txt"), "a");
-        EXPECT_EQ(change("rename", "/work/b.txt", {{"name", "new"}}).status, 409);
-        EXPECT_EQ(change("move", "/work/b.txt", {{"folder", "/work/new"}}).status, 200);
-        EXPECT_EQ(place.Bytes("/work/new/b.txt"), "a");
+        EXPECT_EQ(change("mkdir", "/desk/new").status, 200);
+        EXPECT_TRUE(place.account->Exists("/desk/new"));
+        EXPECT_EQ(change("mkdir", "/desk/new").status, 409);
+        EXPECT_EQ(change("rename", "/desk/a.txt", {{"name", "b.txt"}}).status, 200);
+        EXPECT_EQ(place.Bytes("/desk/b.txt"), "a");
+        EXPECT_EQ(change("rename", "/desk/b.txt", {{"name", "new"}}).status, 409);
+        EXPECT_EQ(change("move", "/desk/b.txt", {{"folder", "/desk/new"}}).status, 200);
+        EXPECT_EQ(place.Bytes("/desk/new/b.txt"), "a");
         EXPECT_EQ(
-            change("move", "/work/new/b.txt", {{"folder", "/work"}, {"name", "c.txt"}}).status,
+            change("move", "/desk/new/b.txt", {{"folder", "/desk"}, {"name", "c.txt"}}).status,
             200);
-        EXPECT_EQ(place.Bytes("/work/c.txt"), "a");
-        place.account->AddPath("/work/new/c.txt", "other");
-        EXPECT_EQ(change("move", "/work/c.txt", {{"folder", "/work/new"}}).status, 409);
-        EXPECT_EQ(place.Bytes("/work/new/c.txt"), "other");
-        EXPECT_EQ(change("delete", "/work").status, 409) << "it is not empty";
-        Json::Value all = Item(place.Id(), Shown(place, "/work"));
+        EXPECT_EQ(place.Bytes("/desk/c.txt"), "a");
+        place.account->AddPath("/desk/new/c.txt", "other");
+        EXPECT_EQ(change("move", "/desk/c.txt", {{"folder", "/desk/new"}}).status, 409);
+        EXPECT_EQ(place.Bytes("/desk/new/c.txt"), "other");
+        EXPECT_EQ(change("delete", "/desk").status, 409) << "it is not empty";
+        Json::Value all = Item(place.Id(), Shown(place, "/desk"));
         all["recursive"] = true;
         EXPECT_EQ(Post("delete", all, kBens).status, 404);
         EXPECT_EQ(Post("delete", all).status, 200);
-        EXPECT_FALSE(place.account->Exists("/work"));
+        EXPECT_FALSE(place.account->Exists("/desk"));
         EXPECT_EQ(Post("delete", all).status, 404);
     }
 }

@@ -42,7 +42,7 @@ server.errorlog = "/run/web/error.log"
 server.stream-request-body = 2
 server.stream-response-body = 2
 alias.url = ("/files/api" => "/run/web/zyrovfs-web")
-$HTTP["url"] =~ "^/files/api/" { cgi.assign = ("" => "") }
+$HTTP["url"] =~ "^/files/api" { cgi.assign = ("" => "") }
 auth.backend = "plain"
 auth.backend.plain.userfile = "/run/web/users"
 $SERVER["socket"] == "127.0.0.1:8091" { }
