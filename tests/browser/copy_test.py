@@ -1,17 +1,9 @@
 """What goes from place to place without the browser's bytes: copies, moves, and archives."""
 import os
 import shutil
-import signal
-import subprocess
 import zipfile
 
-from page import CLOUDS, PageTest, REMOTE, SERVER, noise, post, read, write
-
-
-def pid_of_dropbox():
-    """The simulated service; the machine that it runs on is the test's own."""
-    return int(subprocess.run(["pgrep", "-f", "^[^ ]*cloudsim --dropbox"], check=True,
-                              capture_output=True, text=True).stdout.split()[0])
+from page import CLOUDS, PageTest, REMOTE, SERVER, noise, read, write
 
 
 class Copy(PageTest):
@@ -52,21 +44,6 @@ class Copy(PageTest):
         self.clear()
         self.open(CLOUDS["dropbox"])
         self.assertTrue({"one.bin", "tree"} <= set(self.names()))
-
-    def test_a_copy_goes_on_without_the_page_is_found_again_and_cancelled(self):
-        b = self.browser
-        pid = pid_of_dropbox()
-        os.kill(pid, signal.SIGSTOP)
-        try:
-            post("copy", **{"from": {"connection": SERVER, "paths": ["/copy/one.bin"]},
-                            "to": {"connection": CLOUDS["dropbox"], "path": "/"}})
-            self.open()
-            b.wait("return document.querySelector('#copies [data-state=running]')")
-            b.click("#copies [aria-label^=Cancel]")
-        finally:
-            os.kill(pid, signal.SIGCONT)
-        b.wait("return document.querySelector('#copies [data-state=cancelled]')")
-        self.clear()
 
     def test_a_copy_that_fails_says_why(self):
         self.open(SERVER, "/copy")
