@@ -106,9 +106,7 @@ bool Dropbox::ChunkedUpload(XferData* xfer, const Json::Value& meta) {
             // A piece that was left out for its wrong place has moved the offset alone.
             if (offset != total || arrived != total) {
                 LOG_ERROR("upload size is not match");
-                if (GetErrorCode() == VFS_ERR_NONE) {
-                    SetError(VFS_ERR_TRANSFER_ABORTED, "");
-                }
+                SetError(arrived < offset ? VFS_ERR_RANGE_FAILED : VFS_ERR_TRANSFER_ABORTED, "");
                 return false;
             }
             return CommitChunkUpload(session, path, total);

@@ -59,6 +59,7 @@ TEST_F(Attempts, TheErrorIsCopiedBeforeOrBehindTheTestForACancel) {
 
 TEST_F(Attempts, ASuccessLeavesTheRecordAsItWasBefore) {
     Transfer again({kBusy, kDone});
+    again.context.fd = 7;
     BoxUpload(again);
     again.cloud.SetError(VFS_ERR_NOT_FOUND, "before");
     EXPECT_TRUE(again.Go());

@@ -434,7 +434,7 @@ TEST_F(OneDriveBits, CancelledInTheMiddleOfAFragmentEndsThere) {
     EXPECT_THAT(seams::Sleeps(), IsEmpty());
 }
 
-TEST_F(OneDriveBits, WithoutAUrlOrASourceFailsAndSetsNothing) {
+TEST_F(OneDriveBits, WithoutAUrlOrASourceFails) {
     Give({});
     XferContext context;
     XferData xfer{nullptr, 1, &context};
@@ -443,7 +443,7 @@ TEST_F(OneDriveBits, WithoutAUrlOrASourceFailsAndSetsNothing) {
     EXPECT_FALSE(drive->ChunkedUpload(&xfer, Object(R"({"total_bytes":1})")));
     EXPECT_FALSE(drive->ChunkedUpload(nullptr, meta));
     EXPECT_FALSE(drive->ChunkedUpload(&nothing, meta));
-    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_NONE);
+    EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CLOUD_FAILED);
     EXPECT_FALSE(drive->ChunkedUpload(&xfer, Object("[1]")));
     EXPECT_EQ(drive->GetErrorCode(), VFS_ERR_CLOUD_FAILED);
 }
