@@ -76,7 +76,8 @@ bool IsFolderInTheWay(const Transfer& transfer, std::string& why) {
 bool IsTransferSafe(Cloud* cloud, const std::string& uri, bool upload, long long size,
                     std::string& why) {
     why = kNotAsked;
-    return cloud != nullptr && Guard(*cloud, [&] {
+    // An answer of no is no failure of the driver, and leaves no code.
+    return cloud != nullptr && Barrier(*cloud, [&] {
                const Transfer transfer{*cloud, uri, cloud->GetServerPathBySharePath(uri), upload,
                                        size};
                if (IsQuoteMangled(transfer)) {

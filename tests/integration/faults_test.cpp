@@ -108,7 +108,7 @@ const HostFault kHostFaults[] = {
     {"WrongUser", "ftp", "127.0.0.1", 2121, VFS_ERR_WRONG_PASSWORD},
     {"WrongUser", "sftp", "127.0.0.1", 2222, VFS_ERR_WRONG_PASSWORD},
     {"WrongUser", "dav", "127.0.0.1", 8080, VFS_ERR_WRONG_USERNAME},
-    {"WrongUser", "davs", "localhost", 8443, VFS_ERR_FAILED},
+    {"WrongUser", "davs", "localhost", 8443, VFS_ERR_ACCESS_DENIED},
     {"NoRoute", "ftp", "203.0.113.1", 21, VFS_ERR_HOST_UNREACHABLE},
     {"NoRoute", "sftp", "203.0.113.1", 22, VFS_ERR_ACCESS_DENIED},
     {"NoRoute", "dav", "203.0.113.1", 80, VFS_ERR_HOST_UNREACHABLE},

@@ -46,7 +46,7 @@ const Location kLocations[] = {
     {"ftp", "127.0.0.1", 2121, "", VFS_ERR_WRONG_PASSWORD, VFS_ERR_ACCESS_DENIED},
     {"sftp", "127.0.0.1", 2222, "srv/remote", VFS_ERR_WRONG_PASSWORD, VFS_ERR_ACCESS_DENIED},
     {"dav", "127.0.0.1", 8080, "", VFS_ERR_WRONG_USERNAME, VFS_ERR_ACCESS_DENIED},
-    {"davs", "localhost", 8443, "", VFS_ERR_FAILED, VFS_ERR_HOST_UNREACHABLE},
+    {"davs", "localhost", 8443, "", VFS_ERR_ACCESS_DENIED, VFS_ERR_HOST_UNREACHABLE},
     {"smb", "127.0.0.1", 445, "remote", VFS_ERR_WRONG_PASSWORD, VFS_ERR_ACCESS_DENIED},
 };
 
