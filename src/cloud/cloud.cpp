@@ -5,6 +5,7 @@
 #include <zosplatform/ea.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstring>
 #include <iterator>
 #include <new>
@@ -67,7 +68,9 @@ bool Cloud::GetFileSize(const std::string& uri, long long* size) {
     }
     struct stat info {};
     if (stat(path.c_str(), &info) != 0) {
+        const bool missing = errno == ENOENT || errno == ENOTDIR;
         LOG_ERROR("Failed to stat %s, %m", path.c_str());
+        SetError(missing ? VFS_ERR_NOT_FOUND : VFS_ERR_CLOUD_FAILED, "");
         return false;
     }
     *size = info.st_size;
