@@ -15,7 +15,7 @@ std::unique_ptr<Tree> FilesOf(const User& user, const Body& body) {
 
 /** A path that is not the connection itself. */
 std::string ItemPath(const Body& body) {
-    const std::string path = body.Text("path");
+    std::string path = body.Text("path");
     SplitPath(path);
     return path;
 }

@@ -47,7 +47,7 @@ std::string ReadPath(std::string path) {
 }
 
 std::string Required(const Body& body, const char* key, const char* sentence) {
-    const std::string text = body.Text(key, "");
+    std::string text = body.Text(key, "");
     if (text.empty()) {
         throw Failure(422, sentence);
     }
