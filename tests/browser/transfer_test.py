@@ -26,13 +26,15 @@ class Transfer(PageTest):
                 "Input.dispatchDragEvent", type=kind, x=place[0], y=place[1],
                 data={"items": [], "files": list(paths), "dragOperationsMask": 1})
 
-    def up_and_down(self, connection, folder):
+    def up_and_down(self, connection, folder, arrived=lambda source: None):
+        """In an empty folder. arrived(source) looks at the other side, before the file is deleted there."""
         b = self.browser
         source = noise("/tmp/source/report ü.bin", 3_000_000)
         self.open(connection, folder)
         b.type("#choose-files-input", source)
         self.done(1)
         self.wait_for_names("report ü.bin")
+        arrived(source)
         b.click("#grid .rows > :first-child")
         b.click("#download")
         loaded = b.downloaded("report ü.bin")
@@ -45,11 +47,15 @@ class Transfer(PageTest):
     def test_a_file_goes_up_to_each_cloud_and_comes_down_again(self):
         for name, connection in CLOUDS.items():
             with self.subTest(name):
-                self.up_and_down(connection, "/My Drive" if name == "google" else "/")
+                folder = ("/My Drive" if name == "google" else "") + "/up and down"
+                post("mkdir", connection=connection, path=folder)
+                self.up_and_down(connection, folder)
+                post("delete", connection=connection, path=folder)
 
     def test_a_file_goes_up_to_a_server_and_comes_down_again(self):
-        self.up_and_down(SERVER, "/up")
-        self.assertEqual(read(f"{REMOTE}/up/report ü.bin"), read("/tmp/source/report ü.bin"))
+        self.up_and_down(SERVER, "/up", lambda source: self.assertEqual(
+            read(f"{REMOTE}/up/report ü.bin"), read(source)))
+        self.assertEqual(os.listdir(f"{REMOTE}/up"), [])
 
     def test_a_dropped_folder_arrives_whole(self):
         os.makedirs("/tmp/source/tree/inner/empty")
