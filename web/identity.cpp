@@ -30,9 +30,19 @@ constexpr const char* kClean = "ZYROVFS_WEB_CLEAN";
 
 /** What CGI says of a request, as far as this program looks at it. */
 constexpr const char* kFromTheServer[] = {
-    "REMOTE_USER",    "REQUEST_METHOD", "PATH_INFO",   "QUERY_STRING",           "CONTENT_TYPE",
-    "CONTENT_LENGTH", "HTTP_HOST",      "HTTP_ORIGIN", "HTTP_X_ZYROVFS_REQUEST", "HTTP_RANGE",
-    "REQUEST_SCHEME", "HTTPS",
+    "REMOTE_USER",
+    "REQUEST_METHOD",
+    "PATH_INFO",
+    "QUERY_STRING",
+    "CONTENT_TYPE",
+    "CONTENT_LENGTH",
+    "HTTP_HOST",
+    "HTTP_ORIGIN",
+    "HTTP_X_ZYROVFS_REQUEST",
+    "HTTP_RANGE",
+    "REQUEST_SCHEME",
+    "HTTPS",
+    "HTTP_ACCEPT_ENCODING",
 };
 
 bool IsRootThroughout() {

@@ -6,6 +6,9 @@
 
 #include <array>
 #include <cerrno>
+#include <cstdlib>
+
+#include "gzip.h"
 
 namespace web {
 namespace {
@@ -59,8 +62,13 @@ std::string Head(int status, const std::string& type, const std::string& headers
 void AnswerJson(int status, const Json::Value& value) {
     Json::StreamWriterBuilder builder;
     builder["indentation"] = "";
-    Write(Head(status, "application/json; charset=utf-8") + Json::writeString(builder, value) +
-          "\n");
+    const std::string text = Json::writeString(builder, value) + "\n";
+    constexpr size_t kWorthIt = 1024;
+    const bool packs = text.size() >= kWorthIt && TakesGzip(getenv("HTTP_ACCEPT_ENCODING"));
+    const std::string packed = packs ? Gzip(text) : "";
+    Write(Head(status, "application/json; charset=utf-8",
+               packed.empty() ? "" : "Content-Encoding: gzip\r\n") +
+          (packed.empty() ? text : packed));
 }
 
 void AnswerDone() {

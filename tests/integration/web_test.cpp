@@ -124,6 +124,20 @@ TEST(Web, FilesGoUpThroughTheRelayWithAndWithoutTheirSize) {
     }
 }
 
+TEST(Web, ALongListComesCompressedToThoseWhoTakeIt) {
+    Must("mkdir -p '" + kRemote + "many' && cd '" + kRemote +
+         "many' && seq -f 'entry %g' 200 | xargs -d '\\n' touch");
+    Json::Value plain;
+    ASSERT_TRUE(Eventually([&plain] {
+        plain = Ask(kAmyIs, At("list", "/many")).Json();
+        return plain["entries"].size() == 200;
+    }));
+    const Answer packed = Ask(std::string(kAmyIs) + " --compressed", At("list", "/many"));
+    EXPECT_THAT(packed.head, HasSubstr("Content-Encoding: gzip"));
+    EXPECT_EQ(packed.Json()["entries"].size(), 200U);
+    fs::remove_all(kRemote + "many");
+}
+
 TEST(Web, AnUploadThatTellsAnotherSizeThanItsOwnIsRefused) {
     for (const char* size : {"99999", "101", "99", "-5", "x", "9223372036854775808"}) {
         const Answer answer = Upload("/lie.bin", std::string(100, 'x'), size);
