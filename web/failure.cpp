@@ -39,8 +39,10 @@ constexpr CodeRow kCodes[] = {
     {VFS_ERR_HOST_UNREACHABLE, 502, kHost},
     // Said by a server that takes no session, and by mounts that know no better.
     {VFS_ERR_ACCESS_DENIED, 502, "Check the address, the port, the user name and the password."},
-    {VFS_ERR_WRONG_USERNAME, 401, kCredentials},
-    {VFS_ERR_WRONG_PASSWORD, 401, kCredentials},
+    // Not 401: that is the web server's own log-in, and on it browsers forget what they log in
+    // with.
+    {VFS_ERR_WRONG_USERNAME, 403, kCredentials},
+    {VFS_ERR_WRONG_PASSWORD, 403, kCredentials},
     {VFS_ERR_CONNECT_EXISTS, 409, "It is among the connections already."},
     {VFS_ERR_CONFIG_NOT_FOUND, 404, "Reload the page: it may have been removed elsewhere."},
     {VFS_ERR_IDENTITY_QUESTION, 409, "Compare the fingerprint with the server's own."},
@@ -48,8 +50,8 @@ constexpr CodeRow kCodes[] = {
     {VFS_ERR_CERT_UNTRUSTED, 409, "Accept the certificate only if you know whose it is."},
     {VFS_ERR_CONFIG_FULL, 507, "Forget a connection of this kind that is no longer needed."},
     {VFS_ERR_BUSY, 503, kLater},
-    {VFS_ERR_UNAUTHORIZED, 401, kSignIn},
-    {VFS_ERR_TOKEN_REVOKED, 401, kSignIn},
+    {VFS_ERR_UNAUTHORIZED, 403, kSignIn},
+    {VFS_ERR_TOKEN_REVOKED, 403, kSignIn},
     {VFS_ERR_FORBIDDEN, 403, kRights},
     {VFS_ERR_PERMISSION_DENIED, 403, kRights},
     {VFS_ERR_CONNECT_FAILED, 502, kLater},

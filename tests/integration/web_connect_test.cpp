@@ -99,7 +99,7 @@ TEST_F(WebConnect, ServersOfEachProtocolAreAddedByTheFormAndBrowsed) {
         const Answer added = Post("add", form);
         ASSERT_EQ(added.status, 200) << added.body << form;
         const std::string id = added.Json()["connection"].asString();
-        EXPECT_EQ(StateOf(id), "connected");
+        EXPECT_TRUE(Eventually([&] { return StateOf(id) == "connected"; }));
         EXPECT_THAT(NamesAt(id, "/"), AllOf(Contains("hello.txt"), Contains("docs"))) << form;
         EXPECT_EQ(Ask(kAmyIs, At("download", id, "/hello.txt")).body,
                   "hello from the remote side\n");
@@ -117,7 +117,7 @@ TEST_F(WebConnect, AConnectionIsTakenDownMountedAgainAndForgotten) {
     EXPECT_EQ(gone.Json()["error"]["advice"], "Connect it again.");
     const Answer again = Post("connect", Named(id));
     EXPECT_EQ(again.status, 200) << again.body;
-    EXPECT_EQ(StateOf(id), "connected");
+    EXPECT_TRUE(Eventually([&] { return StateOf(id) == "connected"; }));
     EXPECT_THAT(NamesAt(id, "/"), Contains("hello.txt"));
     EXPECT_EQ(Post("forget", Named(id)).status, 200);
     EXPECT_EQ(StateOf(id), "none");
@@ -129,13 +129,13 @@ TEST_F(WebConnect, AChangedPasswordIsAskedForAndTaken) {
     Post("disconnect", Named(id));
     machine::Remote("password second-secret");
     const Answer refused = Post("connect", Named(id));
-    EXPECT_EQ(refused.status, 401) << refused.body;
+    EXPECT_EQ(refused.status, 403) << refused.body;
     EXPECT_FALSE(refused.Json()["error"]["advice"].asString().empty());
     Json::Value body = Named(id);
     body["password"] = "second-secret";
     const Answer taken = Post("connect", body);
     EXPECT_EQ(taken.status, 200) << taken.body;
-    EXPECT_EQ(StateOf(id), "connected");
+    EXPECT_TRUE(Eventually([&] { return StateOf(id) == "connected"; }));
     machine::Remote(std::string("password ") + kPassword);
 }
 
@@ -143,7 +143,7 @@ TEST_F(WebConnect, WhatCannotBeConnectedIsToldInWordsAndNotKept) {
     Json::Value wrong = Dav();
     wrong["password"] = "wrong";
     const Answer refused = Post("add", wrong);
-    EXPECT_EQ(refused.status, 401) << refused.body;
+    EXPECT_EQ(refused.status, 403) << refused.body;
     Json::Value closed = Dav();
     closed["port"] = 9;
     const Answer nobody = Post("add", closed);
@@ -231,7 +231,8 @@ TEST_F(WebConnect, AnotherUsersConnectionsAreNobodysToChange) {
         EXPECT_EQ(Post(action, Named(id), "-u amy:a").status, 403) << action;
     }
     EXPECT_EQ(Post("add", Dav(), "-u amy:a").status, 403);
-    EXPECT_EQ(StateOf(id), "connected");
+    // The tree learns of a mount a moment after it.
+    EXPECT_TRUE(Eventually([&] { return StateOf(id) == "connected"; }));
 }
 
 }  // namespace

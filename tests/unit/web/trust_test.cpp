@@ -79,7 +79,7 @@ TEST(WebTrust, AnotherFailureIsNoQuestion) {
         VFSSetErrEx(VFS_ERR_WRONG_PASSWORD, "x", 1);
         return false;
     });
-    EXPECT_EQ(refused["status"], 401);
+    EXPECT_EQ(refused["status"], 403);
     EXPECT_FALSE(refused.isMember("trust"));
 }
 
