@@ -61,4 +61,15 @@ std::unique_ptr<Tree> Connection::BeforeUpload() const {
     return Member("protocol") == "box" ? Files() : std::make_unique<MountedTree>(Member("path"));
 }
 
+void Connection::CheckUpload(ZYROCloud::Cloud& cloud, const std::string& path,
+                             long long size) const {
+    std::string why;
+    if (ZYROCloud::Utils::IsTransferSafe(&cloud, Uri(path), true, size, why)) {
+        return;
+    }
+    const ZYROVFS::__tag_vfs_err_ code = cloud.GetErrorCode();
+    throw code == ZYROVFS::VFS_ERR_NONE ? Failure(422, why)
+                                        : FailureOf("The file was not uploaded", code);
+}
+
 }  // namespace web

@@ -30,6 +30,9 @@ class Connection {
     /** Who knows what an upload would replace: the mounted tree, which costs little; the service
      * itself where a file takes the place of a folder with all that is in it. */
     std::unique_ptr<Tree> BeforeUpload() const;
+    /** Failure with status 422 for a file that the driver would put elsewhere or under another
+     * name, or for which it would delete a folder. `size` is -1 when that is not known. */
+    void CheckUpload(ZYROCloud::Cloud& cloud, const std::string& path, long long size) const;
 
   private:
     std::string Member(const char* key) const;

@@ -120,10 +120,13 @@ class Copy {
         to_->SetError(VFS_ERR_NONE, "");
         const std::string source = plan_.from.Uri(item.path);
         long long size = item.size;
-        if ((size < 0 && !from_->GetFileSize(source, &size)) ||
-            !to_->CanFileUpload(static_cast<unsigned long long>(size)) ||
-            !Cloud::CopyFile(from_.get(), to_.get(), source, plan_.to.Uri(Target(item)), size,
-                             ShowMoved, StopWatch::IsAsked, nullptr)) {
+        const bool fits = (size >= 0 || from_->GetFileSize(source, &size)) &&
+                          to_->CanFileUpload(static_cast<unsigned long long>(size));
+        if (fits) {
+            plan_.to.CheckUpload(*to_, Target(item), size);
+        }
+        if (!fits || !Cloud::CopyFile(from_.get(), to_.get(), source, plan_.to.Uri(Target(item)),
+                                      size, ShowMoved, StopWatch::IsAsked, nullptr)) {
             const bool at_source = from_->GetErrorCode() != VFS_ERR_NONE;
             StopIfAsked();
             throw FailureOf("\"" + item.below + "\" was not copied",

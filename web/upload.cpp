@@ -91,6 +91,7 @@ class Relay {
         if (!cloud->CanFileUpload(static_cast<unsigned long long>(size_))) {
             throw FailureOf("The file was not uploaded", cloud->GetErrorCode());
         }
+        connection_.CheckUpload(*cloud, path_, size_);
         const StopWatch watch(job_.get());
         const Form form = ReadForm(content_type);
         Shared().current = form.read;

@@ -164,6 +164,46 @@ TEST(WebCloud, AFileIsReplacedAndAFolderIsNot) {
     }
 }
 
+TEST(WebCloud, AFileThatItsDriverWouldPutElsewhereIsRefusedWithASentence) {
+    Place& onedrive = Cloud("onedrive");
+    onedrive.account->AddPath("/small/kept.txt", "kept");
+    Settle(onedrive);
+    const Answer elsewhere = Upload(onedrive, "/small/small", "file", "&size=4");
+    EXPECT_EQ(elsewhere.status, 422) << elsewhere.body;
+    EXPECT_THAT(elsewhere.body, HasSubstr("another folder of OneDrive"));
+    const Answer renamed = Upload(Cloud("box"), "/a\"b.txt", "file", "&size=4");
+    EXPECT_EQ(renamed.status, 422) << renamed.body;
+    EXPECT_THAT(renamed.body, HasSubstr("double quote"));
+}
+
+TEST(WebCloud, ACopyDeletesNoFolderInItsWay) {
+    Place& from = Cloud("dropbox");
+    Place& to = Cloud("box");
+    from.account->AddPath("/name", "a file");
+    to.account->AddPath("/in the way/name/inner.txt", "kept");
+    Settle(from);
+    Settle(to);
+    Json::Value plan;
+    plan["from"]["connection"] = from.Id();
+    plan["from"]["paths"].append("/name");
+    plan["to"]["connection"] = to.Id();
+    plan["to"]["path"] = "/in the way";
+    const Answer begun = Post("copy", plan);
+    ASSERT_EQ(begun.status, 200) << begun.body;
+    const std::string task = begun.Json()["task"].asString();
+    Json::Value told;
+    EXPECT_TRUE(machine::Eventually([&] {
+        const Json::Value answer = Ask(kAmyIs, Api("tasks")).Json();
+        for (const Json::Value& one : answer["tasks"]) {
+            told = one["id"] == task ? one : told;
+        }
+        return told["state"] == "failed" || told["state"] == "done";
+    }));
+    EXPECT_EQ(told["state"], "failed") << told;
+    EXPECT_THAT(told["error"]["meaning"].asString(), HasSubstr("A folder of that name")) << told;
+    EXPECT_EQ(to.Bytes("/in the way/name/inner.txt"), "kept");
+}
+
 TEST(WebCloud, DocumentsAreExportedInTheFormatsThatAreOffered) {
     Place& place = Cloud("google");
     auto& google = dynamic_cast<cloudsim::GDrive&>(*place.service);
